@@ -1,0 +1,18 @@
+#!/usr/bin/env bash
+# Installs the dependencies, builds everything with ASan+UBSan and runs every test; then builds the
+# concurrency tests with TSan and runs them again there.
+set -euo pipefail
+root=$(cd "$(dirname "$0")/.." && pwd)
+"$root/scripts/setup.sh"
+jobs=$(nproc)
+
+cmake -S "$root" -B "$root/build/asan" -G Ninja -DTRELM_SANITIZE=address -DCMAKE_BUILD_TYPE=Debug >/dev/null
+cmake --build "$root/build/asan" -j "$jobs"
+export ASAN_OPTIONS=detect_leaks=1:abort_on_error=1
+export UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1
+(cd "$root/build/asan" && ctest --output-on-failure -j "$jobs" --timeout 300)
+
+cmake -S "$root" -B "$root/build/tsan" -G Ninja -DTRELM_SANITIZE=thread -DCMAKE_BUILD_TYPE=Debug >/dev/null
+cmake --build "$root/build/tsan" -j "$jobs"
+export TSAN_OPTIONS=halt_on_error=1:second_deadlock_stack=1
+(cd "$root/build/tsan" && ctest --output-on-failure -j "$jobs" -L concurrency --timeout 300)
