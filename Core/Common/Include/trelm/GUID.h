@@ -1,0 +1,57 @@
+#pragma once
+
+#include <array>
+#include <cstddef>
+#include <cstring>
+#include <functional>
+#include <iosfwd>
+
+#include "trelm/Export.h"
+#include "trelm/String.h"
+#include "trelm/uError.h"
+
+namespace trelm {
+
+// A 128-bit identifier. Default-constructed it is the null GUID (all zero bytes).
+// Ordered and compared byte by byte. Thread safety: a plain value; generate() may be called from
+// any thread.
+class TRELM_API GUID {
+public:
+    using Bytes = std::array<unsigned char, 16>;
+
+    GUID() noexcept = default;
+    explicit GUID(Bytes const& bytes) noexcept : bytes_(bytes) {}
+
+    // A new random GUID (libuuid, version 4).
+    static GUID generate();
+    // Parses the 8-4-4-4-12 hexadecimal form (either case). Anything else gives kInvalid and
+    // leaves `out` untouched.
+    static uError fromString(String const& text, GUID& out);
+
+    // Lowercase 8-4-4-4-12 form, e.g. "0f1e2d3c-4b5a-4978-8695-a4b3c2d1e0f9".
+    String toString() const;
+    bool isNull() const noexcept;
+    Bytes const& bytes() const noexcept { return bytes_; }
+
+    friend bool operator==(GUID const& a, GUID const& b) noexcept { return a.bytes_ == b.bytes_; }
+    friend bool operator!=(GUID const& a, GUID const& b) noexcept { return a.bytes_ != b.bytes_; }
+    friend bool operator<(GUID const& a, GUID const& b) noexcept { return a.bytes_ < b.bytes_; }
+
+private:
+    Bytes bytes_{};
+};
+
+TRELM_API std::ostream& operator<<(std::ostream& os, GUID const& g);
+
+}  // namespace trelm
+
+template <>
+struct std::hash<trelm::GUID> {
+    std::size_t operator()(trelm::GUID const& g) const noexcept {
+        std::size_t a = 0;
+        std::size_t b = 0;
+        std::memcpy(&a, g.bytes().data(), sizeof a);
+        std::memcpy(&b, g.bytes().data() + 8, sizeof b);
+        return a ^ (b * 0x9e3779b97f4a7c15ull);
+    }
+};
