@@ -1,0 +1,87 @@
+#include "trelm/Configuration.h"
+
+#include <gtest/gtest.h>
+
+#include "trelm/Set.h"
+
+namespace trelm {
+namespace {
+
+Configuration::Group makeGroup() {
+    Map<String, Variant> values;
+    values.insert("flag_true", true);
+    values.insert("flag_text", "false");
+    values.insert("flag_one", 1);
+    values.insert("flag_two", 2);
+    values.insert("flag_word", "yes");
+    values.insert("list", Vector<String>{"a", "b"});
+    values.insert("int_list", Vector<int>{3, 4});
+    values.insert("single", "solo");
+    values.insert("number", 7);
+    return Configuration::Group("source", values);
+}
+
+TEST(ConfigurationTest, GetGivesTheValueOrAnEmptyVariant) {
+    auto group = makeGroup();
+    EXPECT_EQ(group.name(), "source");
+    EXPECT_EQ(group.get("number"), Variant(7));
+    EXPECT_TRUE(group.get("absent").empty());
+}
+
+TEST(ConfigurationTest, GetBoolAcceptsBoolLikeValuesAndDefaultsWhenAbsent) {
+    auto group = makeGroup();
+    struct Case {
+        char const* key;
+        bool def;
+        unsigned code;
+        bool expected;  // value of out afterwards (starts as !def ^ ... see below)
+    } const cases[] = {{"flag_true", false, kSuccess, true}, {"flag_text", true, kSuccess, false},
+                       {"flag_one", false, kSuccess, true},  {"absent", true, kSuccess, true},
+                       {"absent", false, kSuccess, false},   {"flag_two", true, kInvalid, false},
+                       {"flag_word", true, kInvalid, false}, {"list", true, kInvalid, false}};
+    for (auto const& c : cases) {
+        // out starts as !def for successes so that a skipped write would show; for failures it
+        // must keep its start value `expected`.
+        bool out = c.code == kSuccess ? !c.expected : c.expected;
+        EXPECT_EQ(group.get(c.key, out, c.def).code(), c.code) << c.key;
+        EXPECT_EQ(out, c.expected) << c.key;
+    }
+}
+
+TEST(ConfigurationTest, GetListAcceptsListsAndASingleString) {
+    auto group = makeGroup();
+    Vector<String> const def{"default"};
+    struct Case {
+        char const* key;
+        unsigned code;
+        Vector<String> expected;
+    } const cases[] = {{"list", kSuccess, {"a", "b"}},
+                       {"int_list", kSuccess, {"3", "4"}},
+                       {"single", kSuccess, {"solo"}},
+                       {"absent", kSuccess, {"default"}},
+                       {"number", kInvalid, {"untouched"}},
+                       {"flag_true", kInvalid, {"untouched"}}};
+    for (auto const& c : cases) {
+        Vector<String> out{"untouched"};
+        EXPECT_EQ(group.get(c.key, out, def).code(), c.code) << c.key;
+        EXPECT_EQ(out, c.expected) << c.key;
+    }
+}
+
+TEST(ConfigurationTest, SetReplacesAndValuesAreOrderedByKey) {
+    Configuration::Group group("g");
+    group.set("b", 1);
+    group.set("a", 2);
+    group.set("b", 3);
+    ASSERT_EQ(group.values().size(), 2u);
+    EXPECT_EQ(group.values().begin()->first, "a");
+    EXPECT_EQ(group.get("b"), Variant(3));
+
+    Set<Configuration::Value> values;
+    values.insert(Configuration::Value("k", "one"));
+    values.insert(Configuration::Value("k", "two"));
+    EXPECT_EQ(values.size(), 1u);
+}
+
+}  // namespace
+}  // namespace trelm

@@ -1,0 +1,106 @@
+#include <gtest/gtest.h>
+
+#include <vector>
+
+#include "trelm/Map.h"
+#include "trelm/Set.h"
+#include "trelm/SmartPtr.h"
+#include "trelm/String.h"
+#include "trelm/Vector.h"
+
+namespace trelm {
+namespace {
+
+TEST(MapTest, InsertReplacesTheValueOfAnEqualKeyAndReportsSuccess) {
+    Map<String, int> m;
+    EXPECT_EQ(m.insert("k", 1).code(), kSuccess);
+    EXPECT_EQ(m.insert("k", 2).code(), kSuccess);
+    EXPECT_EQ(m.size(), 1u);
+    ASSERT_NE(m.search("k"), nullptr);
+    EXPECT_EQ(*m.search("k"), 2);
+}
+
+TEST(MapTest, IterationRunsInAscendingByteOrder) {
+    Map<String, int> m;
+    for (char const* k : {"session_key", "api_key", "call_id", "Zeta", "v", "format"}) {
+        m.insert(k, 0);
+    }
+    std::vector<std::string> keys;
+    for (auto const& entry : m) keys.push_back(entry.first.str());
+    EXPECT_EQ(keys, (std::vector<std::string>{"Zeta", "api_key", "call_id", "format",
+                                              "session_key", "v"}));
+}
+
+TEST(MapTest, SearchAndRemoveOfAnAbsentKey) {
+    Map<String, int> m;
+    Map<String, int> const& cm = m;
+    EXPECT_EQ(m.search("none"), nullptr);
+    EXPECT_EQ(cm.search("none"), nullptr);
+    EXPECT_EQ(m.remove("none").code(), kSuccess);
+    m.insert("a", 1);
+    EXPECT_EQ(m.remove("a").code(), kSuccess);
+    EXPECT_TRUE(m.empty());
+}
+
+TEST(SetTest, KeepsOneCopyOfEqualValuesInOrder) {
+    Set<String> s;
+    s.insert("b");
+    s.insert("a");
+    s.insert("b");
+    EXPECT_EQ(s.size(), 2u);
+    EXPECT_TRUE(s.contains("a"));
+    EXPECT_EQ(*s.begin(), "a");
+    EXPECT_EQ(s.remove("zzz").code(), kSuccess);
+    s.remove("a");
+    EXPECT_FALSE(s.contains("a"));
+}
+
+TEST(VectorTest, InsertAndEraseRejectPositionsOutOfRange) {
+    Vector<int> v(16);  // growth step accepted and ignored
+    EXPECT_EQ(v.insert(1, 5).code(), kInvalid);
+    EXPECT_EQ(v.insert(0, 2).code(), kSuccess);
+    EXPECT_EQ(v.insert(0, 1).code(), kSuccess);
+    EXPECT_EQ(v.insert(2, 3).code(), kSuccess);  // append
+    EXPECT_EQ(v, (Vector<int>{1, 2, 3}));
+    EXPECT_EQ(v.erase(3).code(), kInvalid);
+    EXPECT_EQ(v.erase(1).code(), kSuccess);
+    EXPECT_EQ(v, (Vector<int>{1, 3}));
+}
+
+struct Base {
+    virtual ~Base() = default;
+};
+struct Derived : Base {
+    explicit Derived(int* deleted) : deleted_(deleted) {}
+    ~Derived() override { ++*deleted_; }
+    int* deleted_;
+};
+
+TEST(SmartPtrTest, LastReferenceDeletesThroughTheCreatedType) {
+    int deleted = 0;
+    {
+        SmartPtr<Base> base;
+        {
+            SmartPtr<Derived> d(new Derived(&deleted));
+            base = d;
+            EXPECT_EQ(base.useCount(), 2);
+        }
+        EXPECT_EQ(deleted, 0);
+        SmartPtr<Derived> back = dynamicPointerCast<Derived>(base);
+        ASSERT_TRUE(back);
+        EXPECT_EQ(staticPointerCast<Derived>(base).get(), back.get());
+    }
+    EXPECT_EQ(deleted, 1);
+}
+
+TEST(SmartPtrTest, DynamicCastToAnUnrelatedTypeIsNull) {
+    struct Other : Base {};
+    SmartPtr<Base> base = makeSmart<Other>();
+    EXPECT_FALSE(dynamicPointerCast<Derived>(base));
+    SmartPtr<Base> none;
+    EXPECT_TRUE(none == nullptr);
+    EXPECT_FALSE(dynamicPointerCast<Derived>(none));
+}
+
+}  // namespace
+}  // namespace trelm

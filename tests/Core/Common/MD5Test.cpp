@@ -1,0 +1,54 @@
+#include "trelm/MD5.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+namespace trelm {
+namespace {
+
+// The test suite of RFC 1321, appendix A.5.
+struct Vector5 {
+    char const* input;
+    char const* digest;
+} const kRfc1321[] = {
+    {"", "d41d8cd98f00b204e9800998ecf8427e"},
+    {"a", "0cc175b9c0f1b6a831c399e269772661"},
+    {"abc", "900150983cd24fb0d6963f7d28e17f72"},
+    {"message digest", "f96b697d7cb7938d525a2f31aaf161d0"},
+    {"abcdefghijklmnopqrstuvwxyz", "c3fcd3d76192e4007dfb496cca67e13b"},
+    {"ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789",
+     "d174ab98d277d9f5a5611c2c9f419d9f"},
+    {"12345678901234567890123456789012345678901234567890123456789012345678901234567890",
+     "57edf4a22be3c955ac49da2e2107b67a"},
+};
+
+TEST(MD5Test, HexDigestMatchesTheReferenceVectors) {
+    for (auto const& v : kRfc1321) EXPECT_EQ(md5Hex(v.input).str(), v.digest) << v.input;
+}
+
+TEST(MD5Test, PiecewiseUpdatesGiveTheSameDigestAndTheContextIsReusable) {
+    std::string const input = kRfc1321[6].input;
+    MD5_CTX ctx;
+    for (int round = 0; round < 2; ++round) {
+        MD5Init(&ctx);
+        // Uneven pieces that straddle the 64-byte block boundary.
+        for (std::size_t at = 0; at < input.size(); at += 13) {
+            std::size_t n = std::min<std::size_t>(13, input.size() - at);
+            MD5Update(&ctx, reinterpret_cast<unsigned char const*>(input.data() + at),
+                      static_cast<unsigned>(n));
+        }
+        unsigned char digest[16];
+        MD5Final(digest, &ctx);
+        char hex[33];
+        for (int i = 0; i < 16; ++i) std::snprintf(hex + 2 * i, 3, "%02x", digest[i]);
+        EXPECT_STREQ(hex, kRfc1321[6].digest) << "round " << round;
+    }
+}
+
+TEST(MD5Test, BinaryInputWithNulBytesIsHashedWhole) {
+    EXPECT_EQ(md5Hex(String("\0", 1)).str(), "93b885adfe0da089cdf634904fd59f71");
+}
+
+}  // namespace
+}  // namespace trelm

@@ -1,0 +1,54 @@
+#include "trelm/Metadata.h"
+
+#include <gtest/gtest.h>
+
+namespace trelm {
+namespace {
+
+using TRELM_TYPES::TYPES;
+
+TEST(MetadataTest, HostCoreKeysAreKnownWithTheirTypes) {
+    struct Case {
+        char const* name;
+        TYPES type;
+    } const cases[] = {{"core_object_id", TRELM_TYPES::GUID_TYPE},
+                       {"core_object_type", TRELM_TYPES::INT32},
+                       {"core_object_time", TRELM_TYPES::INT32},
+                       {"core_object_deleted", TRELM_TYPES::BOOL},
+                       {"core_object_source", TRELM_TYPES::STRING},
+                       {"core_contact_profile_picture_url", TRELM_TYPES::STRING},
+                       {"core_service_id", TRELM_TYPES::STRING},
+                       {"media_uri", TRELM_TYPES::STRING},
+                       {"media_notes", TRELM_TYPES::STRING}};
+    for (auto const& c : cases) {
+        TYPES type = TRELM_TYPES::NONE;
+        ASSERT_EQ(Metadata::getType(c.name, type).code(), kSuccess) << c.name;
+        EXPECT_EQ(type, c.type) << c.name;
+    }
+}
+
+TEST(MetadataTest, UnknownNameIsNotFoundAndLeavesTheType) {
+    TYPES type = TRELM_TYPES::INT64;
+    EXPECT_EQ(Metadata::getType("metadata_test_never_registered", type).code(), kNotFound);
+    EXPECT_EQ(type, TRELM_TYPES::INT64);
+}
+
+TEST(MetadataTest, SecondRegistrationOfANameKeepsTheFirstType) {
+    Metadata::Key first = trelm_RegisterMetadataType("metadata_test_twice", TRELM_TYPES::STRING);
+    EXPECT_EQ(first, Metadata::Key("metadata_test_twice", TRELM_TYPES::STRING));
+    Metadata::Key second = trelm_RegisterMetadataType("metadata_test_twice", TRELM_TYPES::INT32);
+    EXPECT_EQ(second.type(), TRELM_TYPES::STRING);
+    TYPES type = TRELM_TYPES::NONE;
+    ASSERT_TRUE(Metadata::getType("metadata_test_twice", type).ok());
+    EXPECT_EQ(type, TRELM_TYPES::STRING);
+}
+
+TEST(MetadataTest, KeysOrderByNameThenType) {
+    using Metadata::Key;
+    EXPECT_TRUE(Key("a", TRELM_TYPES::INT64) < Key("b", TRELM_TYPES::GUID_TYPE));
+    EXPECT_TRUE(Key("a", TRELM_TYPES::STRING) < Key("a", TRELM_TYPES::INT32));
+    EXPECT_FALSE(Key("a", TRELM_TYPES::STRING) == Key("a", TRELM_TYPES::INT32));
+}
+
+}  // namespace
+}  // namespace trelm

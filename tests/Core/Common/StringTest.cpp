@@ -1,0 +1,120 @@
+#include "trelm/String.h"
+
+#include <gtest/gtest.h>
+
+#include <climits>
+
+namespace trelm {
+namespace {
+
+TEST(StringTest, OrderIsBytewiseWithShorterPrefixFirst) {
+    EXPECT_TRUE(String("ab") < String("abc"));
+    EXPECT_FALSE(String("abc") < String("ab"));
+    EXPECT_TRUE(String("") < String("a"));
+    EXPECT_TRUE(String("B") < String("a"));  // no case folding
+    // Bytes compare as unsigned: a UTF-8 lead byte sorts after ASCII.
+    EXPECT_TRUE(String("z") < String("\xc3\xa9"));
+    EXPECT_FALSE(String("same") < String("same"));
+}
+
+TEST(StringTest, FindAnswersAllOnesWhenAbsent) {
+    String s("a,b,,c");
+    EXPECT_EQ(s.find(','), 1u);
+    EXPECT_EQ(s.find(',', 2), 3u);
+    EXPECT_EQ(s.find(String(",,")), 3u);
+    EXPECT_EQ(s.find('x'), String::npos);
+    EXPECT_EQ(s.find(String("c"), 6), String::npos);
+    EXPECT_EQ(s.find(',', 100), String::npos);
+    EXPECT_EQ(String::npos, 0xffffffffu);
+}
+
+TEST(StringTest, SubstrAndEraseClampOutOfRangePositions) {
+    String s("hello");
+    EXPECT_EQ(s.substr(1, 3), "ell");
+    EXPECT_EQ(s.substr(3), "lo");
+    EXPECT_EQ(s.substr(5), "");
+    EXPECT_EQ(s.substr(99, 2), "");
+    String t("hello");
+    t.erase(1, 2);
+    EXPECT_EQ(t, "hlo");
+    t.erase(10);
+    EXPECT_EQ(t, "hlo");
+    t.erase(1);
+    EXPECT_EQ(t, "h");
+}
+
+TEST(StringTest, EmbeddedNulBytesArePartOfTheString) {
+    String s("a\0b", 3);
+    EXPECT_EQ(s.size(), 3u);
+    EXPECT_EQ(s.find('b'), 2u);
+    EXPECT_NE(s, String("a"));
+}
+
+TEST(StringTest, FromWritesDecimalTextAtTheLimits) {
+    EXPECT_EQ(String::from(INT_MIN), "-2147483648");
+    EXPECT_EQ(String::from(INT_MAX), "2147483647");
+    EXPECT_EQ(String::from(UINT_MAX), "4294967295");
+    EXPECT_EQ(String::from(LLONG_MIN), "-9223372036854775808");
+    EXPECT_EQ(String::from(ULLONG_MAX), "18446744073709551615");
+    EXPECT_EQ(String::from(0), "0");
+}
+
+struct ParseCase {
+    char const* text;
+    bool intOk;
+    int intValue;
+    bool unsignedOk;
+    unsigned unsignedValue;
+};
+
+class StringParseTest : public testing::TestWithParam<ParseCase> {};
+
+TEST_P(StringParseTest, WholeTextMustBeADecimalInRange) {
+    ParseCase const& c = GetParam();
+    int i = -777;
+    uError ei = String(c.text).to(i);
+    if (c.intOk) {
+        EXPECT_EQ(ei.code(), kSuccess);
+        EXPECT_EQ(i, c.intValue);
+    } else {
+        EXPECT_EQ(ei.code(), kInvalid);
+        EXPECT_EQ(i, -777) << "out-parameter written on failure";
+    }
+    unsigned u = 777;
+    uError eu = String(c.text).to(u);
+    if (c.unsignedOk) {
+        EXPECT_EQ(eu.code(), kSuccess);
+        EXPECT_EQ(u, c.unsignedValue);
+    } else {
+        EXPECT_EQ(eu.code(), kInvalid);
+        EXPECT_EQ(u, 777u) << "out-parameter written on failure";
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Table, StringParseTest,
+    testing::Values(ParseCase{"0", true, 0, true, 0}, ParseCase{"42", true, 42, true, 42},
+                    ParseCase{"2147483647", true, INT_MAX, true, 2147483647u},
+                    ParseCase{"2147483648", false, 0, true, 2147483648u},
+                    ParseCase{"-2147483648", true, INT_MIN, false, 0},
+                    ParseCase{"-2147483649", false, 0, false, 0},
+                    ParseCase{"4294967295", false, 0, true, UINT_MAX},
+                    ParseCase{"4294967296", false, 0, false, 0},
+                    ParseCase{"-1", true, -1, false, 0}, ParseCase{"007", true, 7, true, 7},
+                    ParseCase{"", false, 0, false, 0}, ParseCase{"-", false, 0, false, 0},
+                    ParseCase{"+5", false, 0, false, 0}, ParseCase{" 5", false, 0, false, 0},
+                    ParseCase{"5 ", false, 0, false, 0}, ParseCase{"12abc", false, 0, false, 0},
+                    ParseCase{"1.5", false, 0, false, 0}, ParseCase{"0x10", false, 0, false, 0},
+                    ParseCase{"99999999999999999999", false, 0, false, 0}));
+
+TEST(StringTest, ConcatenationMixesStringsAndLiterals) {
+    String s = String("a") + "b" + String("c");
+    s += "d";
+    s += String("e");
+    s += 'f';
+    EXPECT_EQ(s, "abcdef");
+    EXPECT_EQ("x" + String("y"), "xy");
+}
+
+}  // namespace
+}  // namespace trelm

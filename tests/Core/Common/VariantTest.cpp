@@ -1,0 +1,239 @@
+#include "trelm/Variant.h"
+
+#include <gtest/gtest.h>
+
+#include <climits>
+
+namespace trelm {
+namespace {
+
+enum class Target { Int, Int64, UInt, Bool, Guid, Str, IntList, StrList };
+
+GUID const kGuid = [] {
+    GUID g;
+    GUID::fromString("0f1e2d3c-4b5a-4978-8695-a4b3c2d1e0f9", g);
+    return g;
+}();
+
+// Runs the conversion into an out-parameter pre-set to a sentinel. On success `result` holds the
+// converted value; on failure `untouched` tells whether the sentinel survived.
+uError convert(Variant const& in, Target target, Variant& result, bool& untouched) {
+    uError e;
+    switch (target) {
+        case Target::Int: {
+            int out = -777;
+            e = in.as(out);
+            result = out;
+            untouched = out == -777;
+            break;
+        }
+        case Target::Int64: {
+            long long out = -777;
+            e = in.as(out);
+            result = out;
+            untouched = out == -777;
+            break;
+        }
+        case Target::UInt: {
+            unsigned out = 777;
+            e = in.as(out);
+            result = out;
+            untouched = out == 777;
+            break;
+        }
+        case Target::Bool: {
+            // Two runs so that either sentinel value would show a write.
+            bool out = true;
+            e = in.as(out);
+            bool out2 = false;
+            in.as(out2);
+            result = out;
+            untouched = out && !out2;
+            break;
+        }
+        case Target::Guid: {
+            GUID out = GUID::generate();
+            GUID const before = out;
+            e = in.as(out);
+            result = out;
+            untouched = out == before;
+            break;
+        }
+        case Target::Str: {
+            String out("sentinel");
+            e = in.as(out);
+            result = out;
+            untouched = out == "sentinel";
+            break;
+        }
+        case Target::IntList: {
+            Vector<int> out{-777};
+            e = in.as(out);
+            result = out;
+            untouched = out == Vector<int>{-777};
+            break;
+        }
+        case Target::StrList: {
+            Vector<String> out{"sentinel"};
+            e = in.as(out);
+            result = out;
+            untouched = out == Vector<String>{"sentinel"};
+            break;
+        }
+    }
+    return e;
+}
+
+struct ConversionCase {
+    char const* name;
+    Variant in;
+    Target target;
+    bool ok;
+    Variant expected;  // meaningful when ok
+};
+
+void PrintTo(ConversionCase const& c, std::ostream* os) { *os << c.name << " " << c.in; }
+
+class VariantConversionTest : public testing::TestWithParam<ConversionCase> {};
+
+TEST_P(VariantConversionTest, ConvertsWhereTheValueAllowsAndOtherwiseLeavesTheTarget) {
+    ConversionCase const& c = GetParam();
+    Variant result;
+    bool untouched = false;
+    uError e = convert(c.in, c.target, result, untouched);
+    if (c.ok) {
+        ASSERT_EQ(e.code(), kSuccess) << e;
+        EXPECT_EQ(result, c.expected);
+    } else {
+        EXPECT_EQ(e.code(), kInvalid);
+        EXPECT_TRUE(untouched) << "out-parameter written on refusal, now " << result;
+    }
+}
+
+Variant const kNone;
+std::string const kGuidText = "0f1e2d3c-4b5a-4978-8695-a4b3c2d1e0f9";
+
+INSTANTIATE_TEST_SUITE_P(
+    Table, VariantConversionTest,
+    testing::Values(
+        // to int
+        ConversionCase{"Int32ToInt", 5, Target::Int, true, 5},
+        ConversionCase{"Int64MaxIntToInt", (long long)INT_MAX, Target::Int, true, INT_MAX},
+        ConversionCase{"Int64AboveIntToInt", (long long)INT_MAX + 1, Target::Int, false, kNone},
+        ConversionCase{"Int64BelowIntToInt", (long long)INT_MIN - 1, Target::Int, false, kNone},
+        ConversionCase{"UInt32MaxIntToInt", 2147483647u, Target::Int, true, INT_MAX},
+        ConversionCase{"UInt32AboveIntToInt", 2147483648u, Target::Int, false, kNone},
+        ConversionCase{"DecimalStringToInt", "-12", Target::Int, true, -12},
+        ConversionCase{"JunkStringToInt", "12x", Target::Int, false, kNone},
+        ConversionCase{"EmptyStringToInt", "", Target::Int, false, kNone},
+        ConversionCase{"BoolToInt", true, Target::Int, false, kNone},
+        ConversionCase{"EmptyToInt", kNone, Target::Int, false, kNone},
+        ConversionCase{"GuidToInt", kGuid, Target::Int, false, kNone},
+        ConversionCase{"IntListToInt", Vector<int>{1}, Target::Int, false, kNone},
+        // to long long
+        ConversionCase{"Int32ToInt64", -1, Target::Int64, true, -1LL},
+        ConversionCase{"UInt32ToInt64", UINT_MAX, Target::Int64, true, 4294967295LL},
+        ConversionCase{"MinStringToInt64", "-9223372036854775808", Target::Int64, true, LLONG_MIN},
+        ConversionCase{"OverflowStringToInt64", "9223372036854775808", Target::Int64, false,
+                       kNone},
+        ConversionCase{"BoolToInt64", false, Target::Int64, false, kNone},
+        // to unsigned
+        ConversionCase{"NegativeInt32ToUInt", -1, Target::UInt, false, kNone},
+        ConversionCase{"Int64MaxUIntToUInt", 4294967295LL, Target::UInt, true, UINT_MAX},
+        ConversionCase{"Int64AboveUIntToUInt", 4294967296LL, Target::UInt, false, kNone},
+        ConversionCase{"StringToUInt", "4294967295", Target::UInt, true, UINT_MAX},
+        ConversionCase{"NegativeStringToUInt", "-1", Target::UInt, false, kNone},
+        // to bool
+        ConversionCase{"BoolToBool", false, Target::Bool, true, false},
+        ConversionCase{"OneToBool", 1, Target::Bool, true, true},
+        ConversionCase{"ZeroInt64ToBool", 0LL, Target::Bool, true, false},
+        ConversionCase{"TwoToBool", 2, Target::Bool, false, kNone},
+        ConversionCase{"TrueStringToBool", "true", Target::Bool, true, true},
+        ConversionCase{"ZeroStringToBool", "0", Target::Bool, true, false},
+        ConversionCase{"YesStringToBool", "yes", Target::Bool, false, kNone},
+        ConversionCase{"EmptyToBool", kNone, Target::Bool, false, kNone},
+        // to GUID
+        ConversionCase{"GuidToGuid", kGuid, Target::Guid, true, kGuid},
+        ConversionCase{"GuidTextToGuid", String(kGuidText), Target::Guid, true, kGuid},
+        ConversionCase{"OtherTextToGuid", "nope", Target::Guid, false, kNone},
+        ConversionCase{"IntToGuid", 7, Target::Guid, false, kNone},
+        // to String
+        ConversionCase{"StringToString", "x", Target::Str, true, "x"},
+        ConversionCase{"Int32ToString", -3, Target::Str, true, "-3"},
+        ConversionCase{"Int64ToString", 100000000000LL, Target::Str, true, "100000000000"},
+        ConversionCase{"UInt32ToString", 4000000000u, Target::Str, true, "4000000000"},
+        ConversionCase{"BoolToString", true, Target::Str, true, "true"},
+        ConversionCase{"GuidToString", kGuid, Target::Str, true, String(kGuidText)},
+        ConversionCase{"IntListToString", Vector<int>{1}, Target::Str, false, kNone},
+        ConversionCase{"EmptyToString", kNone, Target::Str, false, kNone},
+        // to Vector<int>
+        ConversionCase{"IntListToIntList", Vector<int>{1, 2}, Target::IntList, true,
+                       Vector<int>{1, 2}},
+        ConversionCase{"SingleIntToIntList", 7, Target::IntList, true, Vector<int>{7}},
+        ConversionCase{"BigInt64ToIntList", 1LL << 40, Target::IntList, false, kNone},
+        ConversionCase{"DecimalStringListToIntList", Vector<String>{"1", "-2"}, Target::IntList,
+                       true, Vector<int>{1, -2}},
+        ConversionCase{"MixedStringListToIntList", Vector<String>{"1", "x"}, Target::IntList,
+                       false, kNone},
+        ConversionCase{"StringToIntList", "5", Target::IntList, false, kNone},
+        ConversionCase{"EmptyToIntList", kNone, Target::IntList, false, kNone},
+        // to Vector<String>
+        ConversionCase{"StringListToStringList", Vector<String>{"a"}, Target::StrList, true,
+                       Vector<String>{"a"}},
+        ConversionCase{"IntListToStringList", Vector<int>{1, -2}, Target::StrList, true,
+                       Vector<String>{"1", "-2"}},
+        ConversionCase{"StringToStringList", "a", Target::StrList, false, kNone},
+        ConversionCase{"IntToStringList", 3, Target::StrList, false, kNone}),
+    [](testing::TestParamInfo<ConversionCase> const& info) { return info.param.name; });
+
+TEST(VariantTest, TypeCodesAreTheFixedNumbers) {
+    EXPECT_EQ(Variant().type(), 0);
+    EXPECT_EQ(Variant(true).type(), 1);
+    EXPECT_EQ(Variant("s").type(), 2);
+    EXPECT_EQ(Variant(kGuid).type(), 3);
+    EXPECT_EQ(Variant(Vector<int>{}).type(), 4);
+    EXPECT_EQ(Variant(Vector<String>{}).type(), 5);
+    EXPECT_EQ(Variant(1).type(), 6);
+    EXPECT_EQ(Variant(1LL).type(), 7);
+    EXPECT_EQ(Variant(1u).type(), 8);
+    Variant v;
+    v = 3LL;
+    EXPECT_EQ(v.type(), Variant::Int64);
+    v = String("x");
+    EXPECT_EQ(v.type(), Variant::String);
+}
+
+TEST(VariantTest, AccessorsGiveDefaultsWhenTheValueDoesNotConvert) {
+    Variant text("not a number");
+    EXPECT_EQ(text.asInt32(), 0);
+    EXPECT_EQ(text.asInt64(), 0);
+    EXPECT_EQ(text.asUInt32(), 0u);
+    EXPECT_TRUE(text.asGUID().isNull());
+    EXPECT_EQ(Variant(Vector<int>{1}).asString(), "");
+    EXPECT_EQ(Variant("42").asInt32(), 42);
+    EXPECT_EQ(Variant(kGuid).asString(), String(kGuidText));
+}
+
+TEST(VariantTest, OrderIsByTypeCodeThenByValue) {
+    // Empty < Bool < String < Guid < IntList < StringList < Int32 < Int64 < UInt32.
+    EXPECT_TRUE(Variant() < Variant(false));
+    EXPECT_TRUE(Variant(true) < Variant(""));
+    EXPECT_TRUE(Variant("zzz") < Variant(kGuid));
+    EXPECT_TRUE(Variant(Vector<String>{}) < Variant(-5));
+    EXPECT_TRUE(Variant(1000) < Variant(0LL));  // Int32 before Int64 whatever the values
+    EXPECT_TRUE(Variant(-2) < Variant(1));
+    EXPECT_TRUE(Variant("ab") < Variant("abc"));
+    EXPECT_FALSE(Variant(1) < Variant(1));
+    EXPECT_NE(Variant(5), Variant(5LL));
+    EXPECT_EQ(Variant("a"), Variant(String("a")));
+}
+
+TEST(VariantTest, ToStringPrintsListsAndEmpty) {
+    EXPECT_EQ(Variant().toString(), "");
+    EXPECT_EQ(Variant(Vector<int>{1, 2}).toString(), "[1, 2]");
+    EXPECT_EQ(Variant(Vector<String>{"a", "b"}).toString(), "[a, b]");
+    EXPECT_EQ(Variant(false).toString(), "false");
+}
+
+}  // namespace
+}  // namespace trelm

@@ -1,0 +1,89 @@
+#include <gtest/gtest.h>
+
+#include "BaseSource.h"
+
+namespace trelm {
+namespace {
+
+BaseSource::Record record() {
+    BaseSource::Record r;
+    r.insert("type_int", 9);
+    r.insert("type_text", "4");
+    r.insert("type_junk", "four");
+    r.insert("type_big", 1LL << 40);
+    r.insert("text", "hello");
+    r.insert("text_empty", "");
+    r.insert("number", 12);
+    r.insert("list", Vector<String>{"a"});
+    r.insert("empty_variant", Variant());
+    return r;
+}
+
+struct FieldCase {
+    char const* key;
+    unsigned code;
+    bool wrapsCause;  // a conversion failure is carried as the cause
+    char const* text;  // expected text for the String forms
+};
+
+TEST(BaseSourceFieldsTest, FieldRequiredReadsAnIntegerOrRefuses) {
+    struct Case {
+        char const* key;
+        unsigned code;
+        bool wrapsCause;
+        int value;
+    } const cases[] = {{"type_int", kSuccess, false, 9},  {"type_text", kSuccess, false, 4},
+                       {"absent", kInvalid, false, -1},   {"empty_variant", kInvalid, false, -1},
+                       {"type_junk", kInvalid, true, -1}, {"type_big", kInvalid, true, -1},
+                       {"list", kInvalid, true, -1}};
+    auto const r = record();
+    for (auto const& c : cases) {
+        int out = -1;
+        uError e = BaseSource::fieldRequired(r, c.key, out);
+        EXPECT_EQ(e.code(), c.code) << c.key;
+        EXPECT_EQ(e.cause() != nullptr, c.wrapsCause) << c.key;
+        EXPECT_EQ(out, c.value) << c.key;
+    }
+}
+
+TEST(BaseSourceFieldsTest, FieldRequiredNotEmptyRefusesMissingEmptyAndUnconvertible) {
+    FieldCase const cases[] = {{"text", kSuccess, false, "hello"},
+                               {"number", kSuccess, false, "12"},
+                               {"text_empty", kInvalid, false, "untouched"},
+                               {"absent", kInvalid, false, "untouched"},
+                               {"empty_variant", kInvalid, false, "untouched"},
+                               {"list", kInvalid, true, "untouched"}};
+    auto const r = record();
+    for (auto const& c : cases) {
+        String out("untouched");
+        uError e = BaseSource::fieldRequiredNotEmpty(r, c.key, out);
+        EXPECT_EQ(e.code(), c.code) << c.key;
+        EXPECT_EQ(e.cause() != nullptr, c.wrapsCause) << c.key;
+        EXPECT_EQ(out, c.text) << c.key;
+        EXPECT_EQ(BaseSource::fieldRequiredStringNotEmpty(r, c.key).code(), c.code) << c.key;
+    }
+}
+
+TEST(BaseSourceFieldsTest, FieldOptionalTellsPresenceAndRefusesUnconvertible) {
+    struct Case {
+        char const* key;
+        unsigned code;
+        bool present;
+        char const* text;
+    } const cases[] = {{"text", kSuccess, true, "hello"},
+                       {"text_empty", kSuccess, true, ""},
+                       {"absent", kSuccess, false, "untouched"},
+                       {"list", kInvalid, true /* untouched */, "untouched"}};
+    auto const r = record();
+    for (auto const& c : cases) {
+        bool present = !c.present;
+        if (c.code != kSuccess) present = c.present;
+        String out("untouched");
+        EXPECT_EQ(BaseSource::fieldOptional(r, c.key, present, out).code(), c.code) << c.key;
+        EXPECT_EQ(present, c.present) << c.key;
+        EXPECT_EQ(out, c.text) << c.key;
+    }
+}
+
+}  // namespace
+}  // namespace trelm

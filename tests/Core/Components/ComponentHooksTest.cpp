@@ -1,0 +1,278 @@
+#include <gtest/gtest.h>
+
+#include <functional>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "BaseConnector.h"
+#include "BaseSource.h"
+#include "ConfigurationChangedMessage.h"
+#include "IQueryItems.h"
+#include "WakeupMessage.h"
+#include "WipeMessage.h"
+
+namespace trelm {
+namespace {
+
+using Log = std::vector<std::string>;
+
+// A source that records each hook it runs and answers what the test sets for that hook
+// (success unless told otherwise).
+class RecordingSource : public BaseSource {
+public:
+    RecordingSource() : BaseSource("source", "@test:/source") {}
+
+    Log log;
+    std::map<std::string, uError> answers;
+    bool lastInteractive = false;
+
+protected:
+    uError hook(std::string const& name) {
+        log.push_back(name);
+        auto it = answers.find(name);
+        return it == answers.end() ? TRELM_OK() : it->second;
+    }
+
+    uError sendConfigImpl(Configuration::Group const&) override { return hook("sendConfigImpl"); }
+    uError startupImpl() override { return hook("startupImpl"); }
+    uError shutdownImpl() override { return hook("shutdownImpl"); }
+    uError preMessageImpl(IMessage&) override { return hook("preMessageImpl"); }
+    uError postMessageImpl(IMessage&, uError const& result) override {
+        log.push_back("postMessageImpl(" + std::to_string(result.code()) + ")");
+        return TRELM_OK();
+    }
+    uError configurationChangedImpl(ConfigurationChangedMessage& msg) override {
+        return hook("configurationChangedImpl(" + std::to_string(msg.keys.size()) + ")");
+    }
+    uError manageInputDataImpl(Record&, bool flag) override {
+        return hook(std::string("manageInputDataImpl(") + (flag ? "true" : "false") + ")");
+    }
+    uError manageUpdateDataImpl(Record&, Record const& previous) override {
+        return hook("manageUpdateDataImpl(" + std::to_string(previous.size()) + ")");
+    }
+    uError modifyRetrievedData(Record&) override { return hook("modifyRetrievedData"); }
+    uError insertData(Record&) override { return hook("insertData"); }
+    uError postInsert(Record const&) override { return hook("postInsert"); }
+    uError updateData(Record&) override { return hook("updateData"); }
+    uError postUpdate(Record const&) override { return hook("postUpdate"); }
+    uError markDataInvisible(GUID const&) override { return hook("markDataInvisible"); }
+    uError postMarkInvisible(GUID const&) override { return hook("postMarkInvisible"); }
+    uError removeData(GUID const&, bool) override { return hook("removeData"); }
+    uError postRemove(GUID const&) override { return hook("postRemove"); }
+    uError retrieveData(GUID const&, Record&, bool) override { return hook("retrieveData"); }
+    uError checkQuery(IQueryItems::StartQueryMessage const&, bool interactive) override {
+        lastInteractive = interactive;
+        return hook("checkQuery");
+    }
+    uError doStartQuery(IQueryItems::StartQueryMessage&, bool) override {
+        return hook("doStartQuery");
+    }
+};
+
+struct SequenceCase {
+    char const* name;
+    std::function<uError(RecordingSource&)> call;
+    Log expected;
+};
+
+class SourceSequenceTest : public testing::TestWithParam<SequenceCase> {};
+
+TEST_P(SourceSequenceTest, EntryPointRunsItsHooksInOrder) {
+    RecordingSource source;
+    EXPECT_EQ(GetParam().call(source).code(), kSuccess);
+    EXPECT_EQ(source.log, GetParam().expected);
+}
+
+TEST_P(SourceSequenceTest, FirstFailingHookStopsTheSequenceAndIsReturned) {
+    Log const& expected = GetParam().expected;
+    // Fail each hook in turn (the post-message hook's answer is ignored by design).
+    for (std::size_t failing = 0; failing < expected.size(); ++failing) {
+        if (expected[failing].rfind("postMessageImpl", 0) == 0) continue;
+        RecordingSource source;
+        source.answers[expected[failing]] = TRELM_ERROR(kServiceError);
+        EXPECT_EQ(GetParam().call(source).code(), kServiceError) << expected[failing];
+        Log prefix(expected.begin(), expected.begin() + failing + 1);
+        bool messageEntry = expected.front() == "preMessageImpl";
+        if (messageEntry && failing > 0) {
+            prefix.push_back("postMessageImpl(" + std::to_string(unsigned(kServiceError)) + ")");
+        }
+        EXPECT_EQ(source.log, prefix) << "failing " << expected[failing];
+    }
+}
+
+BaseSource::Record someRecord() {
+    BaseSource::Record r;
+    r.insert("core_object_type", 4);
+    return r;
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Table, SourceSequenceTest,
+    testing::Values(
+        SequenceCase{"sendConfig",
+                     [](RecordingSource& s) { return s.sendConfig(Configuration::Group("g")); },
+                     {"sendConfigImpl"}},
+        SequenceCase{"startup", [](RecordingSource& s) { return s.startup(); }, {"startupImpl"}},
+        SequenceCase{"shutdown", [](RecordingSource& s) { return s.shutdown(); },
+                     {"shutdownImpl"}},
+        SequenceCase{"insert",
+                     [](RecordingSource& s) {
+                         auto r = someRecord();
+                         return s.insert(r);
+                     },
+                     {"manageInputDataImpl(false)", "insertData", "postInsert"}},
+        SequenceCase{"update",
+                     [](RecordingSource& s) {
+                         auto r = someRecord();
+                         return s.update(r);
+                     },
+                     {"manageUpdateDataImpl(0)", "updateData", "postUpdate"}},
+        SequenceCase{"remove", [](RecordingSource& s) { return s.remove(GUID(), true); },
+                     {"removeData", "postRemove"}},
+        SequenceCase{"markInvisible", [](RecordingSource& s) { return s.markInvisible(GUID()); },
+                     {"markDataInvisible", "postMarkInvisible"}},
+        SequenceCase{"retrieve",
+                     [](RecordingSource& s) {
+                         BaseSource::Record r;
+                         return s.retrieve(GUID(), r, false);
+                     },
+                     {"retrieveData", "modifyRetrievedData"}},
+        SequenceCase{"startQueryMessage",
+                     [](RecordingSource& s) {
+                         IQueryItems::StartQueryMessage msg;
+                         return s.onMessage(msg);
+                     },
+                     {"preMessageImpl", "checkQuery", "doStartQuery", "postMessageImpl(0)"}},
+        SequenceCase{"configurationChangedMessage",
+                     [](RecordingSource& s) {
+                         ConfigurationChangedMessage msg(Set<String>{"a", "b"});
+                         return s.onMessage(msg);
+                     },
+                     {"preMessageImpl", "configurationChangedImpl(2)", "postMessageImpl(0)"}},
+        SequenceCase{"otherMessage",
+                     [](RecordingSource& s) {
+                         WipeMessage msg;
+                         return s.onMessage(msg);
+                     },
+                     {"preMessageImpl", "postMessageImpl(0)"}}),
+    [](testing::TestParamInfo<SequenceCase> const& info) { return info.param.name; });
+
+TEST(BaseSourceTest, QueryMessageCarriesItsInteractiveFlagToTheHooks) {
+    RecordingSource source;
+    IQueryItems::StartQueryMessage msg;
+    msg.interactive = false;
+    ASSERT_TRUE(source.onMessage(msg).ok());
+    EXPECT_FALSE(source.lastInteractive);
+    msg.interactive = true;
+    ASSERT_TRUE(source.onMessage(msg).ok());
+    EXPECT_TRUE(source.lastInteractive);
+}
+
+TEST(BaseSourceTest, MessageWithAKnownNameButAnotherClassIsRefused) {
+    RecordingSource source;
+    IMessage impostor(ConfigurationChangedMessage::kType);
+    EXPECT_EQ(source.onMessage(impostor).code(), kInvalid);
+    EXPECT_EQ(source.log, (Log{"preMessageImpl", "postMessageImpl(2147483652)"}));
+}
+
+TEST(BaseSourceTest, DefaultsRefuseDataOperationsAndQueries) {
+    BaseSource plain("plain", "@test:/plain");
+    BaseSource::Record record;
+    GUID guid = GUID::generate();
+    EXPECT_EQ(plain.insert(record).code(), kDataOpNotSupported);
+    EXPECT_EQ(plain.update(record).code(), kDataOpNotSupported);
+    EXPECT_EQ(plain.remove(guid, false).code(), kDataOpNotSupported);
+    EXPECT_EQ(plain.markInvisible(guid).code(), kDataOpNotSupported);
+    EXPECT_EQ(plain.retrieve(guid, record, false).code(), kDataOpNotSupported);
+    IQueryItems::StartQueryMessage query;
+    EXPECT_EQ(plain.onMessage(query).code(), kNotSupported);
+    EXPECT_FALSE(query.cursor);
+    ConfigurationChangedMessage changed;
+    EXPECT_EQ(plain.onMessage(changed).code(), kSuccess);
+}
+
+TEST(ComponentTest, StateFollowsTheEntryPointsThatSucceeded) {
+    RecordingSource source;
+    EXPECT_EQ(source.state(), Component::State::Created);
+    source.answers["sendConfigImpl"] = TRELM_ERROR(kInvalid);
+    source.sendConfig(Configuration::Group("g"));
+    EXPECT_EQ(source.state(), Component::State::Created);
+    source.answers.clear();
+    source.sendConfig(Configuration::Group("g"));
+    EXPECT_EQ(source.state(), Component::State::Configured);
+    source.startup();
+    EXPECT_EQ(source.state(), Component::State::Started);
+    source.sendConfig(Configuration::Group("g"));
+    EXPECT_EQ(source.state(), Component::State::Started);
+    source.stop();
+    EXPECT_EQ(source.state(), Component::State::Stopped);
+    source.shutdown();
+    EXPECT_EQ(source.state(), Component::State::ShutDown);
+    EXPECT_EQ(source.name(), "source");
+    EXPECT_EQ(source.componentId(), "@test:/source");
+}
+
+class RecordingConnector : public BaseConnector {
+public:
+    RecordingConnector() : BaseConnector("connector", "@test:/connector") {}
+    Log log;
+    String wakeupAccount;
+
+protected:
+    uError walkImpl() override {
+        log.push_back("walkImpl");
+        return TRELM_OK();
+    }
+    uError wakeupImpl(WakeupMessage* msg) override {
+        log.push_back("wakeupImpl");
+        if (!msg->params.empty()) wakeupAccount = msg->params.begin()->first;
+        return TRELM_ERROR(kNoData);
+    }
+    uError preMessageImpl(IMessage&) override {
+        log.push_back("preMessageImpl");
+        return TRELM_OK();
+    }
+    uError postMessageImpl(IMessage&, uError const& result) override {
+        log.push_back("postMessageImpl(" + std::to_string(result.code()) + ")");
+        return TRELM_OK();
+    }
+};
+
+TEST(BaseConnectorTest, WakeupMessageReachesWakeupImplBetweenTheMessageHooks) {
+    RecordingConnector connector;
+    Map<String, String> params;
+    params.insert("source", "");
+    WakeupMessage msg(params);
+    EXPECT_EQ(connector.onMessage(msg).code(), kNoData);
+    EXPECT_EQ(connector.walk().code(), kSuccess);
+    EXPECT_EQ(connector.log, (Log{"preMessageImpl", "wakeupImpl", "postMessageImpl(1)", "walkImpl"}));
+    EXPECT_EQ(connector.wakeupAccount, "source");
+}
+
+TEST(BaseConnectorTest, ConnectorOperationsAreNotSupportedByDefault) {
+    BaseConnector plain("plain", "@test:/plain");
+    Map<String, String> params;
+    Vector<String> ids;
+    NetworkMetadata::tRELMNetworkPeer peer;
+    NetworkMetadata::tRELMNetworkEvent event;
+    Vector<NetworkMetadata::tRELMNetworkPeer> peers;
+    Vector<NetworkMetadata::tRELMNetworkEvent> events;
+    uError const results[] = {plain.makeConnection(params, false),
+                              plain.closeConnection(),
+                              plain.getPeers(ids),
+                              plain.getPeerInfo("1", peer),
+                              plain.getPeerInfoBatch(ids, peers),
+                              plain.getPeerStatus("1", event),
+                              plain.getPeerStatusBatch(ids, events),
+                              plain.setStatus("x"),
+                              plain.getPhotoAlbums(ids),
+                              plain.publishPhoto("file:///a.jpg", ""),
+                              plain.publishPhotoTo("1", "file:///a.jpg", "")};
+    for (uError const& e : results) EXPECT_EQ(e.code(), kNotSupported) << e;
+    WakeupMessage wakeup;
+    EXPECT_EQ(plain.onMessage(wakeup).code(), kSuccess);
+}
+
+}  // namespace
+}  // namespace trelm

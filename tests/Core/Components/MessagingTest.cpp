@@ -1,0 +1,180 @@
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+#include "Component.h"
+#include "ComponentRegistry.h"
+#include "GetRuntimeConfigurationMessage.h"
+#include "IMessage.h"
+#include "WipeMessage.h"
+
+namespace trelm {
+namespace {
+
+// Records every message it receives into a log shared by the test, as "name:type".
+class Recorder : public Component {
+public:
+    Recorder(String name, std::vector<std::string>& log, uError answer = uError())
+        : Component(name, "@test:/recorder"), log_(log), answer_(answer) {}
+
+protected:
+    uError handleMessage(IMessage& msg) override {
+        log_.push_back(name().str() + ":" + msg.type().str());
+        return answer_;
+    }
+
+private:
+    std::vector<std::string>& log_;
+    uError answer_;
+};
+
+class MessagingTest : public testing::Test {
+protected:
+    void SetUp() override { registry_.activate(); }
+
+    std::vector<std::string> log_;
+    ComponentRegistry registry_;
+};
+
+TEST_F(MessagingTest, TargetedMessageReachesOnlyThatComponentAndReturnsItsResult) {
+    Recorder a("a", log_), b("b", log_, TRELM_ERROR(kNotSignedIn));
+    ASSERT_TRUE(registry_.add("a", &a).ok());
+    ASSERT_TRUE(registry_.add("b", &b).ok());
+    WipeMessage msg;
+    EXPECT_EQ(msg.send("b").code(), kNotSignedIn);
+    EXPECT_EQ(log_, (std::vector<std::string>{"b:WipeMessage"}));
+}
+
+TEST_F(MessagingTest, UnknownTargetIsNotFound) {
+    Recorder a("a", log_);
+    registry_.add("a", &a);
+    WipeMessage msg;
+    EXPECT_EQ(msg.send("RuntimeConfiguration").code(), kNotFound);
+    EXPECT_TRUE(log_.empty());
+}
+
+TEST_F(MessagingTest, NoActiveRegistryIsNotFound) {
+    Recorder a("a", log_);
+    registry_.add("a", &a);
+    registry_.deactivate();
+    WipeMessage msg;
+    EXPECT_EQ(msg.send("a").code(), kNotFound);
+    EXPECT_EQ(msg.send("").code(), kNotFound);
+    EXPECT_TRUE(log_.empty());
+}
+
+TEST_F(MessagingTest, BroadcastReachesEveryoneInOrderAndReturnsTheFirstFailure) {
+    Recorder a("a", log_), b("b", log_, TRELM_ERROR(kInvalid)), c("c", log_),
+        d("d", log_, TRELM_ERROR(kFailure));
+    for (Recorder* r : {&c, &a, &b, &d}) ASSERT_TRUE(registry_.add(r->name(), r).ok());
+    WipeMessage msg;
+    EXPECT_EQ(msg.send("").code(), kInvalid);
+    EXPECT_EQ(log_, (std::vector<std::string>{"c:WipeMessage", "a:WipeMessage", "b:WipeMessage",
+                                              "d:WipeMessage"}));
+}
+
+TEST_F(MessagingTest, ReceiverAnswersThroughTheCallersMap) {
+    class Store : public Component {
+    public:
+        Store() : Component("RuntimeConfiguration", "@test:/store") {}
+
+    protected:
+        uError handleMessage(IMessage& msg) override {
+            auto* get = dynamic_cast<GetRuntimeConfigurationMessage*>(&msg);
+            if (get == nullptr) return TRELM_ERROR(kNotSupported);
+            if (get->tag != "source") return TRELM_ERROR(kNotFound);
+            if (Variant* v = get->values.search("facebook_source_lastuser")) *v = "1234";
+            return TRELM_OK();
+        }
+    } store;
+    registry_.add(store.name(), &store);
+    Map<String, Variant> values;
+    values.insert("facebook_source_lastuser", Variant());
+    values.insert("other", Variant());
+    GetRuntimeConfigurationMessage msg("source", values);
+    ASSERT_EQ(msg.send("RuntimeConfiguration").code(), kSuccess);
+    EXPECT_EQ(*values.search("facebook_source_lastuser"), Variant("1234"));
+    EXPECT_TRUE(values.search("other")->empty());
+}
+
+// On a WipeMessage, sends a second message to `next` (and to everyone), and registers a new
+// component, all from inside the handler: nothing may deadlock.
+class Forwarder : public Component {
+public:
+    Forwarder(String name, String next, std::vector<std::string>& log, ComponentRegistry& registry,
+              Component* late)
+        : Component(name, "@test:/forwarder"),
+          next_(next),
+          log_(log),
+          registry_(registry),
+          late_(late) {}
+
+protected:
+    uError handleMessage(IMessage& msg) override {
+        log_.push_back(name().str() + ":" + msg.type().str());
+        if (msg.type() != "WipeMessage") return TRELM_OK();
+        registry_.add(late_->name(), late_);
+        IMessage inner("Inner");
+        uError e = inner.send(next_);
+        if (e.failed()) return e;
+        IMessage everyone("Everyone");
+        return everyone.send("");
+    }
+
+private:
+    String next_;
+    std::vector<std::string>& log_;
+    ComponentRegistry& registry_;
+    Component* late_;
+};
+
+TEST_F(MessagingTest, HandlerMaySendAndRegisterReentrantly) {
+    Recorder late("late", log_);
+    Recorder b("b", log_);
+    Forwarder a("a", "b", log_, registry_, &late);
+    registry_.add("a", &a);
+    registry_.add("b", &b);
+    WipeMessage msg;
+    ASSERT_EQ(msg.send("a").code(), kSuccess);
+    EXPECT_EQ(log_, (std::vector<std::string>{"a:WipeMessage", "b:Inner", "a:Everyone",
+                                              "b:Everyone", "late:Everyone"}));
+}
+
+TEST(ComponentRegistryTest, NamesAreUniqueAndKeptInRegistrationOrder) {
+    std::vector<std::string> log;
+    Recorder a("a", log), b("b", log);
+    ComponentRegistry registry;
+    EXPECT_EQ(registry.add("z", &a).code(), kSuccess);
+    EXPECT_EQ(registry.add("y", &b).code(), kSuccess);
+    EXPECT_EQ(registry.add("z", &b).code(), kInvalid);
+    EXPECT_EQ(registry.add("", &b).code(), kInvalid);
+    EXPECT_EQ(registry.add("x", nullptr).code(), kInvalid);
+    EXPECT_EQ(registry.names(), (Vector<String>{"z", "y"}));
+    EXPECT_EQ(registry.find("z"), &a);
+    EXPECT_EQ(registry.remove("z").code(), kSuccess);
+    EXPECT_EQ(registry.remove("z").code(), kNotFound);
+    EXPECT_EQ(registry.find("z"), nullptr);
+    EXPECT_EQ(registry.add("z", &a).code(), kSuccess);
+    EXPECT_EQ(registry.names(), (Vector<String>{"y", "z"}));
+}
+
+TEST(ComponentRegistryTest, DestroyingTheActiveRegistryDeactivatesItOnly) {
+    ComponentRegistry outer;
+    outer.activate();
+    {
+        ComponentRegistry inner;
+        inner.activate();
+        EXPECT_EQ(ComponentRegistry::active(), &inner);
+    }
+    EXPECT_EQ(ComponentRegistry::active(), nullptr);
+    outer.activate();
+    {
+        ComponentRegistry idle;
+    }
+    EXPECT_EQ(ComponentRegistry::active(), &outer);
+    outer.deactivate();
+}
+
+}  // namespace
+}  // namespace trelm
