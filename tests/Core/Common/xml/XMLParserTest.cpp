@@ -1,0 +1,155 @@
+#include "trelm/XMLParser.h"
+
+#include <gtest/gtest.h>
+
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include "XmlFixtures.h"
+
+namespace trelm {
+namespace {
+
+// Records every callback with the path seen at that moment; consecutive chars() are merged so
+// the record does not depend on how expat splits text.
+class RecordingParser : public XMLParser {
+public:
+    std::vector<std::string> events;
+    // Fails the callback named "<kind>:<name>" (kind start, end or chars; chars by text).
+    std::string failOn;
+    unsigned failCode = kNotSupported;
+
+protected:
+    uError start(String const& name, Vector<String> const& attributes) override {
+        std::string e = "start " + name.str() + " @" + path().str();
+        for (unsigned i = 0; i + 1 < attributes.size(); i += 2) {
+            e += " " + attributes[i].str() + "=" + attributes[i + 1].str();
+        }
+        return record(e, "start:" + name.str());
+    }
+    uError end(String const& name) override {
+        return record("end " + name.str() + " @" + path().str(), "end:" + name.str());
+    }
+    uError chars(String const& text) override {
+        if (!events.empty() && events.back().rfind("chars ", 0) == 0) {
+            std::string& last = events.back();
+            std::size_t at = last.rfind(" @");
+            last.insert(at, text.str());
+        } else {
+            events.push_back("chars " + text.str() + " @" + path().str());
+        }
+        if (!failOn.empty() && failOn == "chars:" + text.str()) return TRELM_ERROR(failCode);
+        return TRELM_OK();
+    }
+
+private:
+    uError record(std::string event, std::string const& key) {
+        events.push_back(std::move(event));
+        if (key == failOn) return TRELM_ERROR(failCode);
+        return TRELM_OK();
+    }
+};
+
+TEST(XMLParserTest, PathIncludesElementAtStartAndExcludesItAtEnd) {
+    RecordingParser p;
+    uError e = p.runParser(String(
+        R"(<?xml version="1.0"?><error_response xmlns="http://api.facebook.com/1.0/" )"
+        R"(xmlns:xsi="http://www.w3.org/2001/XMLSchema-instance"><code>102</code>)"
+        R"(<x xsi:nil="true"/></error_response>)"));
+    ASSERT_EQ(e.code(), kSuccess) << e;
+    std::vector<std::string> want = {
+        "start error_response @.error_response xmlns=http://api.facebook.com/1.0/ "
+        "xmlns:xsi=http://www.w3.org/2001/XMLSchema-instance",
+        "start code @.error_response.code",
+        "chars 102 @.error_response.code",
+        "end code @.error_response",
+        "start x @.error_response.x xsi:nil=true",
+        "end x @.error_response",
+        "end error_response @",
+    };
+    EXPECT_EQ(p.events, want);
+    EXPECT_EQ(p.path(), "");
+}
+
+TEST(XMLParserTest, EntitiesAndCharacterReferencesArriveDecoded) {
+    RecordingParser p;
+    ASSERT_EQ(p.runParser(String("<a>x &amp; &lt;y&gt; &#x263A;&#233;</a>")).code(), kSuccess);
+    ASSERT_EQ(p.events.size(), 3u);
+    EXPECT_EQ(p.events[1], "chars x & <y> \xE2\x98\xBA\xC3\xA9 @.a");
+}
+
+struct StopCase {
+    char const* failOn;
+    std::vector<std::string> events;  // everything recorded, the failing callback last
+};
+
+void PrintTo(StopCase const& c, std::ostream* os) { *os << c.failOn; }
+
+class XMLParserStopTest : public ::testing::TestWithParam<StopCase> {};
+
+TEST_P(XMLParserStopTest, FailingCallbackStopsParseWithItsOwnError) {
+    RecordingParser p;
+    p.failOn = GetParam().failOn;
+    uError e = p.runParser(String("<r><a>one</a><b>two</b><c/></r>"));
+    EXPECT_EQ(e.code(), kNotSupported) << e;
+    EXPECT_EQ(p.events, GetParam().events);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Callbacks, XMLParserStopTest,
+    ::testing::Values(
+        StopCase{"start:b", {"start r @.r", "start a @.r.a", "chars one @.r.a", "end a @.r", "start b @.r.b"}},
+        StopCase{"end:a", {"start r @.r", "start a @.r.a", "chars one @.r.a", "end a @.r"}},
+        StopCase{"chars:one", {"start r @.r", "start a @.r.a", "chars one @.r.a"}},
+        StopCase{"end:r",
+                 {"start r @.r", "start a @.r.a", "chars one @.r.a", "end a @.r", "start b @.r.b",
+                  "chars two @.r.b", "end b @.r", "start c @.r.c", "end c @.r", "end r @"}}));
+
+TEST(XMLParserTest, RunAfterAbortedRunStartsWithEmptyPath) {
+    RecordingParser p;
+    p.failOn = "start:deep";
+    EXPECT_EQ(p.runParser(String("<r><s><deep/></s></r>")).code(), kNotSupported);
+    p.failOn.clear();
+    p.events.clear();
+    ASSERT_EQ(p.runParser(String("<other/>")).code(), kSuccess);
+    EXPECT_EQ(p.events, (std::vector<std::string>{"start other @.other", "end other @"}));
+}
+
+TEST(XMLParserTest, MalformedDocumentReportsFailureWithExpatPosition) {
+    RecordingParser p;
+    uError e = p.runParser(String("<a>\n<b></a>"));
+    EXPECT_EQ(e.code(), kFailure);
+    EXPECT_NE(e.message().str().find("line 2"), std::string::npos) << e;
+    EXPECT_NE(e.message().str().find("mismatched tag"), std::string::npos) << e;
+}
+
+TEST(XMLParserTest, IsNilAcceptsAnyPrefixAndTrueOrOne) {
+    struct Case {
+        Vector<String> attributes;
+        bool nil;
+    } cases[] = {
+        {{"xsi:nil", "true"}, true},
+        {{"list", "true", "i:nil", "1"}, true},
+        {{"nil", "true"}, true},
+        {{"xsi:nil", "false"}, false},
+        {{"xsi:nilx", "true"}, false},
+        {{"true", "xsi:nil"}, false},
+        {{}, false},
+    };
+    for (auto const& c : cases) {
+        EXPECT_EQ(XMLParser::isNil(c.attributes), c.nil) << c.attributes.size();
+    }
+}
+
+TEST(XMLParserTest, LargeAnswerWithManyTextChunksIsReadWhole) {
+    // Text longer than expat's internal buffer arrives in several chars() calls.
+    std::string big(200000, 'x');
+    RecordingParser p;
+    ASSERT_EQ(p.runParser(String("<a>" + big + "</a>")).code(), kSuccess);
+    ASSERT_EQ(p.events.size(), 3u);
+    EXPECT_EQ(p.events[1], "chars " + big + " @.a");
+}
+
+}  // namespace
+}  // namespace trelm
