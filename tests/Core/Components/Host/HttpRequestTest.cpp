@@ -1,0 +1,339 @@
+#include "trelm/HttpRequest.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <fstream>
+#include <set>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "CertificateAuthority.h"
+#include "HttpRequestFactory.h"
+#include "LoopbackServer.h"
+#include "TempDir.h"
+
+namespace trelm {
+namespace {
+
+using test::LoopbackServer;
+using test::TempDir;
+
+// One POST through `request`; returns the sendRequest result and fills status and body when the
+// exchange completed.
+uError post(HttpRequest& request, std::string const& url, Map<String, String> const& fields,
+            int& status, std::string& body, SmartPtr<InputDataStream> upload = {}) {
+    uError e = request.setup(String(url));
+    if (e.ok()) e = request.setPostData(fields);
+    if (e.ok() && upload) e = request.setUploadData(upload);
+    if (e.ok()) e = request.sendRequest();
+    if (e.failed()) return e;
+    String data;
+    EXPECT_EQ(request.getResponseCode(status).code(), kSuccess);
+    EXPECT_EQ(request.getResponseData(data).code(), kSuccess);
+    body = data.str();
+    return request.disconnect();
+}
+
+SmartPtr<HttpRequest> newRequest(HttpRequestFactory& factory) {
+    SmartPtr<HttpRequest> r;
+    EXPECT_EQ(factory.createRequest(r).code(), kSuccess);
+    return r;
+}
+
+// --- plain HTTP ---------------------------------------------------------------------------
+
+struct StatusCase {
+    int sent;
+    bool completes;  // a 1xx status can't be a final answer
+};
+
+void PrintTo(StatusCase const& c, std::ostream* os) { *os << c.sent; }
+
+class HttpStatusTest : public ::testing::TestWithParam<StatusCase> {};
+
+TEST_P(HttpStatusTest, StatusReachesCallerAsSent) {
+    LoopbackServer server;
+    HttpRequestFactory factory;
+    ASSERT_EQ(factory.setTimeoutMs(5000).code(), kSuccess);
+    SmartPtr<HttpRequest> r = newRequest(factory);
+    int status = 0;
+    std::string body;
+    uError e = post(*r, server.url("/status/" + std::to_string(GetParam().sent)), {}, status, body);
+    if (GetParam().completes) {
+        ASSERT_EQ(e.code(), kSuccess) << e;
+        EXPECT_EQ(status, GetParam().sent);
+        EXPECT_EQ(body, "status " + std::to_string(GetParam().sent));
+    } else {
+        EXPECT_EQ(e.code(), kFailure) << e;
+        int code = 0;
+        EXPECT_EQ(r->getResponseCode(code).code(), kInvalid);
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Statuses, HttpStatusTest,
+                         ::testing::Values(StatusCase{199, false}, StatusCase{200, true}, StatusCase{299, true},
+                                           StatusCase{300, true}, StatusCase{404, true}, StatusCase{503, true}));
+
+TEST(HttpRequestTest, FormFieldsArriveIntact) {
+    LoopbackServer server;
+    Map<String, String> fields{
+        {"method", "facebook.users.setStatus"},
+        {"status", "Gr\xC3\xBC\xC3\x9F" "e & =+ ? % #1 \xE2\x98\xBA"},
+        {"query", "SELECT uid FROM user WHERE name = 'a+b' AND x=\"1&2\""},
+        {"empty", ""},
+        {"a key&=", "v"},
+        {"lines", "one\r\ntwo\n"},
+    };
+    HttpRequest r;  // default settings, private connections
+    int status = 0;
+    std::string body;
+    ASSERT_EQ(post(r, server.url("/echo"), fields, status, body).code(), kSuccess);
+    auto seen = server.requests();
+    ASSERT_EQ(seen.size(), 1u);
+    EXPECT_EQ(seen[0].contentType, "application/x-www-form-urlencoded");
+    std::map<std::string, std::string> want;
+    for (auto const& [k, v] : fields) want[k.str()] = v.str();
+    EXPECT_EQ(seen[0].params, want);
+}
+
+TEST(HttpRequestTest, MultipartUploadArrivesWhole) {
+    TempDir dir;
+    std::string image;
+    for (int round = 0; round < 300; ++round) {
+        for (int b = 0; b < 256; ++b) image.push_back(static_cast<char>(b));  // NULs included
+    }
+    std::string path = dir.file("holiday photo.jpg");
+    std::ofstream(path, std::ios::binary) << image;
+
+    auto upload = makeSmart<InputDataStream>();
+    std::string uri = "file://" + dir.path() + "/holiday%20photo.jpg";
+    ASSERT_EQ(upload->setUri(String(uri)).code(), kSuccess);
+    EXPECT_EQ(upload->path(), path);
+
+    LoopbackServer server;
+    HttpRequestFactory factory;
+    SmartPtr<HttpRequest> r = newRequest(factory);
+    int status = 0;
+    std::string body;
+    Map<String, String> fields{{"method", "photos.upload"}, {"caption", "See & say \xE2\x98\xBA"}, {"aid", ""}};
+    ASSERT_EQ(post(*r, server.url("/echo"), fields, status, body, upload).code(), kSuccess);
+    EXPECT_EQ(status, 200);
+
+    auto seen = server.requests();
+    ASSERT_EQ(seen.size(), 1u);
+    EXPECT_EQ(seen[0].contentType.rfind("multipart/form-data", 0), 0u) << seen[0].contentType;
+    auto const& parts = seen[0].parts;
+    ASSERT_EQ(parts.size(), 4u);
+    EXPECT_EQ(parts.at("method").content, "photos.upload");
+    EXPECT_EQ(parts.at("caption").content, "See & say \xE2\x98\xBA");
+    EXPECT_EQ(parts.at("aid").content, "");
+    EXPECT_EQ(parts.at("file").filename, "holiday photo.jpg");
+    EXPECT_EQ(parts.at("file").content.size(), image.size());
+    EXPECT_TRUE(parts.at("file").content == image);
+}
+
+TEST(HttpRequestTest, UnreadableUploadFailsWithoutSendingAnything) {
+    LoopbackServer server;
+    auto upload = makeSmart<InputDataStream>();
+    ASSERT_EQ(upload->setUri("/nonexistent/dir/photo.jpg").code(), kSuccess);
+    HttpRequest r;
+    int status = 0;
+    std::string body;
+    EXPECT_EQ(post(r, server.url("/echo"), {{"a", "b"}}, status, body, upload).code(), kFailure);
+    EXPECT_TRUE(server.requests().empty());
+}
+
+TEST(HttpRequestTest, ServerThatNeverAnswersIsCutOffByTimeout) {
+    LoopbackServer server;
+    HttpRequestFactory factory;
+    ASSERT_EQ(factory.setTimeoutMs(300).code(), kSuccess);
+    SmartPtr<HttpRequest> r = newRequest(factory);
+    int status = 0;
+    std::string body;
+    uError e = post(*r, server.url("/hang"), {}, status, body);
+    EXPECT_EQ(e.code(), kFailure);
+    EXPECT_NE(e.message().str().find("imeout"), std::string::npos) << e;
+    server.release();
+}
+
+TEST(HttpRequestTest, ClosedPortFails) {
+    int port = 0;
+    {
+        LoopbackServer gone;
+        port = gone.port();
+    }
+    HttpRequest r;
+    int status = 0;
+    std::string body;
+    EXPECT_EQ(post(r, "http://127.0.0.1:" + std::to_string(port) + "/echo", {}, status, body).code(), kFailure);
+}
+
+TEST(HttpRequestTest, CallsOutOfOrderAreRefused) {
+    HttpRequest r;
+    int code = 0;
+    String data;
+    EXPECT_EQ(r.sendRequest().code(), kInvalid);
+    EXPECT_EQ(r.setup("").code(), kInvalid);
+    ASSERT_EQ(r.setup("http://127.0.0.1:1/").code(), kSuccess);
+    EXPECT_EQ(r.getResponseCode(code).code(), kInvalid);
+    EXPECT_EQ(r.getResponseData(data).code(), kInvalid);
+}
+
+// --- connection reuse -------------------------------------------------------------------------
+
+class TlsFixture : public ::testing::Test {
+protected:
+    static void SetUpTestSuite() {
+        dir_ = new TempDir();
+        std::string error;
+        ok_ = emu::makeTlsFiles(dir_->path(), {"api.facebook.com", "localhost"}, files_, error);
+        ASSERT_TRUE(ok_) << error;
+        std::filesystem::create_directory(dir_->file("other"));
+        ok_ = emu::makeTlsFiles(dir_->file("other"), {"api.facebook.com"}, otherFiles_, error);
+        ASSERT_TRUE(ok_) << error;
+    }
+    static void TearDownTestSuite() {
+        delete dir_;
+        dir_ = nullptr;
+    }
+    void SetUp() override { ASSERT_TRUE(ok_); }
+
+    static inline TempDir* dir_ = nullptr;
+    static inline bool ok_ = false;
+    static inline emu::TlsFiles files_;       // the server's certificate and its CA
+    static inline emu::TlsFiles otherFiles_;  // a CA nobody's server uses
+};
+
+class ConnectionReuseTest : public TlsFixture, public ::testing::WithParamInterface<bool> {
+protected:
+    std::unique_ptr<LoopbackServer> makeServer() {
+        if (GetParam()) return std::make_unique<LoopbackServer>(files_.certPath, files_.keyPath);
+        return std::make_unique<LoopbackServer>();
+    }
+};
+
+TEST_P(ConnectionReuseTest, RequestsOfOneFactoryShareOneConnectionAcrossDisconnect) {
+    auto server = makeServer();
+    HttpRequestFactory factory;
+    factory.setCaFile(String(files_.caCertPath));
+    for (int i = 0; i < 3; ++i) {
+        SmartPtr<HttpRequest> r = newRequest(factory);  // a new request object every time
+        int status = 0;
+        std::string body;
+        ASSERT_EQ(post(*r, server->url("/echo"), {{"echo", "x"}}, status, body).code(), kSuccess);
+        EXPECT_EQ(body, "x");
+    }
+    auto seen = server->requests();
+    ASSERT_EQ(seen.size(), 3u);
+    EXPECT_EQ(seen[1].remotePort, seen[0].remotePort);
+    EXPECT_EQ(seen[2].remotePort, seen[0].remotePort);
+}
+
+TEST_P(ConnectionReuseTest, RequestsWithPrivateConnectionsConnectAgain) {
+    // The counterpart of the test above: shows that remote ports do tell connections apart.
+    auto server = makeServer();
+    HttpRequest::Settings settings;
+    settings.caFile = String(files_.caCertPath);
+    for (int i = 0; i < 2; ++i) {
+        HttpRequest r(settings, {});
+        int status = 0;
+        std::string body;
+        ASSERT_EQ(post(r, server->url("/echo"), {}, status, body).code(), kSuccess);
+    }
+    auto seen = server->requests();
+    ASSERT_EQ(seen.size(), 2u);
+    EXPECT_NE(seen[1].remotePort, seen[0].remotePort);
+}
+
+INSTANTIATE_TEST_SUITE_P(PlainAndTls, ConnectionReuseTest, ::testing::Bool(),
+                         [](auto const& info) { return info.param ? "Tls" : "Plain"; });
+
+// --- TLS and connect-to -----------------------------------------------------------------------
+
+class HttpsTest : public TlsFixture {};
+
+TEST_F(HttpsTest, ServiceHostNameIsSentToLoopbackOverPlainAndTls) {
+    LoopbackServer plain;
+    LoopbackServer tls(files_.certPath, files_.keyPath);
+    HttpRequestFactory factory;
+    Configuration::Group group(
+        "HttpRequestFactory",
+        {{"ca_file", Variant(String(files_.caCertPath))},
+         {"connect_to", Variant(Vector<String>{
+                            String("api.facebook.com:80:127.0.0.1:" + std::to_string(plain.port())),
+                            String("api.facebook.com:443:127.0.0.1:" + std::to_string(tls.port()))})}});
+    ASSERT_EQ(factory.sendConfig(group).code(), kSuccess);
+
+    for (char const* url : {"http://api.facebook.com/echo", "https://api.facebook.com/echo"}) {
+        SmartPtr<HttpRequest> r = newRequest(factory);
+        int status = 0;
+        std::string body;
+        ASSERT_EQ(post(*r, url, {{"echo", url}}, status, body).code(), kSuccess) << url;
+        EXPECT_EQ(body, url);
+    }
+    ASSERT_EQ(plain.requests().size(), 1u);
+    ASSERT_EQ(tls.requests().size(), 1u);
+    EXPECT_EQ(plain.requests()[0].host, "api.facebook.com");
+    EXPECT_EQ(tls.requests()[0].host, "api.facebook.com");
+}
+
+TEST_F(HttpsTest, UntrustedOrMisnamedCertificateIsRefused) {
+    LoopbackServer tls(files_.certPath, files_.keyPath);
+    std::string const port = std::to_string(tls.port());
+    struct Case {
+        char const* what;
+        std::string caFile;
+        std::string url;
+        std::string connectTo;
+    } cases[] = {
+        {"certificate of another CA", otherFiles_.caCertPath, "https://api.facebook.com/echo",
+         "api.facebook.com:443:127.0.0.1:" + port},
+        {"system store", "", "https://api.facebook.com/echo", "api.facebook.com:443:127.0.0.1:" + port},
+        {"name not in certificate", files_.caCertPath, "https://other.example/echo",
+         "other.example:443:127.0.0.1:" + port},
+    };
+    for (auto const& c : cases) {
+        HttpRequestFactory factory;
+        factory.setCaFile(String(c.caFile));
+        factory.setConnectTo({String(c.connectTo)});
+        SmartPtr<HttpRequest> r = newRequest(factory);
+        int status = 0;
+        std::string body;
+        EXPECT_EQ(post(*r, c.url, {{"password", "secret"}}, status, body).code(), kFailure) << c.what;
+    }
+    EXPECT_TRUE(tls.requests().empty());
+}
+
+TEST_F(HttpsTest, ManyThreadsRunRequestsOfOneFactoryAtOnce) {
+    LoopbackServer tls(files_.certPath, files_.keyPath);
+    LoopbackServer plain;
+    HttpRequestFactory factory;
+    factory.setCaFile(String(files_.caCertPath));
+    constexpr int kThreads = 4;
+    constexpr int kRequests = 15;
+    std::atomic<int> wrong{0};
+    std::vector<std::thread> threads;
+    for (int t = 0; t < kThreads; ++t) {
+        threads.emplace_back([&, t] {
+            for (int i = 0; i < kRequests; ++i) {
+                LoopbackServer& server = (i % 2 == 0) ? tls : plain;
+                std::string tag = std::to_string(t) + "-" + std::to_string(i);
+                SmartPtr<HttpRequest> r = newRequest(factory);
+                int status = 0;
+                std::string body;
+                if (post(*r, server.url("/echo"), {{"echo", String(tag)}}, status, body).failed() ||
+                    status != 200 || body != tag) {
+                    ++wrong;
+                }
+            }
+        });
+    }
+    for (auto& th : threads) th.join();
+    EXPECT_EQ(wrong.load(), 0);
+    EXPECT_EQ(tls.requests().size() + plain.requests().size(), size_t(kThreads * kRequests));
+}
+
+}  // namespace
+}  // namespace trelm
