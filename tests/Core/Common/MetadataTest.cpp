@@ -43,12 +43,5 @@ TEST(MetadataTest, SecondRegistrationOfANameKeepsTheFirstType) {
     EXPECT_EQ(type, TRELM_TYPES::STRING);
 }
 
-TEST(MetadataTest, KeysOrderByNameThenType) {
-    using Metadata::Key;
-    EXPECT_TRUE(Key("a", TRELM_TYPES::INT64) < Key("b", TRELM_TYPES::GUID_TYPE));
-    EXPECT_TRUE(Key("a", TRELM_TYPES::STRING) < Key("a", TRELM_TYPES::INT32));
-    EXPECT_FALSE(Key("a", TRELM_TYPES::STRING) == Key("a", TRELM_TYPES::INT32));
-}
-
 }  // namespace
 }  // namespace trelm

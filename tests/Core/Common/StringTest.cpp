@@ -107,14 +107,5 @@ INSTANTIATE_TEST_SUITE_P(
                     ParseCase{"1.5", false, 0, false, 0}, ParseCase{"0x10", false, 0, false, 0},
                     ParseCase{"99999999999999999999", false, 0, false, 0}));
 
-TEST(StringTest, ConcatenationMixesStringsAndLiterals) {
-    String s = String("a") + "b" + String("c");
-    s += "d";
-    s += String("e");
-    s += 'f';
-    EXPECT_EQ(s, "abcdef");
-    EXPECT_EQ("x" + String("y"), "xy");
-}
-
 }  // namespace
 }  // namespace trelm
