@@ -113,17 +113,6 @@ TEST(ListHashParseObjTest, InboxAnswerGivesOneRecordPerThread) {
                            }));
 }
 
-TEST(ListHashParseObjTest, ThreadMessagesAnswerKeepsBodiesAndFlags) {
-    Rows rows;
-    ListHashParseObj p("mailbox_getThreadMessages_response");
-    ASSERT_EQ(p.parse(loadXml("mailbox_getThreadMessages_response.xml"), rows).code(), kSuccess);
-    ASSERT_EQ(rows.size(), 2u);
-    EXPECT_EQ(*rows[0].search("body"), "Sounds good \xE2\x80\x94 8pm?");
-    EXPECT_EQ(*rows[0].search("has_attachment"), "false");
-    EXPECT_EQ(*rows[1].search("mid"), "3001_3");
-    EXPECT_EQ(*rows[1].search("has_attachment"), "true");
-}
-
 // --- FqlParseObj ----------------------------------------------------------------------------
 
 TEST(FqlParseObjTest, NestedFieldsAreDottedNilFieldsAbsentEmptyFieldsEmpty) {

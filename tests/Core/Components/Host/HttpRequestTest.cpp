@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <filesystem>
 #include <fstream>
 #include <set>
 #include <string>
@@ -154,31 +155,8 @@ TEST(HttpRequestTest, ServerThatNeverAnswersIsCutOffByTimeout) {
     std::string body;
     uError e = post(*r, server.url("/hang"), {}, status, body);
     EXPECT_EQ(e.code(), kFailure);
-    EXPECT_NE(e.message().str().find("imeout"), std::string::npos) << e;
+    EXPECT_NE(e.message().str().find("timed out"), std::string::npos) << e;
     server.release();
-}
-
-TEST(HttpRequestTest, ClosedPortFails) {
-    int port = 0;
-    {
-        LoopbackServer gone;
-        port = gone.port();
-    }
-    HttpRequest r;
-    int status = 0;
-    std::string body;
-    EXPECT_EQ(post(r, "http://127.0.0.1:" + std::to_string(port) + "/echo", {}, status, body).code(), kFailure);
-}
-
-TEST(HttpRequestTest, CallsOutOfOrderAreRefused) {
-    HttpRequest r;
-    int code = 0;
-    String data;
-    EXPECT_EQ(r.sendRequest().code(), kInvalid);
-    EXPECT_EQ(r.setup("").code(), kInvalid);
-    ASSERT_EQ(r.setup("http://127.0.0.1:1/").code(), kSuccess);
-    EXPECT_EQ(r.getResponseCode(code).code(), kInvalid);
-    EXPECT_EQ(r.getResponseData(data).code(), kInvalid);
 }
 
 // --- connection reuse -------------------------------------------------------------------------

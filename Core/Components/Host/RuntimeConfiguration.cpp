@@ -1,0 +1,259 @@
+#include "RuntimeConfiguration.h"
+
+#include <fcntl.h>
+#include <sqlite3.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+
+#include "GetRuntimeConfigurationMessage.h"
+#include "ResetRuntimeConfigurationMessage.h"
+#include "RuntimeConfigurationMessage.h"
+
+namespace trelm {
+
+namespace {
+
+char const kMemory[] = ":memory:";
+
+uError sqliteError(sqlite3* db, char const* what) {
+    String text = String(what) + ": " + (db != nullptr ? sqlite3_errmsg(db) : "out of memory");
+    return TRELM_ERROR_MSG(kFailure, text);
+}
+
+// A prepared statement, finalised when it goes out of scope.
+struct Statement {
+    sqlite3_stmt* stmt = nullptr;
+    ~Statement() { sqlite3_finalize(stmt); }
+};
+
+uError exec(sqlite3* db, char const* sql) {
+    if (sqlite3_exec(db, sql, nullptr, nullptr, nullptr) != SQLITE_OK) return sqliteError(db, sql);
+    return TRELM_OK();
+}
+
+// One transaction per message: rolled back unless committed.
+struct Transaction {
+    sqlite3* db;
+    bool open = false;
+    ~Transaction() {
+        if (open) sqlite3_exec(db, "ROLLBACK", nullptr, nullptr, nullptr);
+    }
+    uError begin(char const* sql) {
+        uError e = exec(db, sql);
+        open = e.ok();
+        return e;
+    }
+    uError commit() {
+        uError e = exec(db, "COMMIT");
+        if (e.ok()) open = false;
+        return e;
+    }
+};
+
+uError prepare(sqlite3* db, char const* sql, Statement& st) {
+    if (sqlite3_prepare_v2(db, sql, -1, &st.stmt, nullptr) != SQLITE_OK) return sqliteError(db, "prepare");
+    return TRELM_OK();
+}
+
+uError bindText(sqlite3* db, sqlite3_stmt* stmt, int index, String const& text) {
+    if (sqlite3_bind_text(stmt, index, text.cStr(), static_cast<int>(text.size()), SQLITE_TRANSIENT) !=
+        SQLITE_OK) {
+        return sqliteError(db, "bind");
+    }
+    return TRELM_OK();
+}
+
+// Creates the file with mode 0600 before SQLite opens it (SQLite would create it 0644 minus the
+// umask) and narrows an existing file to 0600.
+uError createPrivateFile(String const& path) {
+    int fd = ::open(path.cStr(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600);
+    if (fd < 0) {
+        return TRELM_ERROR_MSG(kFailure, "cannot create " + path + ": " + std::strerror(errno));
+    }
+    struct stat st {};
+    uError result = TRELM_OK();
+    if (::fstat(fd, &st) != 0) {
+        result = TRELM_ERROR_MSG(kFailure, "cannot stat " + path + ": " + std::strerror(errno));
+    } else if ((st.st_mode & 07777) != 0600 && ::fchmod(fd, 0600) != 0) {
+        result = TRELM_ERROR_MSG(kFailure, "cannot make " + path + " private: " + std::strerror(errno));
+    }
+    ::close(fd);
+    return result;
+}
+
+}  // namespace
+
+RuntimeConfiguration::RuntimeConfiguration(String name, String componentId)
+    : Component(std::move(name), std::move(componentId)) {}
+
+RuntimeConfiguration::~RuntimeConfiguration() { closeLocked(); }
+
+uError RuntimeConfiguration::open(String const& path) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return openLocked(path);
+}
+
+void RuntimeConfiguration::close() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    closeLocked();
+    openFailed_ = false;
+}
+
+void RuntimeConfiguration::closeLocked() {
+    if (db_ != nullptr) sqlite3_close_v2(db_);
+    db_ = nullptr;
+    path_ = String();
+}
+
+uError RuntimeConfiguration::openLocked(String const& path) {
+    closeLocked();
+    openFailed_ = true;
+    if (path.empty()) return TRELM_ERROR_MSG(kInvalid, "empty store path");
+    if (path != kMemory) {
+        uError e = createPrivateFile(path);
+        if (e.failed()) return e;
+    }
+    sqlite3* db = nullptr;
+    int rc = sqlite3_open_v2(path.cStr(), &db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE, nullptr);
+    if (rc != SQLITE_OK) {
+        uError e = sqliteError(db, "cannot open the runtime configuration store");
+        sqlite3_close_v2(db);
+        return e;
+    }
+    sqlite3_busy_timeout(db, 5000);
+    uError e = exec(db,
+                    "CREATE TABLE IF NOT EXISTS runtime_configuration ("
+                    " tag TEXT NOT NULL, key TEXT NOT NULL, value TEXT NOT NULL,"
+                    " PRIMARY KEY (tag, key)) WITHOUT ROWID");
+    if (e.failed()) {
+        sqlite3_close_v2(db);
+        return e;
+    }
+    db_ = db;
+    path_ = path;
+    openFailed_ = false;
+    return TRELM_OK();
+}
+
+uError RuntimeConfiguration::ensureOpenLocked() {
+    if (db_ != nullptr) return TRELM_OK();
+    if (openFailed_) return TRELM_ERROR_MSG(kFailure, "the runtime configuration store is not open");
+    return openLocked(String(kMemory));
+}
+
+uError RuntimeConfiguration::store(String const& tag, Set<Configuration::Value> const& values) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    uError e = ensureOpenLocked();
+    if (e.failed()) return e;
+    Transaction tx{db_};
+    e = tx.begin("BEGIN IMMEDIATE");
+    if (e.failed()) return e;
+    Statement st;
+    e = prepare(db_, "INSERT OR REPLACE INTO runtime_configuration (tag, key, value) VALUES (?1, ?2, ?3)", st);
+    if (e.failed()) return e;
+    for (Configuration::Value const& value : values) {
+        String text;
+        e = value.value().as(text);
+        if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "value of " + value.key() + " has no text form");
+        sqlite3_reset(st.stmt);
+        e = bindText(db_, st.stmt, 1, tag);
+        if (e.ok()) e = bindText(db_, st.stmt, 2, value.key());
+        if (e.ok()) e = bindText(db_, st.stmt, 3, text);
+        if (e.failed()) return e;
+        if (sqlite3_step(st.stmt) != SQLITE_DONE) return sqliteError(db_, "store");
+    }
+    return tx.commit();
+}
+
+uError RuntimeConfiguration::reset(String const& tag, Set<String> const& keys) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    uError e = ensureOpenLocked();
+    if (e.failed()) return e;
+    Transaction tx{db_};
+    e = tx.begin("BEGIN IMMEDIATE");
+    if (e.failed()) return e;
+    Statement st;
+    e = prepare(db_, "DELETE FROM runtime_configuration WHERE tag = ?1 AND key = ?2", st);
+    if (e.failed()) return e;
+    for (String const& key : keys) {
+        sqlite3_reset(st.stmt);
+        e = bindText(db_, st.stmt, 1, tag);
+        if (e.ok()) e = bindText(db_, st.stmt, 2, key);
+        if (e.failed()) return e;
+        if (sqlite3_step(st.stmt) != SQLITE_DONE) return sqliteError(db_, "reset");
+    }
+    return tx.commit();
+}
+
+uError RuntimeConfiguration::get(String const& tag, Map<String, Variant>& values) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    uError e = ensureOpenLocked();
+    if (e.failed()) return e;
+    Statement st;
+    e = prepare(db_, "SELECT value FROM runtime_configuration WHERE tag = ?1 AND key = ?2", st);
+    if (e.failed()) return e;
+    // Read everything first so that a failure leaves the caller's map untouched.
+    Map<String, Variant> found;
+    Transaction tx{db_};
+    e = tx.begin("BEGIN");
+    if (e.failed()) return e;
+    for (auto const& entry : values) {
+        sqlite3_reset(st.stmt);
+        e = bindText(db_, st.stmt, 1, tag);
+        if (e.ok()) e = bindText(db_, st.stmt, 2, entry.first);
+        if (e.failed()) return e;
+        int rc = sqlite3_step(st.stmt);
+        if (rc == SQLITE_ROW) {
+            auto const* text = reinterpret_cast<char const*>(sqlite3_column_text(st.stmt, 0));
+            int size = sqlite3_column_bytes(st.stmt, 0);
+            e = found.insert(entry.first, Variant(String(text != nullptr ? text : "", static_cast<unsigned>(size))));
+            if (e.failed()) return e;
+        } else if (rc != SQLITE_DONE) {
+            return sqliteError(db_, "get");
+        }
+    }
+    e = tx.commit();
+    if (e.failed()) return e;
+    for (auto const& [key, value] : found) {
+        e = values.insert(key, value);
+        if (e.failed()) return e;
+    }
+    return TRELM_OK();
+}
+
+uError RuntimeConfiguration::sendConfigImpl(Configuration::Group const& group) {
+    String path(kMemory);
+    Variant v = group.get(String("path"));
+    if (!v.empty()) {
+        uError e = v.as(path);
+        if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "configuration key path is not a string");
+    }
+    std::lock_guard<std::mutex> lock(mutex_);
+    // Configuring the same store again keeps it open (and an in-memory store's values alive).
+    if (db_ != nullptr && path == path_) return TRELM_OK();
+    return openLocked(path);
+}
+
+uError RuntimeConfiguration::handleMessage(IMessage& msg) {
+    if (msg.type() == RuntimeConfigurationMessage::kType) {
+        auto* m = dynamic_cast<RuntimeConfigurationMessage*>(&msg);
+        if (m == nullptr) return TRELM_ERROR(kInvalid);
+        return store(m->tag, m->values);
+    }
+    if (msg.type() == ResetRuntimeConfigurationMessage::kType) {
+        auto* m = dynamic_cast<ResetRuntimeConfigurationMessage*>(&msg);
+        if (m == nullptr) return TRELM_ERROR(kInvalid);
+        return reset(m->tag, m->keys);
+    }
+    if (msg.type() == GetRuntimeConfigurationMessage::kType) {
+        auto* m = dynamic_cast<GetRuntimeConfigurationMessage*>(&msg);
+        if (m == nullptr) return TRELM_ERROR(kInvalid);
+        return get(m->tag, m->values);
+    }
+    return TRELM_OK();
+}
+
+}  // namespace trelm

@@ -1,0 +1,65 @@
+#include "HttpRequestFactory.h"
+
+#include <gtest/gtest.h>
+
+#include "ComponentRegistry.h"
+#include "HttpObjectRequestMessage.h"
+
+namespace trelm {
+namespace {
+
+TEST(HttpRequestFactoryTest, RequestMessageIsAnsweredWithANewRequest) {
+    HttpRequestFactory factory;
+    ComponentRegistry registry;
+    ASSERT_EQ(registry.add(factory.name(), &factory).code(), kSuccess);
+    registry.activate();
+
+    IHttpRequestFactory::HttpObjectRequestMessage first;
+    IHttpRequestFactory::HttpObjectRequestMessage second;
+    ASSERT_EQ(first.send("HttpRequestFactory").code(), kSuccess);
+    ASSERT_EQ(second.send("HttpRequestFactory").code(), kSuccess);
+    ASSERT_TRUE(first.request);
+    ASSERT_TRUE(second.request);
+    EXPECT_NE(first.request.get(), second.request.get());
+    EXPECT_EQ(first.request.useCount(), 1);
+}
+
+TEST(HttpRequestFactoryTest, ConfigurationSetsEveryKey) {
+    HttpRequestFactory factory;
+    Configuration::Group group("HttpRequestFactory",
+                               {{"connect_timeout_ms", Variant(250)},
+                                {"timeout_ms", Variant("1500")},
+                                {"ca_file", Variant("/etc/ca.pem")},
+                                {"connect_to", Variant("api.facebook.com:80:127.0.0.1:8080")}});
+    ASSERT_EQ(factory.sendConfig(group).code(), kSuccess);
+    HttpRequest::Settings s = factory.settings();
+    EXPECT_EQ(s.connectTimeoutMs, 250);
+    EXPECT_EQ(s.timeoutMs, 1500);
+    EXPECT_EQ(s.caFile, "/etc/ca.pem");
+    EXPECT_EQ(s.connectTo, Vector<String>{"api.facebook.com:80:127.0.0.1:8080"});
+}
+
+TEST(HttpRequestFactoryTest, BadValueFailsConfigurationAndChangesNothing) {
+    struct Case {
+        char const* key;
+        Variant value;
+    } cases[] = {
+        {"connect_timeout_ms", Variant(0)},
+        {"timeout_ms", Variant(-5)},
+        {"timeout_ms", Variant("soon")},
+        {"ca_file", Variant(Vector<String>{"a", "b"})},
+        {"connect_to", Variant(true)},
+    };
+    for (auto const& c : cases) {
+        HttpRequestFactory factory;
+        // A valid key next to the bad one must not be applied either.
+        Configuration::Group group("HttpRequestFactory", {{"ca_file", Variant("/x.pem")}});
+        ASSERT_EQ(group.set(c.key, c.value).code(), kSuccess);
+        EXPECT_EQ(factory.sendConfig(group).code(), kInvalid) << c.key << " " << c.value;
+        EXPECT_EQ(factory.settings().caFile, "") << c.key;
+        EXPECT_EQ(factory.settings().timeoutMs, 60000) << c.key;
+    }
+}
+
+}  // namespace
+}  // namespace trelm
