@@ -1,0 +1,476 @@
+// The FQL engine against generated data: the client's statement shapes, visibility, answer
+// shapes, comparison rules and query plans. Expectations come from plain SQL over a second
+// connection and small in-test models, never from the engine itself.
+#include <algorithm>
+#include <set>
+
+#include <gtest/gtest.h>
+
+#include "StoreFixture.h"
+
+namespace emu::test {
+namespace {
+
+const std::string kMe = std::to_string(DemoAccount::uid);
+const std::string kFriendsOfMe = "uid in (select uid2 from friend where uid1='" + kMe + "')";
+const std::string kContacts = "select uid,name,pic_big from user where " + kFriendsOfMe;
+const std::string kPhotoEvents =
+    "select pid,aid,owner,src,caption,created from photo where aid in (select aid from album where owner in (select "
+    "uid2 from friend where uid1='" +
+    kMe + "')) and (created > 1000)";
+
+class FqlEngineTest : public testing::Test {
+protected:
+    static void SetUpTestSuite() {
+        data_ = new GeneratedStore(testOptions());
+        data_->store().setClock([] { return std::int64_t{1400000000}; });
+        for (const auto& row : data_->sql("SELECT uid2 FROM friend WHERE uid1 = ?", {DemoAccount::uid}))
+            friends_.push_back(std::stoll(row[0]));
+        std::sort(friends_.begin(), friends_.end(),
+                  [](std::int64_t a, std::int64_t b) { return textKey(a) < textKey(b); });
+        for (const auto& row : data_->sql("SELECT uid, name FROM user")) names_[row[0]] = row[1];
+    }
+    static void TearDownTestSuite() {
+        delete data_;
+        data_ = nullptr;
+        friends_.clear();
+        names_.clear();
+    }
+    static bool isFriend(std::int64_t uid) { return std::find(friends_.begin(), friends_.end(), uid) != friends_.end(); }
+
+    static std::vector<std::int64_t> uidsOf(const std::vector<Row>& rows, const char* column = "uid") {
+        std::vector<std::int64_t> uids;
+        for (const Row& r : rows) uids.push_back(std::stoll(r.at(column)));
+        return uids;
+    }
+
+    static GeneratedStore* data_;
+    static std::vector<std::int64_t> friends_;  // in the client's text order
+    static std::map<std::string, std::string> names_;
+};
+
+GeneratedStore* FqlEngineTest::data_ = nullptr;
+std::vector<std::int64_t> FqlEngineTest::friends_;
+std::map<std::string, std::string> FqlEngineTest::names_;
+
+TEST_F(FqlEngineTest, GeneratedIdsMakeTextOrderDifferFromNumericOrder) {
+    std::vector<std::int64_t> numeric = friends_;
+    std::sort(numeric.begin(), numeric.end());
+    ASSERT_GT(friends_.size(), 300u);
+    EXPECT_NE(numeric, friends_);
+}
+
+TEST_F(FqlEngineTest, ContactPagesWalkEveryFriendOnceInTextOrder) {
+    std::vector<std::int64_t> walked;
+    std::vector<Row> page = data_->fql(kContacts + " order by concat(uid,' ') asc limit 150");
+    int pages = 0;
+    while (!page.empty()) {
+        ++pages;
+        ASSERT_LE(page.size(), 150u);
+        for (const Row& r : page) {
+            EXPECT_EQ(r.at("name"), names_.at(r.at("uid")));
+            EXPECT_EQ(r.at("pic_big"), "http://pics.trelm.example/n/" + r.at("uid") + ".jpg");
+            walked.push_back(std::stoll(r.at("uid")));
+        }
+        page = data_->fql(kContacts + " and (concat(uid,' ') > '" + page.back().at("uid") +
+                          " ') order by concat(uid,' ') asc limit 150");
+    }
+    EXPECT_EQ(walked, friends_);
+    EXPECT_EQ(pages, static_cast<int>((friends_.size() + 149) / 150));
+}
+
+TEST_F(FqlEngineTest, ContactPageAnswersColumnsInSelectOrder) {
+    XmlNode root("fql_query_response");
+    ASSERT_FALSE(data_->store().fqlQuery(DemoAccount::uid, kContacts + " order by concat(uid,' ') asc limit 2", root));
+    EXPECT_TRUE(root.list);
+    ASSERT_EQ(root.children.size(), 2u);
+    EXPECT_EQ(root.children[0].name, "user");
+    EXPECT_EQ(childNames(root.children[0]), (std::vector<std::string>{"uid", "name", "pic_big"}));
+}
+
+// The client asks for offset + count rows after a key and skips the first offset itself.
+TEST_F(FqlEngineTest, ForwardPageAfterKeyHoldsTheFollowingRows) {
+    const std::size_t at = 100;
+    auto rows = data_->fql(kContacts + " and (concat(uid,' ') > '" + std::to_string(friends_[at]) +
+                           " ') order by concat(uid,' ') asc limit 300");
+    const std::vector<std::int64_t> expected(friends_.begin() + at + 1,
+                                             friends_.begin() + std::min(friends_.size(), at + 301));
+    EXPECT_EQ(uidsOf(rows), expected);
+}
+
+TEST_F(FqlEngineTest, BackwardPageBeforeKeyHoldsThePrecedingRowsNewestFirst) {
+    const std::size_t at = 200;
+    auto rows = data_->fql(kContacts + " and (concat(uid,' ') < '" + std::to_string(friends_[at]) +
+                           " ') order by concat(uid,' ') desc limit 150");
+    std::vector<std::int64_t> expected(friends_.begin() + (at - 150), friends_.begin() + at);
+    std::reverse(expected.begin(), expected.end());
+    EXPECT_EQ(uidsOf(rows), expected);
+}
+
+TEST_F(FqlEngineTest, CountingStatementAnswersOneEmptyAnonPerRow) {
+    struct Case {
+        std::string condition;
+        std::size_t expected;
+    };
+    const std::vector<Case> cases = {
+        {"", friends_.size()},
+        {" and (concat(uid,' ') <= '" + std::to_string(friends_[0]) + " ')", 1},
+        {" and (concat(uid,' ') <= '" + std::to_string(friends_[250]) + " ')", 251},
+        {" and (concat(uid,' ') <= '" + std::to_string(friends_.back()) + " ')", friends_.size()},
+    };
+    for (const Case& c : cases) {
+        XmlNode root("fql_query_response");
+        ASSERT_FALSE(data_->store().fqlQuery(DemoAccount::uid, "select '' from user where " + kFriendsOfMe + c.condition,
+                                             root));
+        EXPECT_EQ(root.children.size(), c.expected) << c.condition;
+        for (const XmlNode& row : root.children) {
+            ASSERT_EQ(row.children.size(), 1u);
+            EXPECT_EQ(row.name, "user");
+            EXPECT_EQ(row.children[0].name, "anon");
+            EXPECT_EQ(row.children[0].text, "");
+        }
+    }
+}
+
+TEST_F(FqlEngineTest, ContactsByIdListComeInTextOrder) {
+    std::vector<std::int64_t> picked = {friends_[40], friends_[3], friends_[300], friends_[17], friends_[120]};
+    std::string list;
+    for (std::int64_t id : picked) list += (list.empty() ? "" : ",") + std::to_string(id);
+    auto rows = data_->fql("select uid,name,pic_big from user where uid in (" + list +
+                           ") order by concat(uid,' ') asc limit 150");
+    std::sort(picked.begin(), picked.end(), [](std::int64_t a, std::int64_t b) { return textKey(a) < textKey(b); });
+    EXPECT_EQ(uidsOf(rows), picked);
+}
+
+TEST_F(FqlEngineTest, NameLookupWithRepeatedIdsAnswersEachUserOnce) {
+    const std::string a = std::to_string(friends_[1]), b = std::to_string(friends_[2]);
+    auto rows = data_->fql("select uid,name from user where uid in (" + a + "," + b + "," + b + "," + kMe + ",999)");
+    std::set<std::string> got;
+    for (const Row& r : rows) {
+        got.insert(r.at("uid"));
+        EXPECT_EQ(r.at("name"), names_.at(r.at("uid")));
+    }
+    EXPECT_EQ(rows.size(), 3u);
+    EXPECT_EQ(got, (std::set<std::string>{a, b, kMe}));
+}
+
+TEST_F(FqlEngineTest, FriendRequestsPageByRequesterInTextOrder) {
+    std::vector<std::int64_t> requesters;
+    for (const auto& row : data_->sql("SELECT uid_from FROM friend_request WHERE uid_to = ?", {DemoAccount::uid}))
+        requesters.push_back(std::stoll(row[0]));
+    ASSERT_EQ(requesters.size(), 7u);
+    std::sort(requesters.begin(), requesters.end(),
+              [](std::int64_t a, std::int64_t b) { return textKey(a) < textKey(b); });
+    const std::string base = "select uid_from from friend_request where (uid_to = '" + kMe + "')";
+    EXPECT_EQ(uidsOf(data_->fql(base + " order by concat(uid_from, ' ') asc limit 150"), "uid_from"), requesters);
+
+    // The key condition compares a number with a text, so it compares numerically.
+    const std::int64_t key = requesters[2];
+    std::vector<std::int64_t> after;
+    for (std::int64_t r : requesters)
+        if (r > key) after.push_back(r);
+    EXPECT_EQ(uidsOf(data_->fql(base + " and (uid_from > '" + std::to_string(key) +
+                                " ') order by concat(uid_from, ' ') asc limit 150"),
+                     "uid_from"),
+              after);
+}
+
+TEST_F(FqlEngineTest, PhotoEventPagesWalkFriendsVisiblePhotosNewestFirst) {
+    struct Photo {
+        std::int64_t created;
+        std::string pid, aid, owner, src, caption;
+    };
+    std::vector<Photo> expected;
+    for (const auto& r : data_->sql("SELECT p.pid, p.aid, a.owner, p.src, p.caption, p.created, a.visible "
+                                    "FROM photo p JOIN album a ON a.aid = p.aid")) {
+        if (!isFriend(std::stoll(r[2])) || r[6] == "custom" || std::stoll(r[5]) <= 1000) continue;
+        expected.push_back(Photo{std::stoll(r[5]), r[0], r[1], r[2], r[3], r[4]});
+    }
+    std::sort(expected.begin(), expected.end(), [](const Photo& a, const Photo& b) {
+        return a.created != b.created ? a.created > b.created : a.pid > b.pid;
+    });
+    std::size_t ties = 0;
+    for (std::size_t i = 1; i < expected.size(); ++i)
+        if (expected[i].created == expected[i - 1].created) ++ties;
+    ASSERT_GT(ties, 0u) << "the data must hold photos that share a creation time";
+    ASSERT_GT(expected.size(), 300u);
+
+    std::vector<Row> walked;
+    std::vector<Row> page = data_->fql(kPhotoEvents + " order by created desc limit 150");
+    while (!page.empty()) {
+        walked.insert(walked.end(), page.begin(), page.end());
+        const std::string t = page.back().at("created"), p = page.back().at("pid");
+        page = data_->fql(kPhotoEvents + " and (created < " + t + " or (created = " + t + " and pid < '" + p +
+                          "')) order by created desc limit 150");
+    }
+    ASSERT_EQ(walked.size(), expected.size());
+    for (std::size_t i = 0; i < walked.size(); ++i) {
+        EXPECT_EQ(walked[i].at("pid"), expected[i].pid) << i;
+        EXPECT_EQ(walked[i].at("aid"), expected[i].aid) << i;
+        EXPECT_EQ(walked[i].at("owner"), expected[i].owner) << i;
+        EXPECT_EQ(walked[i].at("src"), expected[i].src) << i;
+        EXPECT_EQ(walked[i].at("caption"), expected[i].caption) << i;
+        EXPECT_EQ(std::stoll(walked[i].at("created")), expected[i].created) << i;
+    }
+}
+
+TEST_F(FqlEngineTest, AlbumMediaAndTagStatementsAnswerTheViewersRows) {
+    auto albums = data_->fql("select aid,owner,cover_pid,name,created,modified,description,location,link,size,type "
+                             "from album where owner = '" + kMe + "' order by created desc");
+    auto expectedAlbums = data_->sql("SELECT aid, owner, cover_pid, name, created, modified, description, location, "
+                                     "link, size, type FROM album WHERE owner = ? ORDER BY created DESC, aid DESC",
+                                     {DemoAccount::uid});
+    ASSERT_EQ(albums.size(), expectedAlbums.size());
+    ASSERT_FALSE(albums.empty());
+    const char* const columns[] = {"aid",     "owner",    "cover_pid", "name", "created", "modified",
+                                   "description", "location", "link",      "size", "type"};
+    for (std::size_t i = 0; i < albums.size(); ++i)
+        for (std::size_t c = 0; c < std::size(columns); ++c)
+            EXPECT_EQ(albums[i].at(columns[c]), expectedAlbums[i][c]) << columns[c];
+
+    const std::string aid = expectedAlbums[0][0];
+    auto media = data_->fql("select pid,aid,owner,src_small,src_big,created from photo where aid = '" + aid + "'");
+    auto expectedMedia = data_->sql("SELECT pid, src_small, src_big, created FROM photo WHERE aid = '" + aid +
+                                    "' ORDER BY pid");
+    ASSERT_EQ(media.size(), expectedMedia.size());
+    std::sort(media.begin(), media.end(), [](const Row& a, const Row& b) { return a.at("pid") < b.at("pid"); });
+    for (std::size_t i = 0; i < media.size(); ++i) {
+        EXPECT_EQ(media[i].at("pid"), expectedMedia[i][0]);
+        EXPECT_EQ(media[i].at("src_small"), expectedMedia[i][1]);
+        EXPECT_EQ(media[i].at("src_big"), expectedMedia[i][2]);
+        EXPECT_EQ(media[i].at("created"), expectedMedia[i][3]);
+        EXPECT_EQ(media[i].at("aid"), aid);
+    }
+
+    auto tags = data_->fql("select pid,subject,text,xcoord,ycoord,created from photo_tag where pid in (select pid "
+                           "from photo where owner='" + kMe + "') order by created asc");
+    auto expectedTags = data_->sql("SELECT t.pid, t.subject, t.text, t.xcoord, t.ycoord, t.created FROM photo_tag t "
+                                   "JOIN photo p ON p.pid = t.pid WHERE p.owner = ? ORDER BY t.created, t.pid, t.subject",
+                                   {DemoAccount::uid});
+    ASSERT_EQ(tags.size(), expectedTags.size());
+    ASSERT_FALSE(tags.empty());
+    for (std::size_t i = 0; i < tags.size(); ++i) {
+        EXPECT_EQ(tags[i].at("pid"), expectedTags[i][0]);
+        EXPECT_EQ(tags[i].at("subject"), expectedTags[i][1]);
+        EXPECT_EQ(tags[i].at("xcoord"), expectedTags[i][3]);
+    }
+}
+
+TEST_F(FqlEngineTest, OrderingTiesBreakByTheKeyInTheSameDirection) {
+    for (const char* direction : {"desc", "asc"}) {
+        auto rows = data_->fql("select pid, created from photo where owner = me() order by created " +
+                               std::string(direction));
+        auto expected = data_->sql("SELECT pid FROM photo WHERE owner = ? ORDER BY created " + std::string(direction) +
+                                       ", pid " + direction,
+                                   {DemoAccount::uid});
+        ASSERT_EQ(rows.size(), expected.size());
+        for (std::size_t i = 0; i < rows.size(); ++i) EXPECT_EQ(rows[i].at("pid"), expected[i][0]) << direction;
+    }
+}
+
+// Hidden profile values are shown to the user and friends only; other rows are simply absent.
+TEST_F(FqlEngineTest, ViewerSeesOnlyWhatTheyMay) {
+    auto stranger = data_->sql("SELECT uid FROM user WHERE (hidden & 1) <> 0 AND birthday IS NOT NULL AND uid NOT IN "
+                               "(SELECT uid2 FROM friend WHERE uid1 = ?) AND uid <> ? LIMIT 1",
+                               {DemoAccount::uid, DemoAccount::uid});
+    auto hiddenFriend = data_->sql("SELECT uid FROM user WHERE (hidden & 1) <> 0 AND birthday IS NOT NULL AND uid IN "
+                                   "(SELECT uid2 FROM friend WHERE uid1 = ?) LIMIT 1",
+                                   {DemoAccount::uid});
+    ASSERT_EQ(stranger.size(), 1u);
+    ASSERT_EQ(hiddenFriend.size(), 1u);
+    auto s = data_->fql("select uid, name, birthday from user where uid = " + stranger[0][0]);
+    ASSERT_EQ(s.size(), 1u);
+    EXPECT_EQ(s[0].at("birthday"), "<nil>");
+    EXPECT_EQ(s[0].at("name"), names_.at(stranger[0][0]));
+    auto f = data_->fql("select birthday from user where uid = " + hiddenFriend[0][0]);
+    ASSERT_EQ(f.size(), 1u);
+    EXPECT_NE(f[0].at("birthday"), "<nil>");
+
+    struct AlbumCase {
+        std::string owner;
+        std::set<std::string> audiences;
+    };
+    auto strangerWithAlbums = data_->sql("SELECT owner FROM album WHERE owner NOT IN (SELECT uid2 FROM friend WHERE "
+                                         "uid1 = ?) AND owner <> ? GROUP BY owner HAVING sum(visible <> 'everyone') > 0",
+                                         {DemoAccount::uid, DemoAccount::uid});
+    auto friendWithAlbums = data_->sql("SELECT owner FROM album WHERE owner IN (SELECT uid2 FROM friend WHERE uid1 = ?) "
+                                       "GROUP BY owner HAVING sum(visible = 'custom') > 0",
+                                       {DemoAccount::uid});
+    ASSERT_FALSE(strangerWithAlbums.empty());
+    ASSERT_FALSE(friendWithAlbums.empty());
+    const std::vector<AlbumCase> cases = {
+        {strangerWithAlbums[0][0], {"everyone"}},
+        {friendWithAlbums[0][0], {"everyone", "friends"}},
+        {kMe, {"everyone", "friends", "custom"}},
+    };
+    for (const AlbumCase& c : cases) {
+        std::set<std::string> seen;
+        for (const Row& r : data_->fql("select aid, visible from album where owner = " + c.owner)) seen.insert(r.at("visible"));
+        std::set<std::string> expected;
+        for (const auto& r : data_->sql("SELECT DISTINCT visible FROM album WHERE owner = " + c.owner))
+            if (c.audiences.count(r[0])) expected.insert(r[0]);
+        EXPECT_EQ(seen, expected) << c.owner;
+    }
+
+    auto threads = data_->fql("select thread_id from thread where folder_id = 0");
+    EXPECT_EQ(static_cast<std::int64_t>(threads.size()),
+              data_->sqlInt("SELECT count(*) FROM thread WHERE owner = ?", {DemoAccount::uid}));
+    const std::string otherThread = data_->sql("SELECT thread_id FROM thread WHERE owner <> ? LIMIT 1",
+                                               {DemoAccount::uid})[0][0];
+    EXPECT_TRUE(data_->fql("select message_id from message where thread_id = " + otherThread).empty());
+    EXPECT_TRUE(data_->fql("select thread_id from thread where thread_id = " + otherThread).empty());
+    EXPECT_TRUE(data_->fql("select post_id from stream where source_id = " + strangerWithAlbums[0][0]).empty());
+}
+
+TEST_F(FqlEngineTest, StructuredColumnsAnswerNested) {
+    XmlNode root("fql_query_response");
+    ASSERT_FALSE(data_->store().fqlQuery(
+        DemoAccount::uid, "select uid, status, current_location.city, strlen(name) from user where uid = me()", root));
+    ASSERT_EQ(root.children.size(), 1u);
+    const XmlNode& user = root.children[0];
+    EXPECT_EQ(childNames(user), (std::vector<std::string>{"uid", "status", "current_location", "anon"}));
+    EXPECT_EQ(childNames(*child(user, "status")), (std::vector<std::string>{"message", "time", "status_id"}));
+    EXPECT_EQ(childNames(*child(user, "current_location")), (std::vector<std::string>{"city"}));
+    EXPECT_EQ(child(user, "anon")->text, "9");
+
+    const std::string post = data_->sql("SELECT post_id FROM stream WHERE source_id = ? AND type = 247 LIMIT 1",
+                                        {DemoAccount::uid})[0][0];
+    XmlNode stream("fql_query_response");
+    ASSERT_FALSE(data_->store().fqlQuery(DemoAccount::uid,
+                                         "select post_id, attachment from stream where post_id = '" + post + "'", stream));
+    ASSERT_EQ(stream.children.size(), 1u);
+    const XmlNode* media = child(*child(stream.children[0], "attachment"), "media");
+    ASSERT_NE(media, nullptr);
+    EXPECT_TRUE(media->list);
+    ASSERT_FALSE(media->children.empty());
+    const XmlNode& medium = media->children[0];
+    EXPECT_EQ(medium.name, "stream_media");
+    EXPECT_EQ(child(medium, "type")->text, "photo");
+    const std::string pid = child(*child(medium, "photo"), "pid")->text;
+    EXPECT_EQ(data_->sqlInt("SELECT owner FROM photo WHERE pid = '" + pid + "'"), DemoAccount::uid);
+
+    XmlNode threads("fql_query_response");
+    ASSERT_FALSE(data_->store().fqlQuery(DemoAccount::uid, "select recipients from thread where folder_id = 0 limit 1",
+                                         threads));
+    ASSERT_EQ(threads.children.size(), 1u);
+    const XmlNode* recipients = child(threads.children[0], "recipients");
+    EXPECT_TRUE(recipients->list);
+    ASSERT_EQ(recipients->children.size(), 2u);
+    EXPECT_EQ(recipients->children[0].name, "uid");
+    EXPECT_EQ(recipients->children[0].text, kMe);
+
+    XmlNode empty("fql_query_response");
+    ASSERT_FALSE(data_->store().fqlQuery(DemoAccount::uid, "select uid from user where uid = 1", empty));
+    EXPECT_TRUE(empty.children.empty());
+    EXPECT_TRUE(empty.list);
+}
+
+TEST_F(FqlEngineTest, FunctionsComputeAsTheServiceDid) {
+    struct Case {
+        const char* expression;
+        std::string expected;
+    };
+    const Case cases[] = {
+        {"strlen('abc')", "3"},           {"strlen('\xc3\xa9')", "2"},         {"concat('a', 1, 'b')", "a1b"},
+        {"substr('abcdef', 1, 3)", "bcd"}, {"substr('abcdef', -2, 1)", "e"},  {"strpos('abcabc', 'c')", "2"},
+        {"strpos('abc', 'z')", "-1"},     {"lower('AbC')", "abc"},            {"upper('AbC')", "ABC"},
+        {"me()", kMe},                    {"now()", "1400000000"},            {"1 + 2 * 3", "7"},
+        {"'12' + 1", "13"},               {"-(2 - 5)", "3"},                  {"concat(uid, ' ')", kMe + " "},
+    };
+    for (const Case& c : cases) {
+        auto rows = data_->fql("select " + std::string(c.expression) + " from user where uid = me()");
+        ASSERT_EQ(rows.size(), 1u) << c.expression;
+        EXPECT_EQ(rows[0].at("anon"), c.expected) << c.expression;
+    }
+}
+
+TEST_F(FqlEngineTest, ComparisonsConvertTextOnlyAgainstNumbers) {
+    struct Case {
+        std::string condition;
+        bool holds;
+    };
+    const Case cases[] = {
+        {"uid = '" + kMe + "'", true},
+        {"uid = ' " + kMe + " '", true},
+        {"concat(uid, ' ') = '" + kMe + " '", true},
+        {"concat(uid, ' ') = '" + kMe + "'", false},
+        {"'10' < '9'", true},
+        {"10 < '9'", false},
+        {"name = 'Demo User'", true},
+        {"name = 'demo user'", false},
+        {"strpos(name, 'User') = 5", true},
+        {"uid in ('" + kMe + "', 'x')", true},
+        {"not (uid = 5)", true},
+        {"uid not in (1, 2)", true},
+        {"(uid = 1 or name = 'Demo User')", true},
+    };
+    for (const Case& c : cases) {
+        auto rows = data_->fql("select uid from user where uid = me() and " + c.condition);
+        EXPECT_EQ(rows.size(), c.holds ? 1u : 0u) << c.condition;
+    }
+}
+
+TEST_F(FqlEngineTest, HostileAndMalformedStatementsLeaveTheDataAlone) {
+    const std::string before = data_->dump();
+    const char* const statements[] = {
+        "select uid from user where uid = 1; drop table user",
+        "select uid from user where name = ''; delete from friend; --'",
+        "select uid from user where uid = 1 union select secret from application",
+        "select uid from user where name = 'x'' OR 1=1; DROP TABLE friend; --'",
+        "select uid from user where name = \"\"\"); DELETE FROM user; --\"",
+        "update user set name = 'x' where uid = 1",
+        "select uid from user where uid in (select uid2 from friend where uid1 = me()); vacuum",
+    };
+    for (const char* q : statements) {
+        XmlNode root("fql_query_response");
+        Status s = data_->store().fqlQuery(DemoAccount::uid, q, root);
+        if (s) {
+            EXPECT_EQ(s->code, 601) << q;
+        }
+    }
+    EXPECT_EQ(data_->dump(), before);
+    EXPECT_EQ(data_->sqlInt("SELECT count(*) FROM friend WHERE uid1 = ?", {DemoAccount::uid}),
+              static_cast<std::int64_t>(friends_.size()));
+}
+
+// The paged statements must cost in proportion to the page: an index range, no sort of the
+// whole friend list, no scan of the user table.
+TEST_F(FqlEngineTest, ClientStatementsRunOnIndexRanges) {
+    struct Case {
+        std::string name;
+        std::string query;
+        std::vector<std::string> required;
+    };
+    const std::string k = std::to_string(friends_[100]);
+    const std::vector<Case> cases = {
+        {"FirstPage", kContacts + " order by concat(uid,' ') asc limit 150", {"PRIMARY KEY (uid1=?)"}},
+        {"NextPage", kContacts + " and (concat(uid,' ') > '" + k + " ') order by concat(uid,' ') asc limit 300",
+         {"PRIMARY KEY (uid1=? AND key2>?)"}},
+        {"PreviousPage", kContacts + " and (concat(uid,' ') < '" + k + " ') order by concat(uid,' ') desc limit 150",
+         {"PRIMARY KEY (uid1=? AND key2<?)"}},
+        {"Count", "select '' from user where " + kFriendsOfMe, {"friend"}},
+        {"CountUpTo", "select '' from user where " + kFriendsOfMe + " and (concat(uid,' ') <= '" + k + " ')",
+         {"PRIMARY KEY (uid1=? AND key2<?)"}},
+        {"PhotoEvents", kPhotoEvents + " and (created < 1270000000 or (created = 1270000000 and pid < '1_2')) "
+                                       "order by created desc limit 150",
+         {"photo_created"}},
+        {"FriendRequests", "select uid_from from friend_request where (uid_to = '" + kMe +
+                               "') and (uid_from > '5 ') order by concat(uid_from, ' ') asc limit 150",
+         {"PRIMARY KEY (uid_to=?)"}},
+    };
+    for (const Case& c : cases) {
+        std::string sql;
+        std::vector<std::string> plan;
+        ASSERT_FALSE(data_->store().explainFql(DemoAccount::uid, c.query, sql, plan)) << c.name;
+        std::string text;
+        for (const std::string& line : plan) text += line + "\n";
+        EXPECT_EQ(text.find("TEMP B-TREE"), std::string::npos) << c.name << "\n" << sql << "\n" << text;
+        EXPECT_EQ(text.find("SCAN t0"), std::string::npos) << c.name << "\n" << sql << "\n" << text;
+        EXPECT_EQ(text.find("SCAN user"), std::string::npos) << c.name << "\n" << text;
+        for (const std::string& r : c.required)
+            EXPECT_NE(text.find(r), std::string::npos) << c.name << " lacks " << r << "\n" << sql << "\n" << text;
+    }
+}
+
+}  // namespace
+}  // namespace emu::test

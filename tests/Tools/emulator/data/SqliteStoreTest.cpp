@@ -1,0 +1,367 @@
+// The REST methods' documents and what writes change for later reads.
+#include <algorithm>
+#include <set>
+
+#include <gtest/gtest.h>
+
+#include "StoreFixture.h"
+
+namespace emu::test {
+namespace {
+
+const std::string kMe = std::to_string(DemoAccount::uid);
+
+GeneratorOptions smallOptions() {
+    GeneratorOptions o = testOptions();
+    o.users = 600;
+    o.demoFriends = 80;
+    return o;
+}
+
+void expectError(const Status& s, int code, const std::string& message, const std::string& context = {}) {
+    ASSERT_TRUE(s.has_value()) << context;
+    EXPECT_EQ(s->code, code) << context;
+    EXPECT_EQ(s->message, message) << context;
+}
+
+struct Post {
+    std::string id;
+    std::int64_t created;
+};
+
+// The demo user's stream computed from the tables: posts by the user and its friends.
+std::vector<Post> expectedStream(GeneratedStore& data, std::int64_t start, std::int64_t end) {
+    std::set<std::string> sources{kMe};
+    for (const auto& r : data.sql("SELECT uid2 FROM friend WHERE uid1 = ?", {DemoAccount::uid})) sources.insert(r[0]);
+    std::vector<Post> posts;
+    for (const auto& r : data.sql("SELECT post_id, source_id, created_time FROM stream")) {
+        const std::int64_t t = std::stoll(r[2]);
+        if (sources.count(r[1]) && t >= start && t <= end) posts.push_back(Post{r[0], t});
+    }
+    std::sort(posts.begin(), posts.end(),
+              [](const Post& a, const Post& b) { return a.created != b.created ? a.created > b.created : a.id > b.id; });
+    return posts;
+}
+
+TEST(SqliteStoreTest, StreamGetAnswersTheViewersStreamNewestFirstWithinBounds) {
+    GeneratedStore data(smallOptions());
+    const auto all = expectedStream(data, 0, INT64_MAX);
+    ASSERT_GT(all.size(), 100u);
+    bool ties = false;
+    for (std::size_t i = 1; i < all.size(); ++i) ties = ties || all[i].created == all[i - 1].created;
+    ASSERT_TRUE(ties) << "the stream must hold posts that share a creation time";
+
+    const std::int64_t upper = all[10].created, lower = all[60].created;
+    struct Case {
+        std::string start, end, limit;
+        std::vector<Post> expected;
+    };
+    const std::vector<Case> cases = {
+        {"", "", "", std::vector<Post>(all.begin(), all.begin() + 30)},
+        {"0", "0", "100000", all},
+        {std::to_string(lower), std::to_string(upper), "1000", expectedStream(data, lower, upper)},
+        {"0", std::to_string(upper), "5", std::vector<Post>(all.begin() + 10, all.begin() + 15)},
+    };
+    for (const Case& c : cases) {
+        XmlNode root("stream_get_response");
+        ASSERT_FALSE(data.store().streamGet(DemoAccount::uid, kMe, c.start, c.end, c.limit, root));
+        ASSERT_EQ(childNames(root), (std::vector<std::string>{"posts", "profiles", "albums"}));
+        const XmlNode& posts = root.children[0];
+        EXPECT_TRUE(posts.list);
+        std::vector<std::string> got;
+        for (const XmlNode& p : posts.children) got.push_back(child(p, "post_id")->text);
+        std::vector<std::string> expected;
+        for (const Post& p : c.expected) expected.push_back(p.id);
+        EXPECT_EQ(got, expected) << c.start << ".." << c.end << " limit " << c.limit;
+
+        std::set<std::string> profiles;
+        for (const XmlNode& p : root.children[1].children) profiles.insert(child(p, "id")->text);
+        std::set<std::string> albums;
+        for (const XmlNode& a : root.children[2].children) albums.insert(child(a, "aid")->text);
+        for (const XmlNode& p : posts.children) {
+            EXPECT_TRUE(profiles.count(child(p, "source_id")->text));
+            EXPECT_TRUE(profiles.count(child(p, "actor_id")->text));
+            const XmlNode* media = child(*child(p, "attachment"), "media");
+            if (child(p, "type")->text == "46") {
+                EXPECT_EQ(media, nullptr);
+            }
+            if (child(p, "type")->text != "247") continue;
+            ASSERT_NE(media, nullptr);
+            for (const XmlNode& m : media->children) {
+                EXPECT_EQ(child(m, "type")->text, "photo");
+                const XmlNode* photo = child(m, "photo");
+                ASSERT_NE(photo, nullptr);
+                EXPECT_EQ(child(*photo, "owner")->text, child(p, "source_id")->text);
+                EXPECT_TRUE(albums.count(child(*photo, "aid")->text));
+            }
+        }
+    }
+}
+
+TEST(SqliteStoreTest, StreamPostChildrenComeInTheServiceOrder) {
+    GeneratedStore data(smallOptions());
+    XmlNode root("stream_get_response");
+    ASSERT_FALSE(data.store().streamGet(DemoAccount::uid, "", "", "", "1", root));
+    ASSERT_EQ(root.children[0].children.size(), 1u);
+    const std::vector<std::string> names = childNames(root.children[0].children[0]);
+    const std::vector<std::string> leading = {"post_id", "viewer_id", "source_id", "type", "app_id", "attribution",
+                                              "actor_id", "target_id", "message", "attachment"};
+    ASSERT_GE(names.size(), leading.size() + 2);
+    EXPECT_EQ(std::vector<std::string>(names.begin(), names.begin() + leading.size()), leading);
+    const auto updated = std::find(names.begin(), names.end(), "updated_time");
+    ASSERT_NE(updated, names.end());
+    EXPECT_EQ(*(updated + 1), "created_time");
+}
+
+TEST(SqliteStoreTest, MethodsRejectMalformedArguments) {
+    GeneratedStore data(smallOptions());
+    SqliteStore& s = data.store();
+    const std::string tid = data.sql("SELECT thread_id FROM thread WHERE owner = ? LIMIT 1", {DemoAccount::uid})[0][0];
+    const std::string invalid = "Invalid parameter";
+    struct Case {
+        const char* name;
+        std::function<Status(XmlNode&)> call;
+    };
+    const std::vector<Case> cases = {
+        {"stream of another viewer", [&](XmlNode& r) { return s.streamGet(DemoAccount::uid, "12345", "", "", "", r); }},
+        {"stream viewer not a number", [&](XmlNode& r) { return s.streamGet(DemoAccount::uid, "me", "", "", "", r); }},
+        {"negative start", [&](XmlNode& r) { return s.streamGet(DemoAccount::uid, "", "-1", "", "", r); }},
+        {"fractional end", [&](XmlNode& r) { return s.streamGet(DemoAccount::uid, "", "", "1.5", "", r); }},
+        {"limit with blank", [&](XmlNode& r) { return s.streamGet(DemoAccount::uid, "", "", "", " 5", r); }},
+        {"inbox start", [&](XmlNode& r) { return s.getInbox(DemoAccount::uid, "x", "", r); }},
+        {"inbox limit", [&](XmlNode& r) { return s.getInbox(DemoAccount::uid, "", "99999999999999999999", r); }},
+        {"thread id missing", [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, "", "", "", r); }},
+        {"thread id text", [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, "abc", "", "", r); }},
+        {"thread start", [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, tid, "-3", "", r); }},
+        {"status flag", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "hi", "yes", "", r); }},
+        {"clear flag", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "hi", "1", "2", r); }},
+        {"empty status", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "", "1", "", r); }},
+        {"getInfo uid", [&](XmlNode& r) { return s.usersGetInfo(DemoAccount::uid, kMe + ",x", "name", r); }},
+        {"getInfo no uids", [&](XmlNode& r) { return s.usersGetInfo(DemoAccount::uid, "", "name", r); }},
+        {"getInfo field", [&](XmlNode& r) { return s.usersGetInfo(DemoAccount::uid, kMe, "name,color", r); }},
+        {"friends of another", [&](XmlNode& r) { return s.friendsGet(DemoAccount::uid, "12345", r); }},
+    };
+    const std::string before = data.dump();
+    for (const Case& c : cases) {
+        XmlNode root("response");
+        expectError(c.call(root), 100, invalid, c.name);
+    }
+    EXPECT_EQ(data.dump(), before);
+}
+
+TEST(SqliteStoreTest, InboxPagesThroughTheViewersThreadsLatestFirst) {
+    GeneratedStore data(smallOptions());
+    std::vector<std::string> expected;
+    for (const auto& r : data.sql("SELECT thread_id FROM thread WHERE owner = ? ORDER BY updated_time DESC, "
+                                  "thread_id DESC",
+                                  {DemoAccount::uid}))
+        expected.push_back(r[0]);
+    ASSERT_EQ(expected.size(), 25u);
+    std::vector<std::string> got;
+    for (int start = 0;; start += 20) {
+        XmlNode root("mailbox_getInbox_response");
+        ASSERT_FALSE(data.store().getInbox(DemoAccount::uid, std::to_string(start), "20", root));
+        if (root.children.empty()) break;
+        for (const XmlNode& t : root.children) {
+            EXPECT_EQ(t.name, "thread");
+            EXPECT_EQ(childNames(t),
+                      (std::vector<std::string>{"tid", "subject", "last_update", "unread", "message_count"}));
+            got.push_back(child(t, "tid")->text);
+        }
+    }
+    EXPECT_EQ(got, expected);
+}
+
+TEST(SqliteStoreTest, ThreadMessagesComeNewestFirstAndOnlyFromTheViewersMailbox) {
+    GeneratedStore data(smallOptions());
+    const std::string tid = data.sql("SELECT thread_id FROM thread WHERE owner = ? LIMIT 1", {DemoAccount::uid})[0][0];
+    XmlNode root("mailbox_getThreadMessages_response");
+    ASSERT_FALSE(data.store().getThreadMessages(DemoAccount::uid, tid, "", "", root));
+    auto expected = data.sql("SELECT message_id, author_id, body, created_time, att_href IS NOT NULL FROM message "
+                             "WHERE thread_id = " + tid + " ORDER BY created_time DESC, seq DESC");
+    ASSERT_EQ(root.children.size(), expected.size());
+    ASSERT_EQ(expected.size(), 6u);
+    for (std::size_t i = 0; i < expected.size(); ++i) {
+        const XmlNode& m = root.children[i];
+        EXPECT_EQ(childNames(m),
+                  (std::vector<std::string>{"mid", "tid", "author", "body", "time_sent", "has_attachment"}));
+        EXPECT_EQ(child(m, "mid")->text, expected[i][0]);
+        EXPECT_EQ(child(m, "tid")->text, tid);
+        EXPECT_EQ(child(m, "author")->text, expected[i][1]);
+        EXPECT_EQ(child(m, "time_sent")->text, expected[i][3]);
+        EXPECT_EQ(child(m, "has_attachment")->text, expected[i][4] == "1" ? "true" : "false");
+    }
+    XmlNode page("mailbox_getThreadMessages_response");
+    ASSERT_FALSE(data.store().getThreadMessages(DemoAccount::uid, tid, "2", "3", page));
+    ASSERT_EQ(page.children.size(), 3u);
+    EXPECT_EQ(child(page.children[0], "mid")->text, expected[2][0]);
+
+    const std::string other = data.sql("SELECT thread_id FROM thread WHERE owner <> ? LIMIT 1", {DemoAccount::uid})[0][0];
+    XmlNode denied("mailbox_getThreadMessages_response");
+    expectError(data.store().getThreadMessages(DemoAccount::uid, other, "", "", denied), 100, "Invalid parameter");
+}
+
+TEST(SqliteStoreTest, SetStatusBecomesTheUsersStatusAndTheNewestStatusPost) {
+    GeneratedStore data(smallOptions());
+    data.store().setClock([] { return std::int64_t{1500000000}; });
+    const std::int64_t posts = data.sqlInt("SELECT count(*) FROM stream");
+    XmlNode answer("users_setStatus_response");
+    ASSERT_FALSE(data.store().setStatus(DemoAccount::uid, "is testing <&>", "1", "", answer));
+    EXPECT_EQ(answer.text, "1");
+    EXPECT_TRUE(answer.children.empty());
+
+    auto user = data.fql("select status from user where uid = me()");
+    ASSERT_EQ(user.size(), 1u);
+    EXPECT_EQ(user[0].at("status.message"), "is testing <&>");
+    EXPECT_EQ(user[0].at("status.time"), "1500000000");
+    const std::string statusId = user[0].at("status.status_id");
+
+    XmlNode stream("stream_get_response");
+    ASSERT_FALSE(data.store().streamGet(DemoAccount::uid, kMe, "0", "0", "1", stream));
+    const XmlNode& newest = stream.children[0].children.at(0);
+    EXPECT_EQ(child(newest, "type")->text, "46");
+    EXPECT_EQ(child(newest, "message")->text, "is testing <&>");
+    EXPECT_EQ(child(newest, "source_id")->text, kMe);
+    EXPECT_EQ(child(newest, "created_time")->text, "1500000000");
+    EXPECT_EQ(data.sqlInt("SELECT count(*) FROM stream"), posts + 1);
+    EXPECT_EQ(data.fql("select post_id from stream where post_id = '" + child(newest, "post_id")->text + "'").size(), 1u);
+
+    XmlNode cleared("users_setStatus_response");
+    ASSERT_FALSE(data.store().setStatus(DemoAccount::uid, "", "0", "true", cleared));
+    EXPECT_EQ(cleared.text, "1");
+    auto after = data.fql("select status from user where uid = me()");
+    EXPECT_EQ(after[0].at("status.message"), "");
+    EXPECT_NE(after[0].at("status.status_id"), statusId);
+    EXPECT_EQ(data.sqlInt("SELECT count(*) FROM stream"), posts + 1);
+}
+
+TEST(SqliteStoreTest, UploadedPhotoIsVisibleToLaterReads) {
+    GeneratedStore data(smallOptions());
+    data.store().setClock([] { return std::int64_t{1500000000}; });
+    const std::string aid = data.sql("SELECT aid FROM album WHERE owner = ? AND type = 'normal' LIMIT 1",
+                                     {DemoAccount::uid})[0][0];
+    const std::int64_t size = data.sqlInt("SELECT size FROM album WHERE aid = '" + aid + "'");
+
+    XmlNode answer("photos_upload_response");
+    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, aid, "At the lake", "\xff\xd8jpeg", true, answer));
+    EXPECT_EQ(childNames(answer), (std::vector<std::string>{"pid", "aid", "owner", "src", "src_big", "src_small",
+                                                            "link", "caption", "created"}));
+    const std::string pid = child(answer, "pid")->text;
+    EXPECT_EQ(child(answer, "aid")->text, aid);
+    EXPECT_EQ(child(answer, "owner")->text, kMe);
+    EXPECT_EQ(child(answer, "caption")->text, "At the lake");
+    EXPECT_EQ(child(answer, "created")->text, "1500000000");
+
+    auto photos = data.fql("select pid, caption, src, created from photo where aid = '" + aid + "'");
+    auto uploaded = std::find_if(photos.begin(), photos.end(), [&](const Row& r) { return r.at("pid") == pid; });
+    ASSERT_NE(uploaded, photos.end());
+    EXPECT_EQ(uploaded->at("caption"), "At the lake");
+    EXPECT_EQ(uploaded->at("src"), child(answer, "src")->text);
+    EXPECT_EQ(data.fql("select size from album where aid = '" + aid + "'")[0].at("size"), std::to_string(size + 1));
+
+    // Without an album the application's default album is made once and then reused.
+    XmlNode first("photos_upload_response"), second("photos_upload_response");
+    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, first));
+    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, second));
+    const std::string defaultAid = child(first, "aid")->text;
+    EXPECT_EQ(child(second, "aid")->text, defaultAid);
+    EXPECT_NE(defaultAid, aid);
+    auto album = data.fql("select type, size, cover_pid from album where aid = '" + defaultAid + "'");
+    ASSERT_EQ(album.size(), 1u);
+    EXPECT_EQ(album[0].at("type"), "app");
+    EXPECT_EQ(album[0].at("size"), "2");
+    EXPECT_EQ(album[0].at("cover_pid"), child(first, "pid")->text);
+}
+
+TEST(SqliteStoreTest, UploadRefusalsAnswerTheirCodesAndChangeNothing) {
+    GeneratedStore data(smallOptions());
+    const std::string own = data.sql("SELECT aid FROM album WHERE owner = ? AND type = 'normal' LIMIT 1",
+                                     {DemoAccount::uid})[0][0];
+    const std::string full = data.sql("SELECT aid FROM album WHERE owner = ? AND aid <> '" + own + "' LIMIT 1",
+                                      {DemoAccount::uid})[0][0];
+    const std::string friends = data.sql("SELECT aid FROM album WHERE owner IN (SELECT uid2 FROM friend WHERE "
+                                         "uid1 = ?) LIMIT 1",
+                                         {DemoAccount::uid})[0][0];
+    data.execute("UPDATE album SET size = 60 WHERE aid = '" + full + "'");
+    struct Case {
+        const char* name;
+        std::string aid;
+        std::string image;
+        bool haveImage;
+        int code;
+        const char* message;
+    };
+    const Case cases[] = {
+        {"no image part", own, "", false, 324, "Missing or invalid image file"},
+        {"empty image", own, "", true, 324, "Missing or invalid image file"},
+        {"unknown album", "1_999999", "img", true, 120, "Invalid album id"},
+        {"a friend's album", friends, "img", true, 120, "Invalid album id"},
+        {"album with 60 photos", full, "img", true, 321, "Album is full"},
+    };
+    const std::string before = data.dump();
+    for (const Case& c : cases) {
+        XmlNode root("photos_upload_response");
+        expectError(data.store().uploadPhoto(DemoAccount::uid, c.aid, "x", c.image, c.haveImage, root), c.code,
+                    c.message, c.name);
+        EXPECT_TRUE(root.children.empty()) << c.name;
+    }
+    EXPECT_EQ(data.dump(), before);
+
+    // The default album holds 1000.
+    XmlNode made("photos_upload_response");
+    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, made));
+    data.execute("UPDATE album SET size = 999 WHERE aid = '" + child(made, "aid")->text + "'");
+    XmlNode last("photos_upload_response"), over("photos_upload_response");
+    EXPECT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, last));
+    expectError(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, over), 321, "Album is full");
+}
+
+TEST(SqliteStoreTest, UsersGetInfoShapesRowsAsFql) {
+    GeneratedStore data(smallOptions());
+    const std::string other = data.sql("SELECT uid2 FROM friend WHERE uid1 = ? LIMIT 1", {DemoAccount::uid})[0][0];
+    XmlNode root("users_getInfo_response");
+    ASSERT_FALSE(data.store().usersGetInfo(DemoAccount::uid, kMe + ", " + other, "name,status,uid,current_location",
+                                           root));
+    EXPECT_TRUE(root.list);
+    ASSERT_EQ(root.children.size(), 2u);
+    std::set<std::string> uids;
+    for (const XmlNode& u : root.children) {
+        EXPECT_EQ(u.name, "user");
+        EXPECT_EQ(childNames(u), (std::vector<std::string>{"uid", "name", "status", "current_location"}));
+        uids.insert(child(u, "uid")->text);
+        EXPECT_EQ(childNames(*child(u, "status")), (std::vector<std::string>{"message", "time", "status_id"}));
+    }
+    EXPECT_EQ(uids, (std::set<std::string>{kMe, other}));
+}
+
+TEST(SqliteStoreTest, FriendsGetListsTheViewersFriends) {
+    GeneratedStore data(smallOptions());
+    XmlNode root("friends_get_response");
+    ASSERT_FALSE(data.store().friendsGet(DemoAccount::uid, "", root));
+    EXPECT_TRUE(root.list);
+    std::set<std::string> got;
+    for (const XmlNode& u : root.children) {
+        EXPECT_EQ(u.name, "uid");
+        got.insert(u.text);
+    }
+    std::set<std::string> expected;
+    for (const auto& r : data.sql("SELECT uid2 FROM friend WHERE uid1 = ?", {DemoAccount::uid})) expected.insert(r[0]);
+    EXPECT_EQ(got, expected);
+    EXPECT_EQ(got.size(), 80u);
+    XmlNode same("friends_get_response");
+    ASSERT_FALSE(data.store().friendsGet(DemoAccount::uid, kMe, same));
+    EXPECT_EQ(same.children.size(), 80u);
+}
+
+TEST(SqliteStoreTest, DemoAccountAndApplicationAreKnown) {
+    GeneratedStore data(smallOptions());
+    EXPECT_EQ(data.store().appSecret(DemoAccount::apiKey), std::optional<std::string>(DemoAccount::appSecret));
+    EXPECT_EQ(data.store().appSecret("0000"), std::nullopt);
+    EXPECT_EQ(data.store().checkLogin(DemoAccount::email, DemoAccount::password),
+              std::optional<std::int64_t>(DemoAccount::uid));
+    EXPECT_EQ(data.store().checkLogin(DemoAccount::email, "wrong"), std::nullopt);
+    EXPECT_EQ(data.store().checkLogin("nobody@trelm.example", DemoAccount::password), std::nullopt);
+}
+
+}  // namespace
+}  // namespace emu::test
