@@ -1,0 +1,43 @@
+#include "RequestLog.h"
+
+#include <gtest/gtest.h>
+
+namespace emu {
+namespace {
+
+LoggedRequest entry(const std::string& method) {
+    LoggedRequest e;
+    e.method = method;
+    return e;
+}
+
+TEST(RequestLogTest, FullLogDropsTheOldestButCountsEverything) {
+    RequestLog log(3);
+    for (const char* m : {"a", "b", "c", "d", "e"}) log.add(entry(m));
+    const auto kept = log.entries();
+    ASSERT_EQ(kept.size(), 3u);
+    EXPECT_EQ(kept[0].method, "c");
+    EXPECT_EQ(kept[2].method, "e");
+    EXPECT_EQ(log.total(), 5u);
+}
+
+TEST(RequestLogTest, DisabledLogKeepsNothing) {
+    RequestLog log;
+    log.setEnabled(false);
+    log.add(entry("fql.query"));
+    EXPECT_TRUE(log.entries().empty());
+    EXPECT_EQ(log.total(), 0u);
+    log.setEnabled(true);
+    log.add(entry("fql.query"));
+    EXPECT_EQ(log.total(), 1u);
+}
+
+TEST(RequestLogTest, EntriesForMatchesWithAndWithoutPrefix) {
+    RequestLog log;
+    for (const char* m : {"facebook.fql.query", "fql.query", "fql.queryx", "facebook.stream.get", ""}) log.add(entry(m));
+    EXPECT_EQ(log.entriesFor("fql.query").size(), 2u);
+    EXPECT_EQ(log.entriesFor("stream.get").size(), 1u);
+}
+
+}  // namespace
+}  // namespace emu
