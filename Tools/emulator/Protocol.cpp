@@ -1,0 +1,257 @@
+#include "Protocol.h"
+
+#include <chrono>
+#include <exception>
+#include <thread>
+
+namespace emu {
+namespace {
+
+constexpr const char* kPrefix = "facebook.";
+constexpr const char* kHidden = "***";
+
+std::string arg(const HttpCall& call, const char* name) {
+    auto it = call.args.find(name);
+    return it == call.args.end() ? std::string() : it->second;
+}
+
+bool has(const HttpCall& call, const char* name) { return call.args.count(name) != 0; }
+
+ServiceError serviceError(int code) { return ServiceError{code, Protocol::errorText(code)}; }
+
+// A method's arguments with the secret one hidden, for error documents and the log.
+Arguments visibleArgs(const Arguments& args) {
+    Arguments out = args;
+    auto it = out.find("password");
+    if (it != out.end()) it->second = kHidden;
+    return out;
+}
+
+// A document that starts like the real answer and then breaks: the parser reads some elements
+// before it meets the fault, as it would on a garbled transfer.
+std::string malform(const std::string& body) {
+    return body.substr(0, body.size() * 2 / 3) + "<</ broken&;>\n";
+}
+
+using Runner = Status (*)(Store&, std::int64_t viewer, const HttpCall&, XmlNode& root);
+
+struct MethodSpec {
+    const char* name;
+    bool listRoot;
+    const char* required;  // a parameter without which the call is invalid (100), or null
+    Runner run;
+};
+
+// Session methods. auth.login, the one application method, is answered by the protocol itself.
+const MethodSpec kMethods[] = {
+    {"fql.query", true, "query",
+     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) { return s.fqlQuery(v, arg(c, "query"), r); }},
+    {"stream.get", false, nullptr,
+     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) {
+         return s.streamGet(v, arg(c, "viewer_id"), arg(c, "start_time"), arg(c, "end_time"), arg(c, "limit"), r);
+     }},
+    {"mailbox.getInbox", false, nullptr,
+     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) {
+         return s.getInbox(v, arg(c, "start"), arg(c, "limit"), r);
+     }},
+    {"mailbox.getThreadMessages", false, "tid",
+     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) {
+         return s.getThreadMessages(v, arg(c, "tid"), arg(c, "start"), arg(c, "limit"), r);
+     }},
+    {"users.setStatus", false, nullptr,
+     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) {
+         return s.setStatus(v, arg(c, "status"), arg(c, "status_includes_verb"), arg(c, "clear"), r);
+     }},
+    {"photos.upload", false, nullptr,
+     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) {
+         return s.uploadPhoto(v, arg(c, "aid"), arg(c, "caption"), c.file, c.haveFile, r);
+     }},
+    {"users.getInfo", true, "uids",
+     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) {
+         return s.usersGetInfo(v, arg(c, "uids"), arg(c, "fields"), r);
+     }},
+    {"friends.get", true, nullptr,
+     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) { return s.friendsGet(v, arg(c, "uid"), r); }},
+};
+
+const MethodSpec* findMethod(const std::string& name) {
+    for (const MethodSpec& m : kMethods)
+        if (name == m.name) return &m;
+    return nullptr;
+}
+
+}  // namespace
+
+Protocol::Protocol(Store& store, SessionTable& sessions, Faults& faults, RequestLog& log, Options options)
+    : store_(store), sessions_(sessions), faults_(faults), log_(log), options_(options) {}
+
+std::string Protocol::errorText(int code) {
+    switch (code) {
+        case 1: return "An unknown error occurred";
+        case 2: return "Service temporarily unavailable";
+        case 3: return "Unknown method";
+        case 4: return "Application request limit reached";
+        case 8: return "This method must be called over HTTPS";
+        case 100: return "Invalid parameter";
+        case 101: return "Invalid API key";
+        case 102: return "Session key invalid or no longer valid";
+        case 103: return "Call_id must be greater than previous";
+        case 104: return "Incorrect signature";
+        case 120: return "Invalid album id";
+        case 121: return "Invalid photo id";
+        case 321: return "Album is full";
+        case 324: return "Missing or invalid image file";
+        default: return "An unknown error occurred";
+    }
+}
+
+std::string Protocol::responseRoot(const std::string& method) {
+    std::string root = method.rfind(kPrefix, 0) == 0 ? method.substr(9) : method;
+    for (char& c : root)
+        if (c == '.') c = '_';
+    return root + "_response";
+}
+
+std::string Protocol::errorDocument(const ServiceError& error, const Arguments& args) {
+    XmlNode root("error_response");
+    root.add("error_code", std::to_string(error.code));
+    root.add("error_msg", error.message);
+    XmlNode& list = root.addList("request_args");
+    for (const auto& [key, value] : visibleArgs(args)) {
+        XmlNode& a = list.add("arg");
+        a.add("key", key);
+        a.add("value", value);
+    }
+    return renderDocument(root);
+}
+
+HttpReply Protocol::handle(const HttpCall& call) {
+    const std::string sent = arg(call, "method");
+    const std::string method = sent.rfind(kPrefix, 0) == 0 ? sent.substr(9) : sent;
+    const FaultDecision faults = faults_.decide(method);
+
+    LoggedRequest entry;
+    const bool logging = log_.enabled();
+    if (logging) {
+        entry.method = sent;
+        entry.args = visibleArgs(call.args);
+        if (method == "fql.query") entry.fql = arg(call, "query");
+        entry.https = call.https;
+        entry.hadFile = call.haveFile;
+        entry.fileSize = call.file.size();
+    }
+    auto finish = [&](HttpReply reply, int errorCode, const char* fault) {
+        if (logging) {
+            entry.errorCode = errorCode;
+            entry.httpStatus = reply.delivery == HttpReply::Delivery::Dropped ? 0 : reply.status;
+            entry.fault = fault;
+            log_.add(std::move(entry));
+        }
+        return reply;
+    };
+
+    if (faults.delayMs > 0) std::this_thread::sleep_for(std::chrono::milliseconds(faults.delayMs));
+    if (faults.drop) return finish(HttpReply{0, {}, {}, HttpReply::Delivery::Dropped}, 0, "drop");
+    if (faults.httpStatus != 0)
+        return finish(HttpReply{faults.httpStatus, "The service is not answering right now.\n", "text/plain",
+                                HttpReply::Delivery::Whole},
+                      0, "http_status");
+
+    Outcome outcome;
+    try {
+        outcome = process(call, method, faults);
+    } catch (const std::exception&) {
+        outcome.error = serviceError(1);
+    }
+    HttpReply reply;
+    int errorCode = 0;
+    if (outcome.error) {
+        errorCode = outcome.error->code;
+        if (outcome.error->message.empty()) outcome.error->message = errorText(errorCode);
+        reply.body = errorDocument(*outcome.error, call.args);
+    } else {
+        reply.body = renderDocument(outcome.root);
+    }
+    if (faults.truncate) {
+        reply.delivery = HttpReply::Delivery::Truncated;
+        return finish(std::move(reply), errorCode, "truncate");
+    }
+    if (faults.malformed) {
+        reply.body = malform(reply.body);
+        return finish(std::move(reply), errorCode, "malformed");
+    }
+    return finish(std::move(reply), errorCode, "");
+}
+
+Protocol::Outcome Protocol::process(const HttpCall& call, const std::string& method, const FaultDecision& faults) {
+    auto fail = [](int code) { return Outcome{{}, serviceError(code)}; };
+
+    const auto appSecret = has(call, "api_key") ? store_.appSecret(arg(call, "api_key")) : std::nullopt;
+    if (!appSecret) return fail(101);
+    if (faults.rateLimited) return fail(4);
+    if (method.empty()) return fail(3);
+
+    const bool isLogin = method == "auth.login";
+    const MethodSpec* spec = findMethod(method);
+    const std::string sessionKey = arg(call, "session_key");
+    if (spec != nullptr && sessionKey.empty()) return fail(102);
+
+    // A call that presents a session is checked against it whatever the method, so that its
+    // signature can be checked with the session's secret.
+    std::optional<Session> session;
+    if (!sessionKey.empty()) {
+        SessionTable::Lookup lookup = sessions_.use(sessionKey);
+        if (lookup.check != SessionTable::Check::Valid) return fail(102);
+        if (faults.expireAfter > 0 && lookup.calls > faults.expireAfter) {
+            sessions_.remove(sessionKey);
+            return fail(102);
+        }
+        session = lookup.session;
+    }
+
+    if (!Signature::matches(call.args, session ? session->secret : *appSecret)) return fail(104);
+    if (session && options_.strictCallId && !sessions_.acceptCallId(sessionKey, arg(call, "call_id")))
+        return fail(103);
+    if (spec == nullptr && !isLogin) return fail(3);
+    if (faults.errorCode != 0) return fail(faults.errorCode);
+
+    if (isLogin) {
+        if (!call.https) return fail(8);
+        return login(call);
+    }
+    if (spec->required != nullptr && arg(call, spec->required).empty()) return fail(100);
+    return runMethod(method, session->uid, call);
+}
+
+Protocol::Outcome Protocol::login(const HttpCall& call) {
+    Outcome out;
+    const std::string email = arg(call, "email");
+    const std::string password = arg(call, "password");
+    if (email.empty() || password.empty()) {
+        out.error = serviceError(100);
+        return out;
+    }
+    const auto uid = store_.checkLogin(email, password);
+    if (!uid) {
+        out.error = serviceError(100);
+        return out;
+    }
+    const Session s = sessions_.create(*uid, options_.sessionLifetimeSeconds);
+    out.root.name = "auth_login_response";
+    out.root.add("session_key", s.key);
+    out.root.add("uid", std::to_string(s.uid));
+    out.root.add("secret", s.secret);
+    out.root.add("expires", std::to_string(s.expires));
+    return out;
+}
+
+Protocol::Outcome Protocol::runMethod(const std::string& method, std::int64_t viewer, const HttpCall& call) {
+    const MethodSpec* spec = findMethod(method);
+    Outcome out;
+    out.root.name = responseRoot(method);
+    out.root.list = spec->listRoot;
+    out.error = spec->run(store_, viewer, call, out.root);
+    return out;
+}
+
+}  // namespace emu

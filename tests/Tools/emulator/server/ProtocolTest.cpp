@@ -1,0 +1,368 @@
+// The emulator's protocol over real loopback HTTP and HTTPS with libcurl.
+#include <expat.h>
+
+#include <chrono>
+#include <functional>
+
+#include "EmulatorFixture.h"
+
+namespace emu::test {
+namespace {
+
+bool wellFormed(const std::string& body) {
+    XML_Parser p = XML_ParserCreate(nullptr);
+    const bool ok = XML_Parse(p, body.data(), static_cast<int>(body.size()), 1) == XML_STATUS_OK;
+    XML_ParserFree(p);
+    return ok;
+}
+
+using ProtocolTest = EmulatorFixture;
+
+struct ErrorCase {
+    const char* name;
+    bool https;
+    std::function<Fields(ProtocolTest&)> fields;
+    int code;
+};
+
+TEST_F(ProtocolTest, EachInvalidRequestGetsItsErrorDocument) {
+    const std::vector<ErrorCase> cases = {
+        {"wrong signature", false,
+         [](ProtocolTest& t) { auto f = t.fqlCall(); f["sig"] = std::string(32, '0'); return f; }, 104},
+        {"uppercase signature", false,
+         [](ProtocolTest& t) {
+             auto f = t.fqlCall();
+             for (char& c : f["sig"]) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
+             return f;
+         },
+         104},
+        {"signed with the application secret instead of the session's", false,
+         [](ProtocolTest& t) { return sign(t.fqlCall(), DemoAccount::appSecret); }, 104},
+        {"unknown api_key", false,
+         [](ProtocolTest& t) {
+             auto f = t.fqlCall();
+             f["api_key"] = "0123";
+             return sign(f, t.session.secret);
+         },
+         101},
+        {"missing api_key", false,
+         [](ProtocolTest& t) {
+             auto f = t.fqlCall();
+             f.erase("api_key");
+             return sign(f, t.session.secret);
+         },
+         101},
+        {"missing method", false,
+         [](ProtocolTest& t) {
+             auto f = t.fqlCall();
+             f.erase("method");
+             return sign(f, t.session.secret);
+         },
+         3},
+        {"unknown method", false, [](ProtocolTest& t) { return t.sessionCall("facebook.photos.delete"); }, 3},
+        {"missing session", false,
+         [](ProtocolTest& t) { return t.appCall("facebook.fql.query", {{"query", kFql}}); }, 102},
+        {"unknown session", false,
+         [](ProtocolTest& t) {
+             Session forged{"nobody-1", "secret", DemoAccount::uid, 0};
+             return t.sessionCall("facebook.fql.query", {{"query", kFql}}, &forged);
+         },
+         102},
+        {"expired session", false,
+         [](ProtocolTest& t) {
+             auto f = t.fqlCall();
+             t.now += 3600;
+             return f;
+         },
+         102},
+        {"login over plain HTTP", false, [](ProtocolTest& t) { return t.loginFields(); }, 8},
+        {"wrong password", true, [](ProtocolTest& t) { return t.loginFields("guess"); }, 100},
+        {"login without e-mail", true,
+         [](ProtocolTest& t) { return t.appCall("auth.login", {{"password", DemoAccount::password}}); }, 100},
+        {"fql.query without query", false, [](ProtocolTest& t) { return t.sessionCall("fql.query"); }, 100},
+        // The service's order: an earlier check wins when several fail.
+        {"unknown api_key before bad signature", false,
+         [](ProtocolTest& t) { auto f = t.fqlCall(); f["api_key"] = "x"; return f; }, 101},
+        {"missing method before bad session", false,
+         [](ProtocolTest&) { return Fields{{"api_key", DemoAccount::apiKey}, {"session_key", "x"}}; }, 3},
+        {"bad session before bad signature", false,
+         [](ProtocolTest& t) { auto f = t.fqlCall(); f["session_key"] = "x"; return f; }, 102},
+        {"bad signature before unknown method", false,
+         [](ProtocolTest& t) { auto f = t.sessionCall("no.such"); f["sig"] = "0"; return f; }, 104},
+        {"bad signature before missing parameter", false,
+         [](ProtocolTest& t) { auto f = t.sessionCall("fql.query"); f["sig"] = "0"; return f; }, 104},
+        {"bad signature before login over HTTP", false,
+         [](ProtocolTest& t) { auto f = t.loginFields(); f["sig"] = "0"; return f; }, 104},
+    };
+
+    TestClient https;
+    useHttps(https);
+    for (const ErrorCase& c : cases) {
+        SCOPED_TRACE(c.name);
+        // A fresh session for each case: the expired case moves the clock on.
+        session = emulator->loginDemo();
+        const Fields fields = c.fields(*this);
+        const Reply r = c.https ? https.postForm(kHttpsUrl, fields) : client.postForm(emulator->httpUrl(), fields);
+        ASSERT_EQ(r.code, CURLE_OK);
+        EXPECT_EQ(r.status, 200);
+        EXPECT_EQ(r.errorCode(), c.code) << r.body;
+        EXPECT_EQ(elementText(r.body, "error_msg"), Protocol::errorText(c.code));
+        // Every argument comes back, sig and call_id included; the password never does.
+        for (const auto& [key, value] : fields) {
+            const std::string shown = key == "password" ? "***" : value;
+            EXPECT_NE(r.body.find("<arg><key>" + key + "</key><value>" + shown + "</value></arg>"), std::string::npos)
+                << key << " in " << r.body;
+        }
+        if (fields.count("password")) {
+            EXPECT_EQ(r.body.find(fields.at("password")), std::string::npos);
+        }
+    }
+}
+
+TEST_F(ProtocolTest, ErrorDocumentHasTheServiceLayout) {
+    Fields f = fqlCall();
+    f["sig"] = "bad";
+    const Reply r = client.postForm(emulator->httpUrl(), f);
+    const std::string expected =
+        "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n"
+        "<error_response xmlns=\"http://api.facebook.com/1.0/\" xmlns:xsi=\"http://www.w3.org/2001/XMLSchema-instance\">"
+        "<error_code>104</error_code><error_msg>Incorrect signature</error_msg><request_args list=\"true\">"
+        "<arg><key>api_key</key><value>" + std::string(DemoAccount::apiKey) + "</value></arg>"
+        "<arg><key>call_id</key><value>1</value></arg>"
+        "<arg><key>method</key><value>facebook.fql.query</value></arg>"
+        "<arg><key>query</key><value>" + kFql + "</value></arg>"
+        "<arg><key>session_key</key><value>" + session.key + "</value></arg>"
+        "<arg><key>sig</key><value>bad</value></arg>"
+        "<arg><key>v</key><value>1.0</value></arg>"
+        "</request_args></error_response>\n";
+    EXPECT_EQ(r.body, expected);
+}
+
+TEST_F(ProtocolTest, AnswersAreXmlWithStatus200EvenForErrors) {
+    Fields bad = fqlCall();
+    bad["sig"] = "bad";
+    for (const Fields& f : {fqlCall(), bad}) {
+        const Reply r = client.postForm(emulator->httpUrl(), f);
+        EXPECT_EQ(r.status, 200);
+        EXPECT_EQ(r.contentType, "text/xml; charset=utf-8");
+        EXPECT_TRUE(wellFormed(r.body)) << r.body;
+    }
+}
+
+TEST_F(ProtocolTest, LoginOverHttpsGivesASessionThatSignsLaterCalls) {
+    TestClient https;
+    useHttps(https);
+    const Reply login = https.postForm(kHttpsUrl, loginFields());
+    ASSERT_EQ(login.code, CURLE_OK);
+    ASSERT_EQ(login.errorCode(), 0) << login.body;
+    ASSERT_NE(login.body.find("<auth_login_response xmlns="), std::string::npos) << login.body;
+
+    Session s;
+    s.key = elementText(login.body, "session_key");
+    s.secret = elementText(login.body, "secret");
+    ASSERT_FALSE(s.key.empty());
+    ASSERT_EQ(s.secret.size(), 32u);
+    EXPECT_EQ(elementText(login.body, "uid"), std::to_string(DemoAccount::uid));
+    EXPECT_EQ(elementText(login.body, "expires"), std::to_string(now + 3600));
+
+    // A second login is a second session, not the same one.
+    const Reply again = https.postForm(kHttpsUrl, loginFields());
+    EXPECT_NE(elementText(again.body, "session_key"), s.key);
+
+    for (const char* method : {"facebook.fql.query", "fql.query"}) {
+        SCOPED_TRACE(method);
+        const Reply r = client.postForm(emulator->httpUrl(), sessionCall(method, {{"query", kFql}}, &s));
+        ASSERT_EQ(r.code, CURLE_OK);
+        EXPECT_EQ(r.errorCode(), 0) << r.body;
+        EXPECT_NE(r.body.find("<fql_query_response xmlns=\"http://api.facebook.com/1.0/\" "
+                              "xmlns:xsi=\"http://www.w3.org/2001/XMLSchema-instance\" list=\"true\">"),
+                  std::string::npos)
+            << r.body;
+        EXPECT_NE(r.body.find("<name>"), std::string::npos) << r.body;
+    }
+}
+
+TEST_F(ProtocolTest, HttpsIsRefusedUnlessTheClientTrustsTheEmulatorsCa) {
+    const std::string port = std::to_string(emulator->httpsPort());
+    struct Case {
+        const char* name;
+        bool trust;
+        std::string url;
+        std::string connectTo;
+        CURLcode expected;
+    };
+    const std::vector<Case> cases = {
+        {"trusted, service host name", true, kHttpsUrl, "api.facebook.com:443:127.0.0.1:" + port, CURLE_OK},
+        {"trusted, localhost", true, "https://localhost:" + port + "/restserver.php", "", CURLE_OK},
+        {"trusted, loopback address", true, "https://127.0.0.1:" + port + "/restserver.php", "", CURLE_OK},
+        {"system CAs only", false, kHttpsUrl, "api.facebook.com:443:127.0.0.1:" + port,
+         CURLE_PEER_FAILED_VERIFICATION},
+        {"trusted, a name the certificate lacks", true, "https://www.example.org/restserver.php",
+         "www.example.org:443:127.0.0.1:" + port, CURLE_PEER_FAILED_VERIFICATION},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.name);
+        TestClient https;
+        if (c.trust) https.trust(emulator->caFile());
+        https.connectTo(c.connectTo);
+        const Reply r = https.postForm(c.url, loginFields());
+        EXPECT_EQ(r.code, c.expected) << curl_easy_strerror(r.code);
+        if (c.expected == CURLE_OK) {
+            EXPECT_EQ(r.errorCode(), 0) << r.body;
+        }
+    }
+}
+
+TEST_F(ProtocolTest, ArgumentsMergeFromQueryStringAndBody) {
+    const std::string image = std::string("\xff\xd8\xff\xe0", 4) + std::string(5000, '\x42') + std::string(1, '\0');
+    const Fields all = sessionCall("facebook.photos.upload", {{"caption", "a & b = c"}, {"aid", ""}});
+    // method, api_key and v in the query string; the rest in the body.
+    Fields inQuery, inBody;
+    for (const auto& [k, v] : all) (k == "method" || k == "api_key" || k == "v" ? inQuery : inBody)[k] = v;
+    const std::string url = emulator->httpUrl() + "?" + client.encode(inQuery);
+
+    struct Case {
+        const char* name;
+        std::function<Reply()> send;
+        bool file;
+    };
+    const std::vector<Case> cases = {
+        {"query string only (GET)", [&] { return client.get(emulator->httpUrl(), all); }, false},
+        {"query string and url-encoded body", [&] { return client.postForm(url, inBody); }, false},
+        {"query string and multipart body with a file", [&] { return client.postMultipart(url, inBody, &image); },
+         true},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.name);
+        emulator->log().clear();
+        const Reply r = c.send();
+        ASSERT_EQ(r.code, CURLE_OK);
+        // Without the file the store answers 324: the call itself was valid and signed.
+        EXPECT_EQ(r.errorCode(), c.file ? 0 : 324) << r.body;
+        const auto logged = emulator->log().entries();
+        ASSERT_EQ(logged.size(), 1u);
+        EXPECT_EQ(logged[0].args, all);
+        EXPECT_EQ(logged[0].hadFile, c.file);
+        EXPECT_EQ(logged[0].fileSize, c.file ? image.size() : 0u);
+    }
+}
+
+TEST_F(ProtocolTest, StrictCallIdRejectsACallIdThatDoesNotGrow) {
+    struct Step {
+        const char* callId;
+        int code;
+    };
+    const std::vector<Step> strict = {{"1", 0}, {"2", 0}, {"2", 103}, {"1", 103}, {"10", 0},
+                                      {"x", 103}, {"", 103}, {"-5", 103}, {"11", 0}};
+    const std::vector<Step> lax = {{"1", 0}, {"1", 0}, {"0", 0}, {"x", 0}};
+    for (bool on : {true, false}) {
+        SCOPED_TRACE(on ? "strict" : "default");
+        Emulator::Options o = options();
+        o.strictCallId = on;
+        o.httpsPort = -1;
+        start(o);
+        for (const Step& s : on ? strict : lax) {
+            const Reply r = client.postForm(emulator->httpUrl(),
+                                            sessionCall("fql.query", {{"query", kFql}, {"call_id", s.callId}}));
+            EXPECT_EQ(r.errorCode(), s.code) << "call_id " << s.callId;
+        }
+    }
+}
+
+TEST_F(ProtocolTest, RequestLogShowsWhatClientsSentWithoutSecrets) {
+    TestClient https;
+    useHttps(https);
+    ASSERT_EQ(https.postForm(kHttpsUrl, loginFields()).errorCode(), 0);
+    ASSERT_EQ(client.postForm(emulator->httpUrl(), fqlCall()).errorCode(), 0);
+    Fields bad = sessionCall("stream.get");
+    bad["sig"] = "0";
+    ASSERT_EQ(client.postForm(emulator->httpUrl(), bad).errorCode(), 104);
+
+    const auto all = emulator->log().entries();
+    ASSERT_EQ(all.size(), 3u);
+    EXPECT_EQ(emulator->log().total(), 3u);
+    EXPECT_EQ(all[0].method, "facebook.auth.login");
+    EXPECT_TRUE(all[0].https);
+    EXPECT_EQ(all[0].args.at("password"), "***");
+    EXPECT_EQ(all[0].args.at("email"), DemoAccount::email);
+    EXPECT_EQ(all[0].errorCode, 0);
+
+    EXPECT_EQ(all[1].method, "facebook.fql.query");
+    EXPECT_FALSE(all[1].https);
+    EXPECT_EQ(all[1].fql, kFql);
+    EXPECT_EQ(all[1].args.count("sig"), 1u);
+
+    EXPECT_EQ(all[2].errorCode, 104);
+    EXPECT_TRUE(all[2].fql.empty());
+    EXPECT_EQ(emulator->log().entriesFor("fql.query").size(), 1u);
+    EXPECT_EQ(emulator->log().entriesFor("stream.get").size(), 1u);
+
+    emulator->log().clear();
+    EXPECT_TRUE(emulator->log().entries().empty());
+    EXPECT_EQ(emulator->log().total(), 0u);
+}
+
+TEST_F(ProtocolTest, KeepAliveServesManyRequestsOnOneConnection) {
+    TestClient https;
+    useHttps(https);
+    struct Case {
+        const char* name;
+        std::function<Reply()> send;
+        int requests;
+    };
+    const std::vector<Case> cases = {
+        {"http", [&] { return client.postForm(emulator->httpUrl(), fqlCall()); }, 300},
+        {"https", [&] { return https.postForm(kHttpsUrl, loginFields()); }, 60},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.name);
+        long connections = 0;
+        long port = -1;
+        for (int i = 0; i < c.requests; ++i) {
+            const Reply r = c.send();
+            ASSERT_EQ(r.code, CURLE_OK);
+            ASSERT_EQ(r.errorCode(), 0) << r.body;
+            connections += r.newConnections;
+            if (port < 0) port = r.localPort;
+            EXPECT_EQ(r.localPort, port) << "request " << i;
+        }
+        EXPECT_EQ(connections, 1);
+    }
+}
+
+TEST_F(ProtocolTest, StopDoesNotWaitForIdleKeepAliveConnections) {
+    Emulator::Options o = options();
+    o.keepAliveSeconds = 60;
+    start(o);
+    TestClient https;
+    useHttps(https);
+    ASSERT_EQ(client.postForm(emulator->httpUrl(), fqlCall()).errorCode(), 0);
+    ASSERT_EQ(https.postForm(kHttpsUrl, loginFields()).errorCode(), 0);
+
+    // Both clients keep their connections open; stopping must not wait out the keep-alive time.
+    const auto before = std::chrono::steady_clock::now();
+    emulator->stop();
+    EXPECT_LT(std::chrono::steady_clock::now() - before, std::chrono::seconds(20));
+    EXPECT_EQ(emulator->httpPort(), -1);
+
+    std::string error;
+    ASSERT_TRUE(emulator->start(error)) << error;
+    // Sessions outlive a restart; the old connection is gone and the client opens a new one.
+    const Reply r = client.postForm(emulator->httpUrl(), fqlCall());
+    ASSERT_EQ(r.code, CURLE_OK);
+    EXPECT_EQ(r.errorCode(), 0) << r.body;
+    EXPECT_EQ(r.newConnections, 1);
+}
+
+TEST_F(ProtocolTest, PortsInUseAreReportedNotIgnored) {
+    Emulator::Options o = options();
+    o.httpPort = emulator->httpPort();
+    o.httpsPort = -1;
+    Emulator second(o);
+    std::string error;
+    EXPECT_FALSE(second.start(error));
+    EXPECT_NE(error.find(std::to_string(o.httpPort)), std::string::npos) << error;
+}
+
+}  // namespace
+}  // namespace emu::test

@@ -1,0 +1,123 @@
+#include "TestClient.h"
+
+#include <openssl/evp.h>
+
+#include <cstdio>
+#include <regex>
+#include <stdexcept>
+
+namespace emu::test {
+namespace {
+
+std::size_t collect(char* data, std::size_t size, std::size_t count, void* out) {
+    static_cast<std::string*>(out)->append(data, size * count);
+    return size * count;
+}
+
+std::string md5Hex(const std::string& text) {
+    unsigned char digest[EVP_MAX_MD_SIZE];
+    unsigned int length = 0;
+    EVP_Digest(text.data(), text.size(), digest, &length, EVP_md5(), nullptr);
+    std::string out;
+    char two[3];
+    for (unsigned int i = 0; i < length; ++i) {
+        std::snprintf(two, sizeof two, "%02x", digest[i]);
+        out += two;
+    }
+    return out;
+}
+
+}  // namespace
+
+int Reply::errorCode() const {
+    static const std::regex code("<error_response[^>]*>\\s*<error_code>(\\d+)</error_code>");
+    std::smatch m;
+    return std::regex_search(body, m, code) ? std::stoi(m[1]) : 0;
+}
+
+TestClient::TestClient() : curl_(curl_easy_init()) {
+    if (curl_ == nullptr) throw std::runtime_error("curl_easy_init failed");
+}
+
+TestClient::~TestClient() { curl_easy_cleanup(curl_); }
+
+std::string TestClient::encode(const Fields& fields) {
+    std::string out;
+    for (const auto& [key, value] : fields) {
+        char* k = curl_easy_escape(curl_, key.data(), static_cast<int>(key.size()));
+        char* v = curl_easy_escape(curl_, value.data(), static_cast<int>(value.size()));
+        if (!out.empty()) out += '&';
+        out += k;
+        out += '=';
+        out += v;
+        curl_free(k);
+        curl_free(v);
+    }
+    return out;
+}
+
+Reply TestClient::perform(const std::string& url) {
+    Reply reply;
+    curl_slist* connectTo = nullptr;
+    if (!connectTo_.empty()) connectTo = curl_slist_append(nullptr, connectTo_.c_str());
+    curl_easy_setopt(curl_, CURLOPT_URL, url.c_str());
+    curl_easy_setopt(curl_, CURLOPT_CONNECT_TO, connectTo);
+    curl_easy_setopt(curl_, CURLOPT_CAINFO, caFile_.empty() ? nullptr : caFile_.c_str());
+    curl_easy_setopt(curl_, CURLOPT_WRITEFUNCTION, &collect);
+    curl_easy_setopt(curl_, CURLOPT_WRITEDATA, &reply.body);
+    curl_easy_setopt(curl_, CURLOPT_TIMEOUT, 30L);
+    curl_easy_setopt(curl_, CURLOPT_NOSIGNAL, 1L);
+    reply.code = curl_easy_perform(curl_);
+    curl_easy_getinfo(curl_, CURLINFO_RESPONSE_CODE, &reply.status);
+    curl_easy_getinfo(curl_, CURLINFO_NUM_CONNECTS, &reply.newConnections);
+    curl_easy_getinfo(curl_, CURLINFO_LOCAL_PORT, &reply.localPort);
+    char* type = nullptr;
+    if (curl_easy_getinfo(curl_, CURLINFO_CONTENT_TYPE, &type) == CURLE_OK && type != nullptr) reply.contentType = type;
+    curl_easy_setopt(curl_, CURLOPT_CONNECT_TO, nullptr);
+    curl_slist_free_all(connectTo);
+    return reply;
+}
+
+Reply TestClient::postForm(const std::string& url, const Fields& fields) {
+    const std::string body = encode(fields);
+    curl_easy_setopt(curl_, CURLOPT_MIMEPOST, nullptr);
+    curl_easy_setopt(curl_, CURLOPT_POSTFIELDSIZE, static_cast<long>(body.size()));
+    curl_easy_setopt(curl_, CURLOPT_COPYPOSTFIELDS, body.c_str());
+    return perform(url);
+}
+
+Reply TestClient::postMultipart(const std::string& url, const Fields& fields, const std::string* file) {
+    curl_mime* mime = curl_mime_init(curl_);
+    for (const auto& [key, value] : fields) {
+        curl_mimepart* part = curl_mime_addpart(mime);
+        curl_mime_name(part, key.c_str());
+        curl_mime_data(part, value.data(), value.size());
+    }
+    if (file != nullptr) {
+        curl_mimepart* part = curl_mime_addpart(mime);
+        curl_mime_name(part, "upload");
+        curl_mime_filename(part, "picture.jpg");
+        curl_mime_type(part, "image/jpeg");
+        curl_mime_data(part, file->data(), file->size());
+    }
+    curl_easy_setopt(curl_, CURLOPT_MIMEPOST, mime);
+    Reply reply = perform(url);
+    curl_easy_setopt(curl_, CURLOPT_MIMEPOST, nullptr);
+    curl_mime_free(mime);
+    return reply;
+}
+
+Reply TestClient::get(const std::string& url, const Fields& fields) {
+    curl_easy_setopt(curl_, CURLOPT_HTTPGET, 1L);
+    return perform(url + "?" + encode(fields));
+}
+
+Fields sign(Fields fields, const std::string& secret) {
+    std::string text;
+    for (const auto& [key, value] : fields)
+        if (key != "sig") text += key + "=" + value;
+    fields["sig"] = md5Hex(text + secret);
+    return fields;
+}
+
+}  // namespace emu::test
