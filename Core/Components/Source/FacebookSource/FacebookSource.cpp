@@ -2,10 +2,504 @@
 
 #include <utility>
 
+#include "ContactCursor.h"
+#include "CursorBase.h"
+#include "GetRuntimeConfigurationMessage.h"
+#include "GetUserSidMessage.h"
+#include "MappingCache.h"
+#include "trelm/InputDataStream.h"
+#include "trelm/Set.h"
+#include "trelm/Trace.h"
+#include "trelm/Vector.h"
+
 namespace trelm {
+
+namespace {
+
+// Configuration keys of the source's group (and of its runtime configuration).
+char const* const kAppKey = "facebook_source_appkey";
+char const* const kAppSecret = "facebook_source_appsecret";
+char const* const kLogin = "facebook_source_login";
+char const* const kPassword = "facebook_source_password";
+char const* const kSessionUser = "facebook_source_session_user";
+char const* const kSessionId = "facebook_source_session_id";
+char const* const kSessionSecret = "facebook_source_session_secret";
+char const* const kWipeComponents = "wipeComponents";
+char const* const kWakeupComponents = "wakeupComponents";
+char const* const kHaveExtendedApi = "haveExtendedApi";
+
+char const* const kRuntimeConfiguration = "RuntimeConfiguration";
+
+// Reports an error that the source cannot act on, one trace line per level of its chain.
+void traceError(char const* what, uError const& err) {
+    String text;
+    err.format(text);
+    unsigned begin = 0;
+    bool first = true;
+    while (begin <= text.size()) {
+        unsigned end = text.find('\n', begin);
+        if (end == String::npos) end = text.size();
+        String line = first ? String("FacebookSource: ") + what + ": " : String("FacebookSource:   ");
+        line += text.substr(begin, end - begin);
+        trace(line);
+        first = false;
+        begin = end + 1;
+    }
+}
+
+// ---- Query dispatch ----
+
+struct CursorArgs {
+    SmartPtr<FacebookLibrary> library;
+    SmartPtr<FacebookSource::MappingCache> cache;
+    Vector<IQueryItems::Column> const& columns;
+    Vector<IQueryItems::Constraint> const& constraints;
+    String const& sourceId;
+    std::int64_t position;  // -1 when the query gives none
+};
+
+using CursorMaker = SmartPtr<CursorBase> (*)(CursorArgs const& args);
+
+SmartPtr<CursorBase> makeContactCursor(CursorArgs const& a) {
+    return makeSmart<ContactCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true, true);
+}
+
+// One object kind the source serves and the cursor that answers it.
+struct CursorKind {
+    int type;               // "core_object_type"
+    bool needsInteractive;  // served only when the query's flag is true
+    bool acceptsPosition;   // may be given a start position (its cursor then fetches unpaged)
+    CursorMaker make;       // null: no cursor for this kind yet (kNotSupported)
+};
+
+// In the order in which a cursor is chosen; types 4 and 5 together are served by the stream
+// cursor, which comes first.
+constexpr CursorKind kCursorKinds[] = {
+    {FacebookSource::kStatus, true, false, nullptr},
+    {FacebookSource::kPhotoEvent, true, false, nullptr},
+    {FacebookSource::kContact, true, false, &makeContactCursor},
+    {FacebookSource::kAlbum, false, true, nullptr},
+    {FacebookSource::kMedia, false, true, nullptr},
+    {FacebookSource::kFriendRequest, false, false, nullptr},
+    {FacebookSource::kMessage, true, false, nullptr},
+    {FacebookSource::kPhotoTag, false, true, nullptr},
+};
+
+CursorKind const* findKind(int type) {
+    for (CursorKind const& kind : kCursorKinds) {
+        if (kind.type == type) return &kind;
+    }
+    return nullptr;
+}
+
+// ---- Configuration changes ----
+
+// What the runtime-configuration store answered for one key.
+struct Watched {
+    enum State { NotGiven, Given, Invalid };
+    State state = NotGiven;
+    String value;
+};
+
+Watched readWatched(Map<String, Variant> const& values, char const* key) {
+    Watched w;
+    Variant const* v = values.search(key);
+    if (v == nullptr || v->empty()) return w;
+    w.state = v->as(w.value).ok() ? Watched::Given : Watched::Invalid;
+    return w;
+}
+
+bool anyChanged(ConfigurationChangedMessage const& msg, std::initializer_list<char const*> keys) {
+    for (char const* key : keys) {
+        if (msg.keys.contains(key)) return true;
+    }
+    return false;
+}
+
+// Asks "RuntimeConfiguration" for `keys` under `tag`.
+uError readRuntimeConfiguration(String const& tag, std::initializer_list<char const*> keys,
+                                Map<String, Variant>& values) {
+    for (char const* key : keys) {
+        uError err = values.insert(key, Variant());
+        if (err.failed()) return TRELM_WRAP(kFailure, err);
+    }
+    GetRuntimeConfigurationMessage request(tag, values, 0);
+    return request.send(kRuntimeConfiguration);
+}
+
+using Info = FacebookLibrary::ConnectionInfo;
+using InfoGetter = uError (Info::*)(String&) const;
+
+// Completes a pair of watched values (key and secret, login and password) for a setter: a member
+// not given keeps the value the settings hold, empty when they hold none. False when the pair is
+// to be left alone.
+bool completePair(Info const& info, Watched const& first, Watched const& second, InfoGetter getFirst,
+                  InfoGetter getSecond, String& firstValue, String& secondValue) {
+    if (first.state == Watched::Invalid || second.state == Watched::Invalid) return false;
+    if (first.state == Watched::NotGiven && second.state == Watched::NotGiven) return false;
+    struct Member {
+        Watched const& watched;
+        InfoGetter get;
+        String& out;
+    };
+    for (Member m : {Member{first, getFirst, firstValue}, Member{second, getSecond, secondValue}}) {
+        if (m.watched.state == Watched::Given) {
+            m.out = m.watched.value;
+            continue;
+        }
+        String current;
+        uError err = (info.*m.get)(current);
+        if (err.failed() && err.code() != kNotSet) {
+            traceError("reading the current settings", err);
+            return false;
+        }
+        m.out = current;
+    }
+    return true;
+}
+
+}  // namespace
 
 FacebookSource::FacebookSource(String name) : BaseSource(std::move(name), kComponentId) {}
 
-FacebookSource::~FacebookSource() = default;
+FacebookSource::~FacebookSource() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    mappingCache_.reset();
+    library_.reset();
+    connectionInfo_.reset();
+}
+
+SmartPtr<FacebookLibrary::ConnectionInfo> FacebookSource::connectionInfoRef() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return connectionInfo_;
+}
+
+void FacebookSource::startedRefs(SmartPtr<FacebookLibrary>& library, SmartPtr<MappingCache>& cache) const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    library = library_;
+    cache = mappingCache_;
+}
+
+// ---- Lifecycle ----
+
+uError FacebookSource::sendConfigImpl(Configuration::Group const& group) {
+    // Each step stands alone: a missing or malformed key leaves its setting unset and the next
+    // step runs all the same. Only the last step's result is returned.
+    auto info = makeSmart<FacebookLibrary::ConnectionInfo>(name());
+    uError result;
+
+    String appKey, appSecret;
+    result = group.get(kAppKey).as(appKey);
+    if (result.ok()) result = group.get(kAppSecret).as(appSecret);
+    if (result.ok()) result = info->setAppConfig(appKey, appSecret);
+
+    String login, password;
+    result = group.get(kLogin).as(login);
+    if (result.ok()) result = group.get(kPassword).as(password);
+    if (result.ok()) result = info->setLoginConfig(login, password);
+
+    String user, sessionId, sessionSecret;
+    uError const userRead = group.get(kSessionUser).as(user);
+    result = userRead;
+    if (userRead.ok()) {
+        result = group.get(kSessionId).as(sessionId);
+        if (result.ok()) result = group.get(kSessionSecret).as(sessionSecret);
+        if (result.ok()) {
+            result = info->setSessionConfig(sessionId, sessionSecret, user, false, false);
+        } else {
+            info->invalidateSessionConfigWithoutUser(false);
+            result = info->setUserConfig(user, false, false);
+        }
+    }
+    if (userRead.failed() || result.failed()) result = info->invalidateSessionConfigWithUser(false);
+
+    Vector<String> wipe;
+    result = group.get(kWipeComponents, wipe, Vector<String>());
+    if (result.ok()) result = info->setWipeComponents(wipe);
+
+    Vector<String> wakeup;
+    result = group.get(kWakeupComponents, wakeup, Vector<String>());
+    if (result.ok()) result = info->setWakeupComponents(wakeup);
+
+    // The settings object is published whole, so no other thread sees it half filled.
+    std::lock_guard<std::mutex> lock(mutex_);
+    connectionInfo_ = info;
+    bool extended = haveExtendedApi_;
+    result = group.get(kHaveExtendedApi, extended, true);
+    haveExtendedApi_ = extended;
+    useConfiguredSession_ = !extended;
+    return result;
+}
+
+uError FacebookSource::startupImpl() {
+    SmartPtr<FacebookLibrary::ConnectionInfo> info = connectionInfoRef();
+    if (!info) return TRELM_ERROR_MSG(kNotSet, "source started before it was configured");
+    auto library = makeSmart<FacebookLibrary>();
+    uError err = library->setup(info);
+    if (err.failed()) return err;
+    auto cache = makeSmart<MappingCache>();
+    err = cache->setup();
+    if (err.failed()) return err;
+    // Cursors opened before keep the previous client and cache.
+    std::lock_guard<std::mutex> lock(mutex_);
+    library_ = std::move(library);
+    mappingCache_ = std::move(cache);
+    return TRELM_OK();
+}
+
+uError FacebookSource::shutdownImpl() { return TRELM_OK(); }
+
+uError FacebookSource::preMessageImpl(IMessage& msg) {
+    if (msg.type() != IServiceSource::GetUserSidMessage::kType) return TRELM_OK();
+    auto* request = dynamic_cast<IServiceSource::GetUserSidMessage*>(&msg);
+    if (request == nullptr) return TRELM_ERROR_MSG(kInvalid, "message of another class");
+    SmartPtr<FacebookLibrary::ConnectionInfo> info = connectionInfoRef();
+    if (!info) return TRELM_ERROR_MSG(kNotSet, "user id asked before the source was configured");
+    return info->getUserId(request->result);
+}
+
+// ---- Configuration changes ----
+
+uError FacebookSource::configurationChangedImpl(ConfigurationChangedMessage& msg) {
+    SmartPtr<FacebookLibrary::ConnectionInfo> info;
+    SmartPtr<FacebookLibrary> library;
+    bool useConfiguredSession = false;
+    bool haveExtendedApi = true;
+    {
+        std::lock_guard<std::mutex> lock(mutex_);
+        info = connectionInfo_;
+        library = library_;
+        useConfiguredSession = useConfiguredSession_;
+        haveExtendedApi = haveExtendedApi_;
+    }
+    if (useConfiguredSession) {
+        uError err = applySessionChange(msg, library);
+        if (err.failed()) return err;
+    }
+    if (!haveExtendedApi) return TRELM_OK();
+    return applyLoginChange(msg, info, library);
+}
+
+uError FacebookSource::applySessionChange(ConfigurationChangedMessage const& msg,
+                                          SmartPtr<FacebookLibrary> const& library) {
+    if (!anyChanged(msg, {kSessionId, kSessionSecret, kSessionUser})) return TRELM_OK();
+    if (!library) return TRELM_ERROR_MSG(kNotSet, "session change before the source was started");
+    Map<String, Variant> values;
+    uError err = readRuntimeConfiguration(name(), {kSessionId, kSessionSecret, kSessionUser}, values);
+    if (err.failed()) return err;
+    Watched const id = readWatched(values, kSessionId);
+    Watched const secret = readWatched(values, kSessionSecret);
+    Watched const user = readWatched(values, kSessionUser);
+    // Only a complete answer is acted on; a partial one may be a store caught mid-update.
+    if (id.state != Watched::Given || secret.state != Watched::Given || user.state != Watched::Given) {
+        return TRELM_OK();
+    }
+    if (!id.value.empty() && !secret.value.empty() && !user.value.empty()) {
+        err = library->applySession(id.value, secret.value, user.value);
+        if (err.failed()) traceError("applying the configured session", err);
+    } else {
+        err = library->resetAccount(false);
+        if (err.failed()) traceError("resetting the account", err);
+    }
+    return TRELM_OK();
+}
+
+uError FacebookSource::applyLoginChange(ConfigurationChangedMessage const& msg,
+                                        SmartPtr<FacebookLibrary::ConnectionInfo> const& info,
+                                        SmartPtr<FacebookLibrary> const& library) {
+    if (!anyChanged(msg, {kAppKey, kAppSecret, kLogin, kPassword})) return TRELM_OK();
+    if (!info) return TRELM_ERROR_MSG(kNotSet, "login change before the source was configured");
+    Map<String, Variant> values;
+    uError err = readRuntimeConfiguration(name(), {kAppKey, kAppSecret, kLogin, kPassword}, values);
+    if (err.failed()) return err;
+
+    String appKey, appSecret;
+    if (completePair(*info, readWatched(values, kAppKey), readWatched(values, kAppSecret), &Info::getAppKey,
+                     &Info::getAppSecret, appKey, appSecret)) {
+        err = info->setAppConfig(appKey, appSecret);
+        if (err.failed()) traceError("changing the application settings", err);
+    }
+
+    String login, password;
+    if (completePair(*info, readWatched(values, kLogin), readWatched(values, kPassword), &Info::getLogin,
+                     &Info::getPassword, login, password)) {
+        err = info->setLoginConfig(login, password);
+        if (err.failed()) {
+            traceError("changing the login", err);
+        } else if (!library) {
+            traceError("signing in", TRELM_ERROR_MSG(kNotSet, "the source is not started"));
+        } else if (login.empty() && password.empty()) {
+            err = library->resetAccount(true);
+            if (err.failed()) traceError("resetting the account", err);
+        } else {
+            err = library->connect();
+            if (err.failed()) traceError("signing in", err);
+        }
+    }
+    return TRELM_OK();
+}
+
+// ---- Data operations ----
+
+uError FacebookSource::insertData(Record& record) {
+    SmartPtr<FacebookLibrary> library;
+    SmartPtr<MappingCache> cache;
+    startedRefs(library, cache);
+    if (!library) return TRELM_ERROR_MSG(kNotSet, "insert before the source was started");
+
+    int type = 0;
+    uError err = fieldRequired(record, "core_object_type", type);
+    if (err.failed()) return err;
+
+    if (type == kStatus) {
+        String text;
+        err = fieldRequiredNotEmpty(record, "core_event_text", text);
+        if (err.failed()) return err;
+        return library->setStatus(text, true);
+    }
+    if (type != kMedia) return TRELM_ERROR_MSG(kInvalid, "only status posts and photos can be inserted");
+
+    String uri;
+    err = fieldRequiredNotEmpty(record, "media_uri", uri);
+    if (err.failed()) return err;
+    // Absent optional fields simply stay empty: no caption, the default album.
+    bool present = false;
+    String caption;
+    err = fieldOptional(record, "media_notes", present, caption);
+    if (err.failed()) return err;
+    String albumId;
+    err = fieldOptional(record, "facebook_media_album_service_id", present, albumId);
+    if (err.failed()) return err;
+    auto stream = makeSmart<InputDataStream>();
+    err = stream->setUri(uri);
+    if (err.failed()) return err;
+    String photoId;
+    err = library->sendPhoto(stream, albumId, caption, photoId);
+    if (err.failed()) return err;
+    return record.insert("core_service_id", Variant(photoId));
+}
+
+uError FacebookSource::updateData(Record& /*record*/) { return TRELM_ERROR(kDataOpNotSupported); }
+
+uError FacebookSource::removeData(GUID const& /*guid*/, bool /*flag*/) { return TRELM_ERROR(kDataOpNotSupported); }
+
+uError FacebookSource::retrieveData(GUID const& guid, Record& record, bool flag) {
+    if (flag) return TRELM_ERROR(kDataOpNotSupported);
+    SmartPtr<FacebookLibrary> library;
+    SmartPtr<MappingCache> cache;
+    startedRefs(library, cache);
+    if (!cache) return TRELM_ERROR_MSG(kNotSet, "retrieve before the source was started");
+    SmartPtr<Map<String, Variant>> item;
+    uError err = cache->getItem(guid, item);
+    if (err.failed()) return err;
+    if (!item) return TRELM_ERROR(kNotFound);
+    // The stored record is shared with its cursor, which replaces records but never changes them,
+    // so it can be read outside the cache's lock.
+    for (auto const& [key, value] : *item) {
+        err = record.insert(key, value);
+        if (err.failed()) return err;
+    }
+    return TRELM_OK();
+}
+
+uError FacebookSource::manageInputDataImpl(Record const& record, bool flag) {
+    if (flag) return TRELM_ERROR(kDataOpNotSupported);
+    int type = 0;
+    uError err = fieldRequired(record, "core_object_type", type);
+    if (err.failed()) return err;
+    if (type == kStatus) return fieldRequiredStringNotEmpty(record, "core_event_text");
+    if (type == kMedia) return fieldRequiredStringNotEmpty(record, "media_uri");
+    return TRELM_ERROR(kInvalid);
+}
+
+// ---- Queries ----
+
+uError FacebookSource::doStartQuery(IQueryItems::StartQueryMessage& msg, bool flag) {
+    SmartPtr<FacebookLibrary> library;
+    SmartPtr<MappingCache> cache;
+    startedRefs(library, cache);
+    if (!library || !cache) return TRELM_ERROR_MSG(kNotSet, "query before the source was started");
+
+    Vector<IQueryItems::Constraint> const constraints = msg.constraints;
+    Set<int> candidates;
+    for (CursorKind const& kind : kCursorKinds) {
+        uError err = candidates.insert(kind.type);
+        if (err.failed()) return err;
+    }
+
+    for (IQueryItems::Constraint const& c : constraints) {
+        String const& key = c.key.name();
+        if (key == "core_object_type") {
+            if (c.function == IQueryItems::Constraint::InList) {
+                Vector<int> wanted;
+                uError err = c.value.as(wanted);
+                if (err.failed()) return TRELM_WRAP(kInvalid, err);
+                Set<int> kept;
+                for (int type : candidates) {
+                    bool listed = false;
+                    for (int w : wanted) listed = listed || w == type;
+                    if (listed) kept.insert(type);
+                }
+                candidates = std::move(kept);
+            } else if (c.function == IQueryItems::Constraint::Equal) {
+                int wanted = 0;
+                uError err = c.value.as(wanted);
+                if (err.failed()) return TRELM_WRAP(kInvalid, err);
+                // A type this source does not know leaves the candidates as they are.
+                if (findKind(wanted) != nullptr) {
+                    bool const had = candidates.contains(wanted);
+                    candidates.clear();
+                    if (had) candidates.insert(wanted);
+                }
+            } else {
+                return TRELM_ERROR_MSG(kNotSupported, "unsupported comparison on core_object_type");
+            }
+        } else if (key == "core_object_source") {
+            String source;
+            uError err = c.value.as(source);
+            if (err.failed()) return TRELM_WRAP(kInvalid, err);
+            if (source != name()) return TRELM_ERROR_MSG(kNotSupported, "query for another source");
+        }
+    }
+
+    if (candidates.empty()) return TRELM_ERROR_MSG(kNotSupported, "no object type of this source is asked for");
+    if (msg.position != -1) {
+        bool usable = false;
+        for (int type : candidates) usable = usable || findKind(type)->acceptsPosition;
+        if (flag || !usable) return TRELM_ERROR_MSG(kInvalid, "a start position cannot be used for this query");
+    }
+    bool const streamPair = candidates.size() == 2 && candidates.contains(kStatus) && candidates.contains(kPhotoEvent);
+    if (candidates.size() > 1 && !streamPair) {
+        return TRELM_ERROR_MSG(kNotSupported, "a query must ask for one object type");
+    }
+    if (!flag) {
+        for (int type : candidates) {
+            if (findKind(type)->needsInteractive) return TRELM_ERROR(kNoData);
+        }
+    }
+
+    CursorKind const* chosen = nullptr;
+    for (CursorKind const& kind : kCursorKinds) {
+        if (candidates.contains(kind.type)) {
+            chosen = &kind;
+            break;
+        }
+    }
+    if (chosen == nullptr) return TRELM_ERROR(kFailure);
+    if (chosen->make == nullptr) {
+        return TRELM_ERROR_MSG(kNotSupported,
+                               "queries for object type " + String::from(chosen->type) + " are not supported yet");
+    }
+
+    CursorArgs const args{library, cache, msg.columns, constraints, name(), msg.position};
+    SmartPtr<CursorBase> cursor = chosen->make(args);
+    uError err = cursor->start();
+    if (err.failed()) {
+        traceError("starting a cursor", err);
+        return err;
+    }
+    msg.cursor = cursor;
+    return TRELM_OK();
+}
 
 }  // namespace trelm

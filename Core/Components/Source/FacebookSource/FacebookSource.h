@@ -1,21 +1,106 @@
 #pragma once
 
+#include <mutex>
+
 #include "BaseSource.h"
+#include "ConfigurationChangedMessage.h"
+#include "FacebookLibrary.h"
+#include "IMessage.h"
+#include "IQueryItems.h"
+#include "trelm/Configuration.h"
+#include "trelm/GUID.h"
+#include "trelm/Map.h"
+#include "trelm/SmartPtr.h"
 #include "trelm/String.h"
+#include "trelm/Variant.h"
+#include "trelm/uError.h"
 
 namespace trelm {
 
-// The data source of the Facebook plug-in: answers the host's item queries with cursors over the
-// service, and posts statuses and photos that the host inserts.
+// The data source of the Facebook plug-in. It answers the host's item queries with cursors over
+// the service (contacts so far; the other object kinds answer kNotSupported until their cursors
+// exist), posts a status or uploads a photo when the host inserts one, and hands back the records
+// its cursors produced when the host asks for one by GUID.
 //
-// Lifetime: made by the plug-in's component factory and owned by the host.
-// Thread safety: see the full declaration.
+// Life of a source:
+//   FacebookSource src("facebook");   // nothing exists yet
+//   src.sendConfig(group);            // a fresh ConnectionInfo from the group (may be repeated)
+//   src.startup();                    // a FacebookLibrary set up with it, then a MappingCache
+//   ... queries, data operations, configuration changes ...
+//   src.shutdown();                   // releases nothing; the destructor drops the references
+// A query or data operation before startup fails with kNotSet; "IServiceSource::GetUserSidMessage"
+// before sendConfig fails with kNotSet too.
+//
+// Ownership: the source holds its ConnectionInfo, FacebookLibrary and MappingCache by SmartPtr.
+// Every cursor it opens holds further references to the same client and cache, so both live as
+// long as the last cursor, even after a new startup replaced the source's own references.
+//
+// Thread safety: the host may call hooks, data operations and queries from several threads. The
+// three references and the two flags are guarded by mutex_; they are copied out under it and used
+// without it, so no lock is held while the client talks to the service or sends messages. The
+// client and the cache guard their own state.
 class FacebookSource : public BaseSource {
 public:
+    // Component identifier, the same literal the plug-in's component table uses.
     static constexpr char const* kComponentId = "@trelm.example:/facebooksource";
+
+    // The identity cache shared by the source and its cursors. Defined in MappingCache.h.
+    class MappingCache;
+    // The base of the cursors that page through FQL answers. Defined in FqlCursorBase.h.
+    class FqlCursorBase;
 
     explicit FacebookSource(String name);
     ~FacebookSource() override;
+
+    // The object kinds this source serves (values of "core_object_type").
+    static constexpr int kContact = 2;
+    static constexpr int kStatus = 4;
+    static constexpr int kPhotoEvent = 5;
+    static constexpr int kMedia = 9;
+    static constexpr int kMessage = 10;
+    static constexpr int kAlbum = 11;
+    static constexpr int kFriendRequest = 12;
+    static constexpr int kPhotoTag = 13;
+
+protected:
+    uError sendConfigImpl(Configuration::Group const& group) override;
+    uError startupImpl() override;
+    uError shutdownImpl() override;
+    uError preMessageImpl(IMessage& msg) override;
+    uError configurationChangedImpl(ConfigurationChangedMessage& msg) override;
+
+    uError insertData(Record& record) override;
+    uError updateData(Record& record) override;
+    uError removeData(GUID const& guid, bool flag) override;
+    uError retrieveData(GUID const& guid, Record& record, bool flag) override;
+    uError doStartQuery(IQueryItems::StartQueryMessage& msg, bool flag) override;
+
+    // An input check over a const record: with `flag` true kDataOpNotSupported; type 4 needs a
+    // non-empty "core_event_text", type 9 a non-empty "media_uri", any other type is kInvalid.
+    // It does not replace the base's manageInputDataImpl(Record&, bool), which keeps the base's
+    // behaviour during insert(); nothing in the plug-in calls this one.
+    using BaseSource::manageInputDataImpl;
+    virtual uError manageInputDataImpl(Record const& record, bool flag);
+
+private:
+    // The session block and the login block of configurationChangedImpl.
+    uError applySessionChange(ConfigurationChangedMessage const& msg,
+                              SmartPtr<FacebookLibrary> const& library);
+    uError applyLoginChange(ConfigurationChangedMessage const& msg,
+                            SmartPtr<FacebookLibrary::ConnectionInfo> const& info,
+                            SmartPtr<FacebookLibrary> const& library);
+    // Copies of the references, taken under mutex_.
+    SmartPtr<FacebookLibrary::ConnectionInfo> connectionInfoRef() const;
+    void startedRefs(SmartPtr<FacebookLibrary>& library, SmartPtr<MappingCache>& cache) const;
+
+    // Guards the five fields below (not the objects they point to).
+    mutable std::mutex mutex_;
+    SmartPtr<FacebookLibrary::ConnectionInfo> connectionInfo_;
+    SmartPtr<FacebookLibrary> library_;
+    SmartPtr<MappingCache> mappingCache_;
+    bool haveExtendedApi_ = true;
+    // Always !haveExtendedApi_: the session comes from the configuration, not from a login.
+    bool useConfiguredSession_ = false;
 };
 
 }  // namespace trelm
