@@ -19,7 +19,8 @@ namespace trelm {
 class TRELM_API FqlParseObj : protected ListHashParseObj {
 public:
     // `root` is the answer's root element ("fql_query_response"); `rowElement` names the row
-    // elements (the table: "user", "photo", ...); the first `skip` rows are dropped.
+    // elements (the table: "user", "photo", ...; empty: every child of the root is a row); the
+    // first `skip` rows are dropped.
     FqlParseObj(String root, String rowElement, unsigned skip);
     ~FqlParseObj() override;
 
