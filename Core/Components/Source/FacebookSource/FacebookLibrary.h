@@ -147,8 +147,8 @@ public:
     uError setStatus(String const& status, bool includesVerb);
 
     // "photos.upload" of the file named by `photo` into `albumId` (empty: the application's
-    // default album) with `caption` (empty: none). `photoId` is emptied first and receives the new
-    // photo's "pid".
+    // default album) with `caption` (empty: none). Once the answer has arrived, `photoId` is
+    // emptied and receives the new photo's "pid".
     uError sendPhoto(SmartPtr<InputDataStream> photo, String const& albumId, String const& caption,
                      String& photoId);
 

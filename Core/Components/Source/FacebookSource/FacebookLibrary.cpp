@@ -1,0 +1,453 @@
+#include "FacebookLibrary.h"
+
+#include <cstdlib>
+
+#include "ConnectionInfo.h"
+#include "GetRuntimeConfigurationMessage.h"
+#include "HttpObjectRequestMessage.h"
+#include "LoginStatusMessage.h"
+#include "MessageParser.h"
+#include "PhotoUploadParser.h"
+#include "ThreadParser.h"
+#include "WakeupMessage.h"
+#include "WipeMessage.h"
+#include "trelm/FStreamParseObj.h"
+#include "trelm/FlatParseObj.h"
+#include "trelm/FqlParseObj.h"
+#include "trelm/HashParseObj.h"
+#include "trelm/HttpRequest.h"
+#include "trelm/MD5.h"
+#include "trelm/Mutex.h"
+#include "trelm/Trace.h"
+#include "trelm/Variant.h"
+
+// Evaluates an uError expression and returns it from the enclosing function when it failed.
+#define LIB_TRY(expr)                           \
+    do {                                        \
+        ::trelm::uError lib_err_ = (expr);      \
+        if (lib_err_.failed()) return lib_err_; \
+    } while (0)
+
+namespace trelm {
+namespace {
+
+constexpr char const* kHttpFactory = "HttpRequestFactory";
+
+// Reports an error that the caller goes on without. `what` names the step; the formatted chain
+// holds codes and locations only (no request fields end up in error texts).
+void note(char const* what, uError const& err) {
+    String line("FacebookLibrary: ");
+    line += what;
+    line += '\n';
+    err.format(line);
+    trace(line);
+}
+
+// The service writes numbers as bare text, but a pretty-printed document may surround them with
+// white space; anything else is not a number.
+String trimmed(String const& text) {
+    unsigned begin = 0;
+    unsigned end = text.size();
+    auto space = [](char c) { return c == ' ' || c == '\t' || c == '\n' || c == '\r'; };
+    while (begin < end && space(text[begin])) ++begin;
+    while (end > begin && space(text[end - 1])) --end;
+    return text.substr(begin, end - begin);
+}
+
+}  // namespace
+
+FacebookLibrary::FacebookLibrary() = default;
+
+FacebookLibrary::~FacebookLibrary() {
+    if (mutexCreated_) destroyMutex(&mutex_);
+}
+
+// ---- Settings, login and session ----
+
+uError FacebookLibrary::setup(SmartPtr<ConnectionInfo> info) {
+    if (!info) return TRELM_ERROR(kInvalid);
+    if (info_) return TRELM_ERROR(kInvalid);
+    if (initMutex(&mutex_) != 0) return TRELM_ERROR(kResource);
+    mutexCreated_ = true;
+    info_ = info;
+    return TRELM_OK();
+}
+
+uError FacebookLibrary::getUserId(String& out) {
+    if (!info_) return TRELM_ERROR(kNotSet);
+    MutexGuard guard(&mutex_);
+    if (!guard.locked()) return TRELM_ERROR(kResource);
+    return info_->getUserId(out);
+}
+
+uError FacebookLibrary::getOldUserId(String const& configTag, String& oldUser) {
+    Map<String, Variant> values;
+    LIB_TRY(values.insert(ConnectionInfo::kLastUserKey, Variant()));
+    GetRuntimeConfigurationMessage msg(configTag, values);
+    uError err = msg.send(ConnectionInfo::kStoreComponent);
+    if (err.failed()) return TRELM_WRAP(kFailure, err);
+    String text;
+    if (Variant const* value = values.search(ConnectionInfo::kLastUserKey); value && !value->empty()) {
+        value->as(text);
+    }
+    oldUser = text;
+    return TRELM_OK();
+}
+
+uError FacebookLibrary::connect() {
+    if (!info_) return TRELM_ERROR(kNotSet);
+    String tag;
+    info_->getConfigTag(tag);
+    String oldUser;
+    if (uError err = getOldUserId(tag, oldUser); err.failed()) {
+        // Without the last user nobody can tell a change of person: go on as on a first sign-in.
+        note("reading the last user failed; no wipe will be sent", err);
+        oldUser = String();
+    }
+
+    String sessionId;
+    String sessionSecret;
+    String userId;
+    uError result = connectInternal(sessionId, sessionSecret, userId);
+    if (result.ok() && !oldUser.empty() && oldUser != userId) {
+        if (uError err = sendWipes(true); err.failed()) note("telling the components of the new user failed", err);
+    }
+    sendLoginStatus(tag, result.code(), userId);
+    return result;
+}
+
+uError FacebookLibrary::connectInternal(String& sessionId, String& sessionSecret, String& userId) {
+    if (!info_) return TRELM_ERROR(kNotSet);
+    String login;
+    String password;
+    {
+        MutexGuard guard(&mutex_);
+        if (!guard.locked()) return TRELM_ERROR(kResource);
+        uError err = info_->getLogin(login);
+        if (err.ok()) err = info_->getPassword(password);
+        // Without a login there is no way to sign in; callers treat it like an expired session.
+        if (err.failed()) return TRELM_WRAP(kNotSignedIn, err);
+    }
+
+    Map<String, String> args;
+    LIB_TRY(makeBaseArgs("facebook.auth.login", args));
+    LIB_TRY(args.insert("email", login));
+    LIB_TRY(args.insert("password", password));
+    LIB_TRY(addAuth(args, false));
+    String response;
+    LIB_TRY(sendPost(kLoginUrl, args, SmartPtr<InputDataStream>(), response));
+
+    Map<String, String> errorFields;
+    if (HashParseObj("error_response").parse(response, errorFields).ok()) {
+        String const* code = errorFields.search("error_code");
+        if (code == nullptr) return TRELM_ERROR(kFailure);
+        int number = 0;
+        if (trimmed(*code).to(number).failed()) return TRELM_ERROR(kFailure);
+        // The service answers wrong credentials with "invalid parameter": a failed sign-in.
+        if (number == 100) return TRELM_ERROR(kNotSignedIn);
+        return resolveBaseFacebookErrorCode(*code);
+    }
+
+    Map<String, String> fields;
+    if (uError err = HashParseObj("auth_login_response").parse(response, fields); err.failed()) {
+        return TRELM_WRAP(kFailure, err);
+    }
+    String const* uid = fields.search("uid");
+    if (uid == nullptr) return TRELM_ERROR(kFailure);
+    String const* key = fields.search("session_key");
+    if (key == nullptr) return TRELM_ERROR(kFailure);
+    String secret;
+    if (String const* given = fields.search("secret")) {
+        secret = *given;
+    } else {
+        // A session without a secret of its own is signed with the application's.
+        MutexGuard guard(&mutex_);
+        if (!guard.locked()) return TRELM_ERROR(kResource);
+        LIB_TRY(info_->getAppSecret(secret));
+    }
+
+    userId = *uid;
+    sessionId = *key;
+    sessionSecret = secret;
+    {
+        MutexGuard guard(&mutex_);
+        if (!guard.locked()) return TRELM_ERROR(kResource);
+        info_->setSessionInMemory(sessionId, sessionSecret, userId);
+    }
+    return info_->storeSession(sessionId, sessionSecret, userId, true, true);
+}
+
+uError FacebookLibrary::applySession(String const& sessionId, String const& sessionSecret, String const& userId) {
+    if (!info_) return TRELM_ERROR(kNotSet);
+    String tag;
+    info_->getConfigTag(tag);
+    String oldUser;
+    if (uError err = getOldUserId(tag, oldUser); err.failed()) {
+        note("reading the last user failed; no wipe will be sent", err);
+        oldUser = String();
+    }
+
+    {
+        MutexGuard guard(&mutex_);
+        if (!guard.locked()) return TRELM_ERROR(kResource);
+        info_->setSessionInMemory(sessionId, sessionSecret, userId);
+    }
+    // The session came from elsewhere and stays in memory only; the last user is stored so that
+    // a later sign-in can tell a change of person.
+    uError result = info_->storeSession(sessionId, sessionSecret, userId, false, true);
+    if (result.ok() && !oldUser.empty() && oldUser != userId) {
+        if (uError err = sendWipes(true); err.failed()) note("telling the components of the new user failed", err);
+    }
+    sendLoginStatus(tag, result.code(), userId);
+    return result;
+}
+
+uError FacebookLibrary::resetAccount(bool store) {
+    if (!info_) return TRELM_ERROR(kNotSet);
+    String tag;
+    info_->getConfigTag(tag);
+    if (uError err = dropSession(true, store); err.failed()) note("forgetting the stored session failed", err);
+    if (uError err = sendWipes(false); err.failed()) note("telling the components to wipe failed", err);
+    sendLoginStatus(tag, kNotSignedIn, String());
+    return TRELM_OK();
+}
+
+uError FacebookLibrary::sendWipes(bool alsoWakeup) {
+    if (!info_) return TRELM_ERROR(kNotSet);
+    String tag;
+    Vector<String> wipe;
+    Vector<String> wakeup;
+    info_->getConfigTag(tag);
+    {
+        MutexGuard guard(&mutex_);
+        if (!guard.locked()) return TRELM_ERROR(kResource);
+        info_->getWipeComponents(wipe);
+        if (alsoWakeup) info_->getWakeupComponents(wakeup);
+    }
+    Map<String, String> params;
+    LIB_TRY(params.insert(tag, String()));
+
+    // Every component keeps going on a failed send: each one that holds the previous user's data
+    // must hear of the change even if another is missing.
+    uError first = TRELM_OK();
+    for (String const& component : wipe) {
+        WipeMessage msg(params);
+        uError err = msg.send(component);
+        if (err.failed() && first.ok()) first = TRELM_WRAP_MSG(kFailure, err, "WipeMessage to " + component);
+    }
+    for (String const& component : wakeup) {
+        WakeupMessage msg(params);
+        uError err = msg.send(component);
+        if (err.failed() && first.ok()) first = TRELM_WRAP_MSG(kFailure, err, "WakeupMessage to " + component);
+    }
+    return first;
+}
+
+void FacebookLibrary::sendLoginStatus(String const& tag, unsigned status, String const& userId) {
+    ILoginStatus::LoginStatusMessage msg(tag, status, userId);
+    if (uError err = msg.send(String()); err.failed()) note("announcing the login status failed", err);
+}
+
+uError FacebookLibrary::dropSession(bool withUser, bool store) {
+    {
+        MutexGuard guard(&mutex_);
+        if (!guard.locked()) return TRELM_ERROR(kResource);
+        info_->dropSessionInMemory(withUser);
+    }
+    return store ? info_->storeSessionReset(withUser) : TRELM_OK();
+}
+
+// ---- Service calls ----
+
+uError FacebookLibrary::runFqlQuery(String const& query, String const& rowElement, Vector<Map<String, String>>& rows,
+                                    unsigned int parseArg, unsigned int& count) {
+    Map<String, String> args;
+    LIB_TRY(makeBaseArgs("facebook.fql.query", args));
+    LIB_TRY(args.insert("query", query));
+    String response;
+    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    FqlParseObj parser("fql_query_response", rowElement, parseArg);
+    return parser.parse(response, rows, count);
+}
+
+uError FacebookLibrary::runFStreamQuery(String const& viewerId, unsigned int startTime, unsigned int endTime,
+                                        unsigned int limit, Vector<Map<String, String>>& rows, unsigned int& count) {
+    Map<String, String> args;
+    LIB_TRY(makeBaseArgs("facebook.stream.get", args));
+    LIB_TRY(args.insert("viewer_id", viewerId));
+    LIB_TRY(args.insert("start_time", String::from(startTime)));
+    LIB_TRY(args.insert("end_time", String::from(endTime)));
+    LIB_TRY(args.insert("limit", String::from(limit)));
+    String response;
+    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    FStreamParseObj parser;
+    return parser.parse(response, rows, count);
+}
+
+uError FacebookLibrary::getInboxThreads(int start, int limit, Vector<ThreadObj>& threads) {
+    Map<String, String> args;
+    LIB_TRY(makeBaseArgs("mailbox.getInbox", args));
+    LIB_TRY(args.insert("start", String::from(start)));
+    LIB_TRY(args.insert("limit", String::from(limit)));
+    String response;
+    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    ThreadParser parser(threads);
+    return parser.parse(response);
+}
+
+uError FacebookLibrary::getThreadMessages(String const& threadId, String const& context, int start, int limit,
+                                          Vector<MessageObj>& messages) {
+    Map<String, String> args;
+    LIB_TRY(makeBaseArgs("mailbox.getThreadMessages", args));
+    LIB_TRY(args.insert("tid", threadId));
+    LIB_TRY(args.insert("start", String::from(start)));
+    LIB_TRY(args.insert("limit", String::from(limit)));
+    String response;
+    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    MessageParser parser(messages, context);
+    return parser.parse(response);
+}
+
+uError FacebookLibrary::setStatus(String const& status, bool includesVerb) {
+    Map<String, String> args;
+    LIB_TRY(makeBaseArgs("users.setStatus", args));
+    LIB_TRY(args.insert("status", status));
+    LIB_TRY(args.insert("status_includes_verb", includesVerb ? "1" : "0"));
+    String response;
+    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    String value;
+    LIB_TRY(FlatParseObj("users_setStatus_response").parse(response, value));
+    if (std::atoi(value.cStr()) == 0) return TRELM_ERROR(kFailure);
+    return TRELM_OK();
+}
+
+uError FacebookLibrary::sendPhoto(SmartPtr<InputDataStream> photo, String const& albumId, String const& caption,
+                                  String& photoId) {
+    Map<String, String> args;
+    LIB_TRY(makeBaseArgs("photos.upload", args));
+    if (!albumId.empty()) LIB_TRY(args.insert("aid", albumId));
+    if (!caption.empty()) LIB_TRY(args.insert("caption", caption));
+    String response;
+    LIB_TRY(runFacebookRequest(args, photo, response));
+    photoId = String();
+    PhotoUploadParser parser(photoId);
+    return parser.parse(response);
+}
+
+// ---- Request building and transport ----
+
+uError FacebookLibrary::makeBaseArgs(String const& method, Map<String, String>& args) {
+    LIB_TRY(args.insert("method", method));
+    LIB_TRY(args.insert("v", "1.0"));
+    return TRELM_OK();
+}
+
+uError FacebookLibrary::addAuth(Map<String, String>& args, bool withSession) {
+    if (!info_) return TRELM_ERROR(kNotSet);
+    MutexGuard guard(&mutex_);
+    if (!guard.locked()) return TRELM_ERROR(kResource);
+
+    String appKey;
+    LIB_TRY(info_->getAppKey(appKey));
+    LIB_TRY(args.insert("api_key", appKey));
+    if (withSession) {
+        String sessionId;
+        LIB_TRY(info_->getSessionId(sessionId));
+        // An empty session id is no session: the request goes out as an application call.
+        if (!sessionId.empty()) {
+            LIB_TRY(args.insert("session_key", sessionId));
+            ++callCounter_;
+            LIB_TRY(args.insert("call_id", String::from(callCounter_)));
+        }
+    }
+    String sig;
+    LIB_TRY(makeSignature(args, sig));
+    return args.insert("sig", sig);
+}
+
+uError FacebookLibrary::makeSignature(Map<String, String> const& args, String& sig) {
+    if (!info_) return TRELM_ERROR(kNotSet);
+    String secret;
+    if (info_->hasSession() && args.contains("session_key")) {
+        LIB_TRY(info_->getSessionSecret(secret));
+    } else {
+        LIB_TRY(info_->getAppSecret(secret));
+    }
+    String text;
+    for (auto const& [key, value] : args) {
+        text += key;
+        text += '=';
+        text += value;
+    }
+    text += secret;
+    sig = md5Hex(text);
+    return TRELM_OK();
+}
+
+uError FacebookLibrary::sendPost(String const& url, Map<String, String> const& args, SmartPtr<InputDataStream> data,
+                                 String& response) {
+    IHttpRequestFactory::HttpObjectRequestMessage msg;
+    if (uError err = msg.send(kHttpFactory); err.failed()) return TRELM_WRAP(kFailure, err);
+    SmartPtr<HttpRequest> request = msg.request;
+    if (!request) return TRELM_ERROR(kFailure);
+
+    LIB_TRY(request->setup(url));
+    LIB_TRY(request->setPostData(args));
+    if (data) LIB_TRY(request->setUploadData(data));
+    LIB_TRY(request->sendRequest());
+    int status = 0;
+    LIB_TRY(request->getResponseCode(status));
+    if (status < 200 || status > 299) {
+        request->disconnect();
+        return TRELM_ERROR_MSG(kFailure, "HTTP status " + String::from(status));
+    }
+    String body;
+    LIB_TRY(request->getResponseData(body));
+    request->disconnect();
+    response = body;
+    return TRELM_OK();
+}
+
+uError FacebookLibrary::sendRequestAndCheckErrors(Map<String, String> const& args, SmartPtr<InputDataStream> data,
+                                                  String& response) {
+    LIB_TRY(sendPost(kServiceUrl, args, data, response));
+
+    Map<String, String> fields;
+    if (HashParseObj("error_response").parse(response, fields).failed()) return TRELM_OK();
+    // "error_msg" is the service's prose; callers branch on the code alone.
+    String const* code = fields.search("error_code");
+    uError result = resolveBaseFacebookErrorCode(code ? *code : String());
+    if (result.code() == kNotSignedIn) {
+        // The user is kept so that the next sign-in can tell whether the same person comes back.
+        if (uError err = dropSession(false, true); err.failed()) note("forgetting the refused session failed", err);
+    }
+    return result;
+}
+
+uError FacebookLibrary::runFacebookRequest(Map<String, String>& args, SmartPtr<InputDataStream> data,
+                                           String& response) {
+    if (uError err = addAuth(args, true); err.failed()) {
+        if (err.code() == kNotSet) return TRELM_WRAP(kNotSignedIn, err);
+        return err;
+    }
+    return sendRequestAndCheckErrors(args, data, response);
+}
+
+uError FacebookLibrary::resolveBaseFacebookErrorCode(String const& serviceCode) {
+    int code = 0;
+    if (trimmed(serviceCode).to(code).failed()) return TRELM_ERROR(kFailure);
+    switch (code) {
+        case 2:
+            return TRELM_ERROR(kServiceUnavailable);
+        case 4:
+            return TRELM_ERROR(kRequestLimit);
+        case 102:
+        case 400:
+        case 401:
+            return TRELM_ERROR(kNotSignedIn);
+        default:
+            return TRELM_ERROR(kServiceError);
+    }
+}
+
+}  // namespace trelm

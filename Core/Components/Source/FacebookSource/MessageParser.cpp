@@ -1,0 +1,87 @@
+#include "MessageParser.h"
+
+#include <cstdlib>
+#include <utility>
+
+namespace trelm {
+namespace {
+constexpr char const* kRoot = "mailbox_getThreadMessages_response";
+constexpr char const* kMessage = ".mailbox_getThreadMessages_response.message";
+constexpr char const* kTid = ".mailbox_getThreadMessages_response.message.tid";
+}  // namespace
+
+MessageParser::MessageParser(Vector<FacebookLibrary::MessageObj>& messages, String const& context)
+    : context_(context), messages_(&messages) {}
+
+MessageParser::~MessageParser() = default;
+
+uError MessageParser::parse(String const& xml) {
+    depth_ = 0;
+    appended_ = 0;
+    errorCode_ = String();
+    timeSent_ = String();
+    attachment_ = String();
+    return runParser(xml);
+}
+
+FacebookLibrary::MessageObj* MessageParser::current() {
+    if (appended_ == 0 || messages_->empty()) return nullptr;
+    return &(*messages_)[messages_->size() - 1];
+}
+
+uError MessageParser::start(String const& name, Vector<String> const&) {
+    if (depth_ == 0 && name != kRoot && name != "error_response") return TRELM_ERROR(kFailure);
+    ++depth_;
+    if (path() == kMessage) {
+        FacebookLibrary::MessageObj message;
+        message.context = context_;
+        uError err = messages_->pushBack(std::move(message));
+        if (err.failed()) return err;
+        ++appended_;
+        timeSent_ = String();
+    }
+    return TRELM_OK();
+}
+
+uError MessageParser::end(String const& name) {
+    String const& at = path();
+    if (name == "time_sent" && at == kMessage) {
+        if (FacebookLibrary::MessageObj* message = current()) message->timeSent = std::atoi(timeSent_.cStr());
+    } else if (name == "has_attachment" && at == kMessage) {
+        if (FacebookLibrary::MessageObj* message = current()) {
+            message->hasAttachment = attachment_ == "true" || std::atoi(timeSent_.cStr()) != 0;
+        }
+    } else if (name == "code" && at == ".error_response") {
+        return FacebookLibrary::resolveBaseFacebookErrorCode(errorCode_);
+    }
+    --depth_;
+    return TRELM_OK();
+}
+
+uError MessageParser::chars(String const& text) {
+    String const& at = path();
+    if (at == ".error_response.code") {
+        errorCode_ += text;
+        return TRELM_OK();
+    }
+    FacebookLibrary::MessageObj* message = current();
+    if (message == nullptr) return TRELM_OK();
+    // First match wins. The second thread-id test never matches, so attachment_ stays empty; the
+    // has_attachment rule in end() depends on that.
+    if (at == kTid) {
+        message->threadId += text;
+    } else if (at == ".mailbox_getThreadMessages_response.message.mid") {
+        message->messageId += text;
+    } else if (at == ".mailbox_getThreadMessages_response.message.author") {
+        message->author += text;
+    } else if (at == ".mailbox_getThreadMessages_response.message.body") {
+        message->body += text;
+    } else if (at == kTid) {
+        attachment_ += text;
+    } else if (at == ".mailbox_getThreadMessages_response.message.time_sent") {
+        timeSent_ += text;
+    }
+    return TRELM_OK();
+}
+
+}  // namespace trelm

@@ -1,0 +1,44 @@
+#pragma once
+
+#include "FacebookLibrary.h"
+#include "trelm/String.h"
+#include "trelm/Vector.h"
+#include "trelm/XMLParser.h"
+#include "trelm/uError.h"
+
+namespace trelm {
+
+// Reads the answer of "mailbox.getInbox":
+//   <mailbox_getInbox_response><thread><tid>..</tid><subject>..</subject>
+//     <last_update>..</last_update>...</thread>...</mailbox_getInbox_response>
+// appending one ThreadObj per "thread" element (other children are ignored). "last_update" is
+// converted with atoi when its element ends. An "error_response" document ends the parse at the
+// end of its "code" element with the code's translation; any other root gives kFailure; a vector
+// that can't grow gives kOutOfMemory. Records appended before a failure stay.
+//
+// Lifetime: `threads` must outlive the parser. Thread safety: one thread at a time.
+class ThreadParser : public XMLParser {
+public:
+    explicit ThreadParser(Vector<FacebookLibrary::ThreadObj>& threads);
+    ~ThreadParser() override;
+
+    uError parse(String const& xml);
+
+protected:
+    uError start(String const& name, Vector<String> const& attributes) override;
+    uError end(String const& name) override;
+    uError chars(String const& text) override;
+
+private:
+    // The record being read; null before the first thread of this parse.
+    FacebookLibrary::ThreadObj* current();
+
+    // State of one parse.
+    unsigned depth_ = 0;
+    unsigned appended_ = 0;  // records this parse appended
+    String errorCode_;
+    String lastUpdate_;
+    Vector<FacebookLibrary::ThreadObj>* threads_;
+};
+
+}  // namespace trelm
