@@ -1,0 +1,129 @@
+#include "FakeHttpRequestFactory.h"
+
+#include "HttpObjectRequestMessage.h"
+
+namespace trelm::test {
+namespace {
+
+// Records the exchange and plays back the factory's answer.
+class FakeHttpRequest : public HttpRequest {
+public:
+    explicit FakeHttpRequest(FakeHttpRequestFactory& factory) : factory_(factory) {}
+
+    uError setup(String const& url) override {
+        exchange_ = FakeHttpRequestFactory::Exchange{url, {}, {}};
+        answered_ = false;
+        return TRELM_OK();
+    }
+    uError setPostData(Map<String, String> const& fields) override {
+        exchange_.fields = fields;
+        return TRELM_OK();
+    }
+    uError setUploadData(SmartPtr<InputDataStream> data) override {
+        exchange_.upload = data;
+        return TRELM_OK();
+    }
+    uError sendRequest() override {
+        answer_ = factory_.answer(exchange_);
+        if (answer_.sendError.failed()) return answer_.sendError;
+        answered_ = true;
+        return TRELM_OK();
+    }
+    uError getResponseCode(int& code) override {
+        if (!answered_) return TRELM_ERROR(kInvalid);
+        code = answer_.status;
+        return TRELM_OK();
+    }
+    uError getResponseData(String& data) override {
+        if (!answered_) return TRELM_ERROR(kInvalid);
+        data = answer_.body;
+        return TRELM_OK();
+    }
+    uError disconnect() override {
+        factory_.countDisconnect();
+        return TRELM_OK();
+    }
+
+private:
+    FakeHttpRequestFactory& factory_;
+    FakeHttpRequestFactory::Exchange exchange_;
+    FakeHttpRequestFactory::Answer answer_;
+    bool answered_ = false;
+};
+
+}  // namespace
+
+FakeHttpRequestFactory::FakeHttpRequestFactory() : Component("HttpRequestFactory", "HttpRequestFactory") {}
+
+FakeHttpRequestFactory::~FakeHttpRequestFactory() = default;
+
+void FakeHttpRequestFactory::setDefault(Answer answer) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    default_ = std::move(answer);
+}
+
+void FakeHttpRequestFactory::queue(Answer answer) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    queue_.push_back(std::move(answer));
+}
+
+void FakeHttpRequestFactory::setResponder(Responder responder) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    responder_ = std::move(responder);
+}
+
+void FakeHttpRequestFactory::refuseRequests(bool refuse) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    refuse_ = refuse;
+}
+
+std::vector<FakeHttpRequestFactory::Exchange> FakeHttpRequestFactory::exchanges() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return exchanges_;
+}
+
+unsigned FakeHttpRequestFactory::disconnects() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return disconnects_;
+}
+
+void FakeHttpRequestFactory::clear() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    exchanges_.clear();
+    queue_.clear();
+    disconnects_ = 0;
+}
+
+FakeHttpRequestFactory::Answer FakeHttpRequestFactory::answer(Exchange const& exchange) {
+    Responder responder;
+    {
+        std::lock_guard<std::mutex> lock(mutex_);
+        exchanges_.push_back(exchange);
+        if (!responder_) {
+            if (queue_.empty()) return default_;
+            Answer next = queue_.front();
+            queue_.pop_front();
+            return next;
+        }
+        responder = responder_;
+    }
+    return responder(exchange);
+}
+
+void FakeHttpRequestFactory::countDisconnect() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    ++disconnects_;
+}
+
+uError FakeHttpRequestFactory::handleMessage(IMessage& msg) {
+    if (msg.type() != IHttpRequestFactory::HttpObjectRequestMessage::kType) return TRELM_OK();
+    {
+        std::lock_guard<std::mutex> lock(mutex_);
+        if (refuse_) return TRELM_ERROR(kNotFound);
+    }
+    static_cast<IHttpRequestFactory::HttpObjectRequestMessage&>(msg).request =
+        SmartPtr<HttpRequest>(new FakeHttpRequest(*this));
+    return TRELM_OK();
+}
+
+}  // namespace trelm::test
