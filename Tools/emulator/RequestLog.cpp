@@ -12,8 +12,14 @@ void RequestLog::add(LoggedRequest entry) {
     if (!enabled_) return;
     std::lock_guard lock(mutex_);
     ++total_;
+    if (listener_) listener_(entry);
     if (entries_.size() == capacity_) entries_.pop_front();
     entries_.push_back(std::move(entry));
+}
+
+void RequestLog::setListener(Listener listener) {
+    std::lock_guard lock(mutex_);
+    listener_ = std::move(listener);
 }
 
 std::vector<LoggedRequest> RequestLog::entries() const {

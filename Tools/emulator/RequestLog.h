@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <deque>
+#include <functional>
 #include <mutex>
 #include <string>
 #include <string_view>
@@ -39,6 +40,12 @@ public:
 
     void add(LoggedRequest entry);
 
+    // Called with every entry added while the log is enabled, in the order they are added, on the
+    // thread that adds it and under the log's lock: it must be quick and must not call back into
+    // the log. Empty: no listener. The program uses it to print requests as they come.
+    using Listener = std::function<void(const LoggedRequest&)>;
+    void setListener(Listener listener);
+
     // Copies of the kept entries, oldest first.
     std::vector<LoggedRequest> entries() const;
     // Kept entries whose method, without a "facebook." prefix, is `method`.
@@ -53,7 +60,8 @@ private:
 
     std::atomic<bool> enabled_{true};  // read without the mutex: a disabled log costs no lock
 
-    mutable std::mutex mutex_;  // guards entries_ and total_
+    mutable std::mutex mutex_;  // guards entries_, total_ and listener_
+    Listener listener_;
     std::deque<LoggedRequest> entries_;
     std::uint64_t total_ = 0;
 };

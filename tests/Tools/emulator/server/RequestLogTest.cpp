@@ -32,6 +32,17 @@ TEST(RequestLogTest, DisabledLogKeepsNothing) {
     EXPECT_EQ(log.total(), 1u);
 }
 
+TEST(RequestLogTest, ListenerSeesEveryEntryThatIsKept) {
+    RequestLog log(1);
+    std::vector<std::string> seen;
+    log.setListener([&](const LoggedRequest& e) { seen.push_back(e.method); });
+    log.add(entry("a"));
+    log.add(entry("b"));  // pushes "a" out of the log, but the listener has had it
+    log.setEnabled(false);
+    log.add(entry("c"));
+    EXPECT_EQ(seen, (std::vector<std::string>{"a", "b"}));
+}
+
 TEST(RequestLogTest, EntriesForMatchesWithAndWithoutPrefix) {
     RequestLog log;
     for (const char* m : {"facebook.fql.query", "fql.query", "fql.queryx", "facebook.stream.get", ""}) log.add(entry(m));
