@@ -1,5 +1,5 @@
-// An in-process emulator on ephemeral loopback ports, with helpers that build signed calls the way
-// the client does. Uses the tree's data store when it has one, else the fake.
+// An in-process emulator on ephemeral loopback ports over a small generated dataset, with helpers
+// that build signed calls the way the client does.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -10,28 +10,11 @@
 #include <string>
 
 #include "Emulator.h"
-#include "FakeStore.h"
 #include "TestClient.h"
 
 namespace emu::test {
 
 inline constexpr const char* kFql = "SELECT name FROM user WHERE uid = me()";
-
-inline std::shared_ptr<Store> makeTestStore() {
-#ifdef TRELM_EMU_REAL_STORE
-    std::string error;
-    std::shared_ptr<Store> store = Store::open(":memory:", error);
-    if (!store) throw std::runtime_error(error);
-    GeneratorOptions small;
-    small.users = 20;
-    small.demoFriends = 5;
-    small.friendsPerUser = 3;
-    if (Status s = store->generate(small)) throw std::runtime_error(s->message);
-    return store;
-#else
-    return std::make_shared<FakeStore>();
-#endif
-}
 
 // The text of element `name` in `body`, or empty.
 inline std::string elementText(const std::string& body, const std::string& name) {
@@ -48,7 +31,9 @@ public:
 
     Emulator::Options options() {
         Emulator::Options o;
-        o.store = store_ ? store_ : (store_ = makeTestStore());
+        o.generator.users = 20;
+        o.generator.demoFriends = 5;
+        o.generator.friendsPerUser = 3;
         o.clock = [this] { return now.load(); };
         o.sessionLifetimeSeconds = 3600;
         o.threads = 8;
@@ -99,7 +84,6 @@ public:
     TestClient client;
 
 private:
-    std::shared_ptr<Store> store_;
     int callId_ = 0;
 };
 
