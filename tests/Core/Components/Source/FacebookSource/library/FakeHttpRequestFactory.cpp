@@ -5,13 +5,12 @@
 namespace trelm::test {
 namespace {
 
-// Records the exchange and plays back the factory's answer.
 class FakeHttpRequest : public HttpRequest {
 public:
     explicit FakeHttpRequest(FakeHttpRequestFactory& factory) : factory_(factory) {}
 
     uError setup(String const& url) override {
-        exchange_ = FakeHttpRequestFactory::Exchange{url, {}, {}};
+        exchange_ = {url, {}, {}};
         answered_ = false;
         return TRELM_OK();
     }
@@ -25,9 +24,8 @@ public:
     }
     uError sendRequest() override {
         answer_ = factory_.answer(exchange_);
-        if (answer_.sendError.failed()) return answer_.sendError;
-        answered_ = true;
-        return TRELM_OK();
+        answered_ = answer_.sendError.ok();
+        return answer_.sendError;
     }
     uError getResponseCode(int& code) override {
         if (!answered_) return TRELM_ERROR(kInvalid);
@@ -39,10 +37,7 @@ public:
         data = answer_.body;
         return TRELM_OK();
     }
-    uError disconnect() override {
-        factory_.countDisconnect();
-        return TRELM_OK();
-    }
+    uError disconnect() override { return TRELM_OK(); }
 
 private:
     FakeHttpRequestFactory& factory_;
@@ -53,23 +48,14 @@ private:
 
 }  // namespace
 
-FakeHttpRequestFactory::FakeHttpRequestFactory() : Component("HttpRequestFactory", "HttpRequestFactory") {}
-
-FakeHttpRequestFactory::~FakeHttpRequestFactory() = default;
-
-void FakeHttpRequestFactory::setDefault(Answer answer) {
-    std::lock_guard<std::mutex> lock(mutex_);
-    default_ = std::move(answer);
-}
-
 void FakeHttpRequestFactory::queue(Answer answer) {
     std::lock_guard<std::mutex> lock(mutex_);
     queue_.push_back(std::move(answer));
 }
 
-void FakeHttpRequestFactory::setResponder(Responder responder) {
+void FakeHttpRequestFactory::setDefault(Answer answer) {
     std::lock_guard<std::mutex> lock(mutex_);
-    responder_ = std::move(responder);
+    default_ = std::move(answer);
 }
 
 void FakeHttpRequestFactory::refuseRequests(bool refuse) {
@@ -82,45 +68,25 @@ std::vector<FakeHttpRequestFactory::Exchange> FakeHttpRequestFactory::exchanges(
     return exchanges_;
 }
 
-unsigned FakeHttpRequestFactory::disconnects() const {
-    std::lock_guard<std::mutex> lock(mutex_);
-    return disconnects_;
-}
-
 void FakeHttpRequestFactory::clear() {
     std::lock_guard<std::mutex> lock(mutex_);
     exchanges_.clear();
     queue_.clear();
-    disconnects_ = 0;
 }
 
 FakeHttpRequestFactory::Answer FakeHttpRequestFactory::answer(Exchange const& exchange) {
-    Responder responder;
-    {
-        std::lock_guard<std::mutex> lock(mutex_);
-        exchanges_.push_back(exchange);
-        if (!responder_) {
-            if (queue_.empty()) return default_;
-            Answer next = queue_.front();
-            queue_.pop_front();
-            return next;
-        }
-        responder = responder_;
-    }
-    return responder(exchange);
-}
-
-void FakeHttpRequestFactory::countDisconnect() {
     std::lock_guard<std::mutex> lock(mutex_);
-    ++disconnects_;
+    exchanges_.push_back(exchange);
+    if (queue_.empty()) return default_;
+    Answer next = std::move(queue_.front());
+    queue_.pop_front();
+    return next;
 }
 
 uError FakeHttpRequestFactory::handleMessage(IMessage& msg) {
     if (msg.type() != IHttpRequestFactory::HttpObjectRequestMessage::kType) return TRELM_OK();
-    {
-        std::lock_guard<std::mutex> lock(mutex_);
-        if (refuse_) return TRELM_ERROR(kNotFound);
-    }
+    std::lock_guard<std::mutex> lock(mutex_);
+    if (refuse_) return TRELM_ERROR(kResource);
     static_cast<IHttpRequestFactory::HttpObjectRequestMessage&>(msg).request =
         SmartPtr<HttpRequest>(new FakeHttpRequest(*this));
     return TRELM_OK();

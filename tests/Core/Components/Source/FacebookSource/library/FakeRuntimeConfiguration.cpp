@@ -6,10 +6,6 @@
 
 namespace trelm::test {
 
-FakeRuntimeConfiguration::FakeRuntimeConfiguration() : Component("RuntimeConfiguration", "RuntimeConfiguration") {}
-
-FakeRuntimeConfiguration::~FakeRuntimeConfiguration() = default;
-
 void FakeRuntimeConfiguration::failType(String const& type) {
     std::lock_guard<std::mutex> lock(mutex_);
     failType_ = type;
@@ -17,21 +13,13 @@ void FakeRuntimeConfiguration::failType(String const& type) {
 
 void FakeRuntimeConfiguration::put(String const& tag, String const& key, String const& value) {
     std::lock_guard<std::mutex> lock(mutex_);
-    Map<String, String>* values = store_.search(tag);
-    if (values == nullptr) {
-        store_.insert(tag, Map<String, String>());
-        values = store_.search(tag);
-    }
-    values->insert(key, value);
+    store_.insert(tag + "/" + key, value);
 }
 
-bool FakeRuntimeConfiguration::get(String const& tag, String const& key, String& out) const {
+String FakeRuntimeConfiguration::get(String const& tag, String const& key) const {
     std::lock_guard<std::mutex> lock(mutex_);
-    Map<String, String> const* values = store_.search(tag);
-    String const* value = values ? values->search(key) : nullptr;
-    if (value == nullptr) return false;
-    out = *value;
-    return true;
+    String const* value = store_.search(tag + "/" + key);
+    return value ? *value : String("<none>");
 }
 
 std::vector<FakeRuntimeConfiguration::Record> FakeRuntimeConfiguration::records() const {
@@ -45,44 +33,34 @@ void FakeRuntimeConfiguration::clearRecords() {
 }
 
 uError FakeRuntimeConfiguration::handleMessage(IMessage& msg) {
-    Record record;
-    record.type = msg.type();
-    bool fail = false;
-    {
-        std::lock_guard<std::mutex> lock(mutex_);
-        fail = failType_ == "*" || failType_ == msg.type();
-    }
+    std::lock_guard<std::mutex> lock(mutex_);
+    bool const fail = failType_ == msg.type();
+    Record record{msg.type(), {}, {}, {}};
     if (msg.type() == RuntimeConfigurationMessage::kType) {
-        auto& store = static_cast<RuntimeConfigurationMessage&>(msg);
-        record.tag = store.tag;
-        for (Configuration::Value const& value : store.values) record.values.insert(value.key(), value.value().asString());
-        if (!fail) {
-            for (auto const& [key, text] : record.values) put(store.tag, key, text);
+        auto& m = static_cast<RuntimeConfigurationMessage&>(msg);
+        record.tag = m.tag;
+        for (Configuration::Value const& v : m.values) record.values.insert(v.key(), v.value().asString());
+        for (auto const& [key, text] : record.values) {
+            if (!fail) store_.insert(m.tag + "/" + key, text);
         }
     } else if (msg.type() == ResetRuntimeConfigurationMessage::kType) {
-        auto& reset = static_cast<ResetRuntimeConfigurationMessage&>(msg);
-        record.tag = reset.tag;
-        record.keys = reset.keys;
-        if (!fail) {
-            std::lock_guard<std::mutex> lock(mutex_);
-            if (Map<String, String>* values = store_.search(reset.tag)) {
-                for (String const& key : reset.keys) values->remove(key);
-            }
+        auto& m = static_cast<ResetRuntimeConfigurationMessage&>(msg);
+        record.tag = m.tag;
+        record.keys = m.keys;
+        for (String const& key : m.keys) {
+            if (!fail) store_.remove(m.tag + "/" + key);
         }
     } else if (msg.type() == GetRuntimeConfigurationMessage::kType) {
-        auto& get = static_cast<GetRuntimeConfigurationMessage&>(msg);
-        record.tag = get.tag;
-        for (auto const& entry : get.values) record.keys.insert(entry.first);
-        if (!fail) {
-            for (auto& entry : get.values) {
-                String value;
-                if (this->get(get.tag, entry.first, value)) entry.second = value;
-            }
+        auto& m = static_cast<GetRuntimeConfigurationMessage&>(msg);
+        record.tag = m.tag;
+        for (auto& [key, value] : m.values) {
+            record.keys.insert(key);
+            String const* stored = store_.search(m.tag + "/" + key);
+            if (stored && !fail) value = *stored;
         }
     } else {
-        return TRELM_OK();  // broadcasts meant for others
+        return TRELM_OK();  // a broadcast meant for others
     }
-    std::lock_guard<std::mutex> lock(mutex_);
     records_.push_back(record);
     return fail ? TRELM_ERROR(kFailure) : TRELM_OK();
 }

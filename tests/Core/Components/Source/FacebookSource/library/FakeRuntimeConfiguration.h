@@ -6,19 +6,16 @@
 #include "Component.h"
 #include "trelm/Map.h"
 #include "trelm/Set.h"
-#include "trelm/String.h"
-#include "trelm/uError.h"
 
 namespace trelm::test {
 
-// A stand-in for the host's "RuntimeConfiguration": records every message it receives and keeps
-// what it is told in a map, so that a "GetRuntimeConfigurationMessage" sees earlier stores.
-// It can be told to fail messages of one type (or of every type, with the type "*").
+// Stands in for the host's "RuntimeConfiguration": records every store, reset and get message
+// and keeps what it is told, so that a get sees earlier stores. Messages of the type given to
+// failType fail with kFailure and change nothing.
 // Thread safety: every member may be called from any thread.
 class FakeRuntimeConfiguration : public Component {
 public:
-    // One message as received. `values` holds the stored key/value texts of a store message;
-    // `keys` the keys of a reset or get message.
+    // `values`: the key/value texts of a store; `keys`: the keys of a reset or get.
     struct Record {
         String type;
         String tag;
@@ -26,15 +23,12 @@ public:
         Set<String> keys;
     };
 
-    FakeRuntimeConfiguration();
-    ~FakeRuntimeConfiguration() override;
+    FakeRuntimeConfiguration() : Component("RuntimeConfiguration", "RuntimeConfiguration") {}
 
-    // Messages of `type` fail with kFailure (and change nothing); "" stops failing.
     void failType(String const& type);
     void put(String const& tag, String const& key, String const& value);
-    // The stored value, or null.
-    bool get(String const& tag, String const& key, String& out) const;
-
+    // The stored value, or "<none>".
+    String get(String const& tag, String const& key) const;
     std::vector<Record> records() const;
     void clearRecords();
 
@@ -42,10 +36,9 @@ protected:
     uError handleMessage(IMessage& msg) override;
 
 private:
-    // Guards every field below.
-    mutable std::mutex mutex_;
+    mutable std::mutex mutex_;  // guards the fields below
     std::vector<Record> records_;
-    Map<String, Map<String, String>> store_;  // tag -> key -> value
+    Map<String, String> store_;  // "tag/key" -> value
     String failType_;
 };
 

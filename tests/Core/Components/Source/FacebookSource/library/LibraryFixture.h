@@ -3,19 +3,27 @@
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <string>
+#include <vector>
 
 #include "ComponentRegistry.h"
-#include "FacebookLibrary.h"
+#include "ConnectionInfo.h"
 #include "FakeHttpRequestFactory.h"
 #include "FakeRuntimeConfiguration.h"
 #include "RecordingComponent.h"
-#include "trelm/SmartPtr.h"
 
 namespace trelm::test {
 
-// A test-owned registry with the fake "HttpRequestFactory" and "RuntimeConfiguration", a
-// ConnectionInfo under the tag "fbsource" with application key "k" and secret "s", and a client
-// set up with it. Components the test adds are removed at tear-down.
+using Fields = std::vector<std::pair<std::string, std::string>>;
+
+inline Fields entries(Map<String, String> const& map) {
+    Fields out;
+    for (auto const& [key, value] : map) out.emplace_back(key.str(), value.str());
+    return out;
+}
+
+// A test-owned registry with the two fakes, and a client set up with a ConnectionInfo under the
+// tag "fbsource" holding application key "k" and secret "s".
 class LibraryFixture : public ::testing::Test {
 protected:
     static constexpr char const* kTag = "fbsource";
@@ -26,45 +34,33 @@ protected:
         registry.activate();
         info = makeSmart<FacebookLibrary::ConnectionInfo>(kTag);
         ASSERT_TRUE(info->setAppConfig("k", "s").ok());
-        lib = makeSmart<FacebookLibrary>();
         ASSERT_TRUE(lib->setup(info).ok());
     }
 
-    void TearDown() override { registry.deactivate(); }
-
-    // A session in memory only (no store message).
+    // A session in memory only.
     void signIn(String const& session = "SK", String const& secret = "SS", String const& user = "42") {
         ASSERT_TRUE(info->setSessionConfig(session, secret, user, false, false).ok());
     }
 
-    // Adds a component that records wipe, wake-up and status messages into `events`.
-    RecordingComponent& addRecorder(String const& name, bool fail = false) {
+    // A component that records wipe, wake-up and status messages into `events`.
+    void addRecorder(String const& name, bool fail = false) {
         recorders.push_back(std::make_unique<RecordingComponent>(name, events, fail));
-        EXPECT_TRUE(registry.add(name, recorders.back().get()).ok());
-        return *recorders.back();
+        ASSERT_TRUE(registry.add(name, recorders.back().get()).ok());
     }
 
-    // The last exchange's fields (empty when none was made).
     Map<String, String> lastFields() const {
         auto all = http.exchanges();
         return all.empty() ? Map<String, String>() : all.back().fields;
     }
 
-    // Declared first: destroyed last, after the components it points to are gone from it.
+    // Declared first, so destroyed last. The destructor deactivates it.
     ComponentRegistry registry;
     FakeHttpRequestFactory http;
     FakeRuntimeConfiguration store;
-    std::shared_ptr<EventLog> events = std::make_shared<EventLog>();
+    std::shared_ptr<RecordingComponent::Log> events = std::make_shared<RecordingComponent::Log>();
     std::vector<std::unique_ptr<RecordingComponent>> recorders;
     SmartPtr<FacebookLibrary::ConnectionInfo> info;
-    SmartPtr<FacebookLibrary> lib;
+    SmartPtr<FacebookLibrary> lib = makeSmart<FacebookLibrary>();
 };
-
-// gtest printing of the framework's values.
-inline std::vector<std::pair<std::string, std::string>> entries(Map<String, String> const& map) {
-    std::vector<std::pair<std::string, std::string>> out;
-    for (auto const& [key, value] : map) out.emplace_back(key.str(), value.str());
-    return out;
-}
 
 }  // namespace trelm::test
