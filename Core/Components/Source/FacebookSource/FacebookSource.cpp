@@ -414,13 +414,8 @@ uError FacebookSource::manageInputDataImpl(Record const& record, bool flag) {
 
 // ---- Queries ----
 
-uError FacebookSource::doStartQuery(IQueryItems::StartQueryMessage& msg, bool flag) {
-    SmartPtr<FacebookLibrary> library;
-    SmartPtr<MappingCache> cache;
-    startedRefs(library, cache);
-    if (!library || !cache) return TRELM_ERROR_MSG(kNotSet, "query before the source was started");
-
-    Vector<IQueryItems::Constraint> const constraints = msg.constraints;
+uError FacebookSource::selectObjectType(Vector<IQueryItems::Constraint> const& constraints, std::int64_t position,
+                                        bool flag, String const& sourceName, int& type) {
     Set<int> candidates;
     for (CursorKind const& kind : kCursorKinds) {
         uError err = candidates.insert(kind.type);
@@ -435,10 +430,10 @@ uError FacebookSource::doStartQuery(IQueryItems::StartQueryMessage& msg, bool fl
                 uError err = c.value.as(wanted);
                 if (err.failed()) return TRELM_WRAP(kInvalid, err);
                 Set<int> kept;
-                for (int type : candidates) {
+                for (int candidate : candidates) {
                     bool listed = false;
-                    for (int w : wanted) listed = listed || w == type;
-                    if (listed) kept.insert(type);
+                    for (int w : wanted) listed = listed || w == candidate;
+                    if (listed) kept.insert(candidate);
                 }
                 candidates = std::move(kept);
             } else if (c.function == IQueryItems::Constraint::Equal) {
@@ -458,14 +453,14 @@ uError FacebookSource::doStartQuery(IQueryItems::StartQueryMessage& msg, bool fl
             String source;
             uError err = c.value.as(source);
             if (err.failed()) return TRELM_WRAP(kInvalid, err);
-            if (source != name()) return TRELM_ERROR_MSG(kNotSupported, "query for another source");
+            if (source != sourceName) return TRELM_ERROR_MSG(kNotSupported, "query for another source");
         }
     }
 
     if (candidates.empty()) return TRELM_ERROR_MSG(kNotSupported, "no object type of this source is asked for");
-    if (msg.position != -1) {
+    if (position != -1) {
         bool usable = false;
-        for (int type : candidates) usable = usable || findKind(type)->acceptsPosition;
+        for (int candidate : candidates) usable = usable || findKind(candidate)->acceptsPosition;
         if (flag || !usable) return TRELM_ERROR_MSG(kInvalid, "a start position cannot be used for this query");
     }
     bool const streamPair = candidates.size() == 2 && candidates.contains(kStatus) && candidates.contains(kPhotoEvent);
@@ -473,27 +468,37 @@ uError FacebookSource::doStartQuery(IQueryItems::StartQueryMessage& msg, bool fl
         return TRELM_ERROR_MSG(kNotSupported, "a query must ask for one object type");
     }
     if (!flag) {
-        for (int type : candidates) {
-            if (findKind(type)->needsInteractive) return TRELM_ERROR(kNoData);
+        for (int candidate : candidates) {
+            if (findKind(candidate)->needsInteractive) return TRELM_ERROR(kNoData);
         }
     }
-
-    CursorKind const* chosen = nullptr;
     for (CursorKind const& kind : kCursorKinds) {
         if (candidates.contains(kind.type)) {
-            chosen = &kind;
-            break;
+            type = kind.type;
+            return TRELM_OK();
         }
     }
-    if (chosen == nullptr) return TRELM_ERROR(kFailure);
-    if (chosen->make == nullptr) {
-        return TRELM_ERROR_MSG(kNotSupported,
-                               "queries for object type " + String::from(chosen->type) + " are not supported yet");
+    return TRELM_ERROR(kFailure);
+}
+
+uError FacebookSource::doStartQuery(IQueryItems::StartQueryMessage& msg, bool flag) {
+    SmartPtr<FacebookLibrary> library;
+    SmartPtr<MappingCache> cache;
+    startedRefs(library, cache);
+    if (!library || !cache) return TRELM_ERROR_MSG(kNotSet, "query before the source was started");
+
+    Vector<IQueryItems::Constraint> const constraints = msg.constraints;
+    int type = 0;
+    uError err = selectObjectType(constraints, msg.position, flag, name(), type);
+    if (err.code() != kSuccess) return err;
+    CursorKind const* chosen = findKind(type);
+    if (chosen == nullptr || chosen->make == nullptr) {
+        return TRELM_ERROR_MSG(kNotSupported, "queries for object type " + String::from(type) + " are not supported yet");
     }
 
     CursorArgs const args{library, cache, msg.columns, constraints, name(), msg.position};
     SmartPtr<CursorBase> cursor = chosen->make(args);
-    uError err = cursor->start();
+    err = cursor->start();
     if (err.failed()) {
         traceError("starting a cursor", err);
         return err;

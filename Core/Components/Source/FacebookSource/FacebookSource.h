@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <mutex>
 
 #include "BaseSource.h"
@@ -13,6 +14,7 @@
 #include "trelm/SmartPtr.h"
 #include "trelm/String.h"
 #include "trelm/Variant.h"
+#include "trelm/Vector.h"
 #include "trelm/uError.h"
 
 namespace trelm {
@@ -61,6 +63,18 @@ public:
     static constexpr int kAlbum = 11;
     static constexpr int kFriendRequest = 12;
     static constexpr int kPhotoTag = 13;
+
+    // The object type a query asks for, by the rules doStartQuery applies before it makes a
+    // cursor: "core_object_type" constraints (Equal: one type, unknown types ignored; InList: the
+    // types listed) narrow the eight kinds above, "core_object_source" must name `sourceName`;
+    // exactly one kind may remain, or the pair 4 and 5 (served together, as 4). A `position` other
+    // than -1 is only for albums, media and photo tags with `flag` false; contacts, status posts,
+    // photo posts and messages need `flag` true.
+    // Codes: kNotSupported (another comparison on the type, another source, no or several kinds
+    // left), kInvalid (a value of the wrong kind, a position that can't be used), kNoData (a kind
+    // that needs `flag` true asked for with false).
+    static uError selectObjectType(Vector<IQueryItems::Constraint> const& constraints, std::int64_t position,
+                                   bool flag, String const& sourceName, int& type);
 
 protected:
     uError sendConfigImpl(Configuration::Group const& group) override;

@@ -1,0 +1,177 @@
+#include <gtest/gtest.h>
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "FacebookSource.h"
+#include "GetUserSidMessage.h"
+#include "RecordDump.h"
+#include "trelm/Configuration.h"
+#include "trelm/GUID.h"
+
+namespace trelm {
+namespace {
+
+using Record = Map<String, Variant>;
+
+constexpr char const* kSourceName = "facebook";
+
+// Opens the source's own input check, which nothing in the plug-in calls.
+class CheckableSource : public FacebookSource {
+public:
+    using FacebookSource::FacebookSource;
+    using FacebookSource::manageInputDataImpl;
+};
+
+Configuration::Group configuredGroup() {
+    Configuration::Group group(kSourceName);
+    group.set("facebook_source_appkey", Variant("key"));
+    group.set("facebook_source_appsecret", Variant("secret"));
+    group.set("facebook_source_session_user", Variant("100000001"));
+    group.set("facebook_source_session_id", Variant("session"));
+    group.set("facebook_source_session_secret", Variant("session-secret"));
+    return group;
+}
+
+Record record(std::initializer_list<std::pair<char const*, Variant>> entries) {
+    Record r;
+    for (auto const& [key, value] : entries) r.insert(key, value);
+    return r;
+}
+
+// Operations that are refused whatever the service would say: none of them reaches the network
+// (no HTTP factory is registered, so a request would fail with another code).
+TEST(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
+    CheckableSource source(kSourceName);
+    ASSERT_EQ(source.sendConfig(configuredGroup()).code(), kSuccess);
+    ASSERT_EQ(source.startup().code(), kSuccess);
+
+    struct Case {
+        char const* name;
+        std::function<uError()> run;
+        unsigned code;
+    };
+    GUID const someGuid = GUID::generate();
+    Record scratch;
+    std::vector<Case> const cases = {
+        {"update", [&] { Record r = record({{"core_object_type", 4}}); return source.update(r); }, kDataOpNotSupported},
+        {"remove", [&] { return source.remove(someGuid, false); }, kDataOpNotSupported},
+        {"remove with flag", [&] { return source.remove(someGuid, true); }, kDataOpNotSupported},
+        {"retrieve with flag", [&] { return source.retrieve(someGuid, scratch, true); }, kDataOpNotSupported},
+        {"retrieve of an unknown GUID", [&] { return source.retrieve(someGuid, scratch, false); }, kNotFound},
+        {"insert of a contact",
+         [&] { Record r = record({{"core_object_type", 2}}); return source.insert(r); }, kInvalid},
+        {"insert without a type", [&] { Record r; return source.insert(r); }, kInvalid},
+        {"insert of a status without text",
+         [&] { Record r = record({{"core_object_type", 4}, {"core_event_text", ""}}); return source.insert(r); },
+         kInvalid},
+        {"insert of a photo without uri",
+         [&] { Record r = record({{"core_object_type", 9}, {"media_notes", "caption"}}); return source.insert(r); },
+         kInvalid},
+        {"insert of a photo with another scheme",
+         [&] { Record r = record({{"core_object_type", 9}, {"media_uri", "http://x/y.jpg"}}); return source.insert(r); },
+         kInvalid},
+    };
+    for (Case const& c : cases) {
+        uError err = c.run();
+        EXPECT_EQ(err.code(), c.code) << c.name << ": " << err;
+    }
+    EXPECT_TRUE(scratch.empty());
+}
+
+TEST(DataOperationsTest, InputCheckAcceptsOnlyCompleteStatusAndPhotoRecords) {
+    CheckableSource source(kSourceName);
+    struct Case {
+        char const* name;
+        Record input;
+        bool flag;
+        unsigned code;
+    };
+    std::vector<Case> const cases = {
+        {"status with text", record({{"core_object_type", 4}, {"core_event_text", "hi"}}), false, kSuccess},
+        {"status with empty text", record({{"core_object_type", 4}, {"core_event_text", ""}}), false, kInvalid},
+        {"status without text", record({{"core_object_type", 4}}), false, kInvalid},
+        {"photo with uri", record({{"core_object_type", 9}, {"media_uri", "/tmp/p.jpg"}}), false, kSuccess},
+        {"photo without uri", record({{"core_object_type", 9}}), false, kInvalid},
+        {"contact", record({{"core_object_type", 2}}), false, kInvalid},
+        {"no type", record({{"core_event_text", "hi"}}), false, kInvalid},
+        {"flag set", record({{"core_object_type", 4}, {"core_event_text", "hi"}}), true, kDataOpNotSupported},
+    };
+    for (Case const& c : cases) {
+        EXPECT_EQ(source.manageInputDataImpl(static_cast<Record const&>(c.input), c.flag).code(), c.code) << c.name;
+    }
+}
+
+TEST(DataOperationsTest, OperationsBeforeStartupFailWithNotSet) {
+    FacebookSource source(kSourceName);
+    Record status = record({{"core_object_type", 4}, {"core_event_text", "hi"}});
+    EXPECT_EQ(source.insert(status).code(), kNotSet);
+    Record out;
+    EXPECT_EQ(source.retrieve(GUID::generate(), out, false).code(), kNotSet);
+    IServiceSource::GetUserSidMessage sid;
+    EXPECT_EQ(source.onMessage(sid).code(), kNotSet);
+    // Starting without a configuration is refused too, rather than making a client without settings.
+    EXPECT_EQ(source.startup().code(), kNotSet);
+}
+
+TEST(DataOperationsTest, UserSidComesFromTheConfiguredSession) {
+    FacebookSource source(kSourceName);
+    ASSERT_EQ(source.sendConfig(configuredGroup()).code(), kSuccess);
+    IServiceSource::GetUserSidMessage sid;
+    ASSERT_EQ(source.onMessage(sid).code(), kSuccess);
+    EXPECT_EQ(sid.result, "100000001");
+
+    // A group without a session user drops the user with the session.
+    ASSERT_EQ(source.sendConfig(Configuration::Group(kSourceName)).code(), kSuccess);
+    IServiceSource::GetUserSidMessage none;
+    EXPECT_EQ(source.onMessage(none).code(), kNotSignedIn);
+}
+
+TEST(DataOperationsTest, MalformedExtendedApiFlagIsTheOnlyConfigurationError) {
+    Configuration::Group group = configuredGroup();
+    group.set("facebook_source_appkey", Variant(Vector<int>{1}));  // skipped, not reported
+    group.set("wipeComponents", Variant(12));                       // skipped, not reported
+    FacebookSource source(kSourceName);
+    EXPECT_EQ(source.sendConfig(group).code(), kSuccess);
+    group.set("haveExtendedApi", Variant("maybe"));
+    EXPECT_EQ(source.sendConfig(group).code(), kInvalid);
+}
+
+// The dump pads every key to 30 columns; a longer key gets (length - 30) spaces instead.
+TEST(RecordDumpTest, PadsKeysToThirtyColumnsAndRendersByRegisteredType) {
+    trelm_RegisterMetadataType("test_dump_unsigned", TRELM_TYPES::UINT32);
+    trelm_RegisterMetadataType("test_dump_wide", TRELM_TYPES::INT64);
+    GUID const guid = GUID::generate();
+    std::string const key30(30, 'k');
+    std::string const key33(33, 'k');
+    struct Case {
+        char const* name;
+        Record input;
+        std::string text;
+    };
+    std::vector<Case> const cases = {
+        {"short key", record({{"core_object_type", 4}}), "core_object_type:" + std::string(14, ' ') + "4\n"},
+        {"key of thirty", record({{key30.c_str(), "v"}}), key30 + ":v\n"},
+        {"key of thirty-three", record({{key33.c_str(), "v"}}), key33 + ":   v\n"},
+        {"guid", record({{"core_object_id", guid}}), "core_object_id:" + std::string(16, ' ') + guid.toString().str() + "\n"},
+        {"unsigned", record({{"test_dump_unsigned", 7u}}), "test_dump_unsigned:" + std::string(12, ' ') + "7\n"},
+        {"64-bit", record({{"test_dump_wide", 5000000000LL}}), "test_dump_wide:" + std::string(16, ' ') + "5000000000\n"},
+        {"string", record({{"core_contact_name", "Ann"}}), "core_contact_name:" + std::string(13, ' ') + "Ann\n"},
+        {"two keys in key order",
+         record({{"core_object_type", 2}, {"core_contact_name", "Ann"}}),
+         "core_contact_name:" + std::string(13, ' ') + "Ann\n" + "core_object_type:" + std::string(14, ' ') + "2\n"},
+        {"empty record", Record(), ""},
+    };
+    for (Case const& c : cases) {
+        String out("> ");
+        sprintTags(out, c.input);
+        EXPECT_EQ(out.str(), "> " + c.text) << c.name;
+    }
+    String none;
+    sprintTags(none, SmartPtr<Record>());
+    EXPECT_TRUE(none.empty());
+}
+
+}  // namespace
+}  // namespace trelm

@@ -1,0 +1,115 @@
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <random>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "MappingCache.h"
+
+namespace trelm {
+namespace {
+
+using Cache = FacebookSource::MappingCache;
+using Record = Map<String, Variant>;
+
+Metadata::Key const kKey("core_contact_service_id", TRELM_TYPES::STRING);
+
+// Several threads act like cursors sharing one cache: each takes tags, maps overlapping service
+// ids, stores records, reads records of any thread and releases its pages and tags, while a
+// checker verifies the invariants between operations. A set of ids pinned under a tag of its own
+// for the whole run must keep its GUIDs whoever maps them.
+TEST(MappingCacheStressTest, CursorsOnSeveralThreadsKeepCountsAndGuidsConsistent) {
+    Cache cache;
+    ASSERT_EQ(cache.setup().code(), kSuccess);
+
+    constexpr int kThreads = 4;
+    constexpr int kCursorsPerThread = 30;
+    constexpr int kPagesPerCursor = 4;
+    constexpr int kRowsPerPage = 25;
+    constexpr int kIdSpace = 200;  // small, so that threads keep hitting the same ids
+    constexpr int kPinned = 20;
+
+    String pinTag;
+    ASSERT_EQ(cache.getTag(pinTag).code(), kSuccess);
+    std::vector<GUID> pinned(kPinned);
+    for (int i = 0; i < kPinned; ++i) {
+        ASSERT_EQ(cache.getGuid(pinTag, Cache::SidMapKey(kKey, String::from(i)), true, pinned[i]).code(), kSuccess);
+    }
+
+    std::atomic<int> failures{0};
+    std::atomic<bool> done{false};
+    auto fail = [&](char const* what, uError const& err) {
+        ADD_FAILURE() << what << ": " << err;
+        ++failures;
+    };
+
+    auto cursor = [&](unsigned seed) {
+        std::mt19937 rng(seed);
+        for (int c = 0; c < kCursorsPerThread && failures == 0; ++c) {
+            String tag;
+            if (uError e = cache.getTag(tag); e.failed()) return fail("getTag", e);
+            for (int page = 0; page < kPagesPerCursor; ++page) {
+                // A refill releases the previous page's records, as the FQL cursors do.
+                if (uError e = cache.clearItems(tag); e.failed()) return fail("clearItems", e);
+                for (int row = 0; row < kRowsPerPage; ++row) {
+                    int const id = static_cast<int>(rng() % kIdSpace);
+                    GUID g;
+                    if (uError e = cache.getGuid(tag, Cache::SidMapKey(kKey, String::from(id)), true, g); e.failed()) {
+                        return fail("getGuid", e);
+                    }
+                    if (id < kPinned && g != pinned[id]) {
+                        ++failures;
+                        ADD_FAILURE() << "pinned id " << id << " got another GUID";
+                    }
+                    auto record = makeSmart<Record>();
+                    record->insert("core_object_id", Variant(g));
+                    record->insert("sid", Variant(String::from(id)));
+                    if (uError e = cache.setItem(tag, kKey, record); e.failed()) return fail("setItem", e);
+
+                    // Whatever record another cursor stored under a GUID must carry that GUID.
+                    SmartPtr<Record> other;
+                    if (cache.getItem(g, other).ok() && other->search("core_object_id")->asGUID() != g) {
+                        ++failures;
+                        ADD_FAILURE() << "record stored under the wrong GUID";
+                    }
+                }
+            }
+            if (uError e = cache.clearMapping(tag); e.failed()) return fail("clearMapping", e);
+            if (uError e = cache.clearItems(tag); e.failed()) return fail("clearItems", e);
+        }
+    };
+
+    std::thread checker([&] {
+        while (!done) {
+            if (uError e = cache.checkInvariants(); e.failed()) {
+                fail("invariants while running", e);
+                return;
+            }
+        }
+    });
+    std::vector<std::thread> threads;
+    for (int t = 0; t < kThreads; ++t) threads.emplace_back(cursor, 1234u + t);
+    for (auto& t : threads) t.join();
+    done = true;
+    checker.join();
+    ASSERT_EQ(failures.load(), 0);
+
+    Cache::Snapshot snapshot;
+    uError inv = cache.checkInvariants(&snapshot);
+    ASSERT_TRUE(inv.ok()) << inv;
+    // Only the pinned tag still holds anything: its mappings, and no records.
+    EXPECT_EQ(snapshot.sidEntries, unsigned(kPinned));
+    EXPECT_EQ(snapshot.sidTags, 1u);
+    EXPECT_EQ(snapshot.objEntries, 0u);
+    EXPECT_EQ(snapshot.objTags, 0u);
+
+    ASSERT_EQ(cache.clearMapping(pinTag).code(), kSuccess);
+    ASSERT_TRUE(cache.checkInvariants(&snapshot).ok());
+    EXPECT_EQ(snapshot.sidEntries, 0u);
+    EXPECT_EQ(snapshot.sidTags, 0u);
+}
+
+}  // namespace
+}  // namespace trelm

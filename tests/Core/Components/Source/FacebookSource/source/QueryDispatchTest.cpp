@@ -1,0 +1,161 @@
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "ContactCursor.h"
+#include "FacebookSource.h"
+#include "IQueryItems.h"
+#include "trelm/Configuration.h"
+
+namespace trelm {
+namespace {
+
+using Constraint = IQueryItems::Constraint;
+
+constexpr char const* kSourceName = "facebook";
+constexpr int kNone = 0;  // no type chosen: the case fails
+
+Constraint typeIs(Variant value) {
+    return Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), std::move(value), Constraint::Equal};
+}
+Constraint typeIn(Vector<int> types) {
+    return Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(types), Constraint::InList};
+}
+Constraint typeInValue(Variant value) {
+    return Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), std::move(value), Constraint::InList};
+}
+Constraint typeCompared(int type, Constraint::Function function) {
+    return Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(type), function};
+}
+Constraint sourceIs(Variant value) {
+    return Constraint{Metadata::Key("core_object_source", TRELM_TYPES::STRING), std::move(value), Constraint::Equal};
+}
+Constraint other() {
+    return Constraint{Metadata::Key("core_contact_name", TRELM_TYPES::STRING), Variant("x"), Constraint::Equal};
+}
+
+// A source configured with an application and a session (in memory only) and started: no
+// message is sent and no request made until a cursor reads.
+class QueryDispatchTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        Configuration::Group group(kSourceName);
+        group.set("facebook_source_appkey", Variant("key"));
+        group.set("facebook_source_appsecret", Variant("secret"));
+        group.set("facebook_source_session_user", Variant("100000001"));
+        group.set("facebook_source_session_id", Variant("session"));
+        group.set("facebook_source_session_secret", Variant("session-secret"));
+        ASSERT_EQ(source.sendConfig(group).code(), kSuccess);
+        ASSERT_EQ(source.startup().code(), kSuccess);
+    }
+
+    FacebookSource source{kSourceName};
+};
+
+// Every rule of the dispatch in one table: what the query asks for, the position and the flag,
+// and the type chosen (or the code of the refusal). Each case is also run as a start-query
+// message through the started source: a chosen type yields its cursor, or kNotSupported while
+// that kind has no cursor yet; a refusal yields the same code and no cursor.
+TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
+    struct Case {
+        char const* name;
+        std::vector<Constraint> constraints;
+        std::int64_t position;
+        bool flag;
+        int type;       // kNone when refused
+        unsigned code;  // of the selection
+    };
+    std::vector<Case> const cases = {
+        {"contact by value", {typeIs(2)}, -1, true, 2, kSuccess},
+        {"contact by text value", {typeIs("2")}, -1, true, 2, kSuccess},
+        {"stream pair is served by the status cursor", {typeIn({4, 5})}, -1, true, 4, kSuccess},
+        {"photo events alone", {typeIn({5})}, -1, true, 5, kSuccess},
+        {"two unrelated types", {typeIn({2, 11})}, -1, true, kNone, kNotSupported},
+        {"unknown type leaves all eight", {typeIs(3)}, -1, true, kNone, kNotSupported},
+        {"unknown list values are ignored", {typeIn({2, 99})}, -1, true, 2, kSuccess},
+        {"list then value narrows to one", {typeIn({2, 11}), typeIs(11)}, -1, true, 11, kSuccess},
+        {"value then list keeps the value", {typeIs(11), typeIn({2, 11})}, -1, true, 11, kSuccess},
+        {"value then another value leaves none", {typeIs(2), typeIs(11)}, -1, true, kNone, kNotSupported},
+        {"empty list leaves none", {typeIn({})}, -1, true, kNone, kNotSupported},
+        {"no type constraint", {other()}, -1, true, kNone, kNotSupported},
+        {"no constraints at all", {}, -1, true, kNone, kNotSupported},
+        {"ordering comparison on the type", {typeCompared(2, Constraint::GreaterThan)}, -1, true, kNone,
+         kNotSupported},
+        {"not-equal on the type", {typeCompared(2, Constraint::NotEqual)}, -1, true, kNone, kNotSupported},
+        {"type value that is no number", {typeIs("two")}, -1, true, kNone, kInvalid},
+        {"type list that is no number list", {typeInValue(Variant(Vector<String>{"x"}))}, -1, true, kNone, kInvalid},
+        {"own source accepted", {sourceIs(kSourceName), typeIs(2)}, -1, true, 2, kSuccess},
+        {"other source refused", {typeIs(2), sourceIs("other")}, -1, true, kNone, kNotSupported},
+        {"other source refused for any type", {sourceIs("other"), typeIs(9)}, -1, false, kNone, kNotSupported},
+        {"source value that is no text", {sourceIs(Variant(Vector<int>{1, 2})), typeIs(2)}, -1, true, kNone,
+         kInvalid},
+        {"background media query", {typeIs(9)}, -1, false, 9, kSuccess},
+        {"background friend requests", {typeIs(12)}, -1, false, 12, kSuccess},
+        {"background contact query", {typeIs(2)}, -1, false, kNone, kNoData},
+        {"background stream query", {typeIn({4, 5})}, -1, false, kNone, kNoData},
+        {"background messages", {typeIs(10)}, -1, false, kNone, kNoData},
+        {"several types checked before the flag", {typeIn({2, 9})}, -1, false, kNone, kNotSupported},
+        {"position on background media", {typeIs(9)}, 40, false, 9, kSuccess},
+        {"position on background albums", {typeIs(11)}, 0, false, 11, kSuccess},
+        {"position on background photo tags", {typeIs(13)}, 7, false, 13, kSuccess},
+        {"position on interactive media", {typeIs(9)}, 40, true, kNone, kInvalid},
+        {"position on a contact query", {typeIs(2)}, 40, false, kNone, kInvalid},
+        {"position checked before the type count", {typeIn({2, 9})}, 40, false, kNone, kNotSupported},
+        {"position with no usable type", {typeIn({2, 12})}, 40, false, kNone, kInvalid},
+        {"interactive photo tags", {typeIs(13)}, -1, true, 13, kSuccess},
+    };
+
+    for (Case const& c : cases) {
+        SCOPED_TRACE(c.name);
+        Vector<Constraint> constraints{std::vector<Constraint>(c.constraints)};
+        int type = kNone;
+        uError err = FacebookSource::selectObjectType(constraints, c.position, c.flag, kSourceName, type);
+        EXPECT_EQ(err.code(), c.code) << err;
+        if (c.code == kSuccess) {
+            EXPECT_EQ(type, c.type);
+        }
+
+        IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints, c.position);
+        msg.interactive = c.flag;
+        uError started = source.onMessage(msg);
+        if (c.type == kNone) {
+            EXPECT_EQ(started.code(), c.code) << started;
+            EXPECT_FALSE(msg.cursor);
+        } else if (c.type == FacebookSource::kContact) {
+            EXPECT_EQ(started.code(), kSuccess) << started;
+            EXPECT_NE(dynamic_cast<ContactCursor*>(msg.cursor.get()), nullptr);
+        } else {
+            EXPECT_EQ(started.code(), kNotSupported) << started;
+            EXPECT_FALSE(msg.cursor);
+        }
+    }
+}
+
+TEST(QueryBeforeStartupTest, FailsWithNotSetInsteadOfHandingOutACursorWithoutClient) {
+    FacebookSource source(kSourceName);
+    IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), Vector<Constraint>{typeIs(2)});
+    EXPECT_EQ(source.onMessage(msg).code(), kNotSet);
+    EXPECT_FALSE(msg.cursor);
+
+    ASSERT_EQ(source.sendConfig(Configuration::Group(kSourceName)).code(), kSuccess);
+    EXPECT_EQ(source.onMessage(msg).code(), kNotSet);
+    EXPECT_FALSE(msg.cursor);
+}
+
+TEST_F(QueryDispatchTest, ContactConstraintTheCursorCannotReadFailsTheQuery) {
+    Vector<Constraint> constraints{typeIs(2), other()};
+    IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints);
+    EXPECT_EQ(source.onMessage(msg).code(), kNotSupported);
+    EXPECT_FALSE(msg.cursor);
+
+    Constraint badId{Metadata::Key("core_contact_service_id", TRELM_TYPES::STRING), Variant("1 or 1=1"),
+                     Constraint::Equal};
+    IQueryItems::StartQueryMessage injected(Vector<IQueryItems::Column>(), Vector<Constraint>{typeIs(2), badId});
+    EXPECT_EQ(source.onMessage(injected).code(), kInvalid);
+    EXPECT_FALSE(injected.cursor);
+}
+
+}  // namespace
+}  // namespace trelm
