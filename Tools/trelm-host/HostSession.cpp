@@ -1,0 +1,86 @@
+#include "HostSession.h"
+
+#include <utility>
+
+#include "StateDirectory.h"
+
+namespace trelm {
+namespace host {
+
+HostSession::HostSession(HostOptions options) : options_(std::move(options)) {}
+
+HostSession::~HostSession() = default;
+
+uError HostSession::open(Printer& printer) {
+    uError e = StateDirectory::prepare(options_.stateDir, stateDir_);
+    if (e.failed()) return e;
+    if (!options_.configPath.empty()) {
+        e = HostConfig::load(options_.configPath, config_);
+        if (e.failed()) return e;
+    }
+
+    std::vector<std::string> paths = options_.plugins;
+    if (paths.empty()) paths.push_back(PluginLoader::defaultPluginPath());
+    for (std::string const& path : paths) {
+        e = plugins_.load(path);
+        if (e.failed()) return e;
+        printer.plugin(plugins_.plugins().back());
+    }
+
+    Map<String, Variant> http = config_.http();
+    e = prepareEndpoint(printer, http);
+    if (e.failed()) return e;
+
+    e = host_.startBuiltins(http, config_.runtime(),
+                            String(StateDirectory::runtimeStorePath(stateDir_)));
+    if (e.failed()) return e;
+
+    for (HostConfig::ComponentEntry const& entry : config_.components()) {
+        printer.component(host_.addComponent(entry, plugins_.table()));
+    }
+    return TRELM_OK();
+}
+
+uError HostSession::prepareEndpoint(Printer& printer, Map<String, Variant>& http) {
+    bool useEmulator =
+        options_.emulator.value_or(!config_.namesEndpoint() && options_.connectTo.empty());
+    uError e;
+    if (useEmulator) {
+        e = emulator_.start();
+        if (e.ok()) e = http.insert("connect_to", Variant(emulator_.connectTo()));
+        if (e.ok()) e = http.insert("ca_file", Variant(emulator_.caFile()));
+        if (e.failed()) return e;
+    }
+    if (!options_.connectTo.empty()) {
+        Vector<String> routes;
+        for (std::string const& route : options_.connectTo) {
+            e = routes.pushBack(String(route));
+            if (e.failed()) return e;
+        }
+        e = http.insert("connect_to", Variant(routes));
+        if (e.failed()) return e;
+    }
+    if (!options_.caFile.empty()) {
+        e = http.insert("ca_file", Variant(String(options_.caFile)));
+        if (e.failed()) return e;
+    }
+
+    Vector<String> routes;
+    if (Variant const* value = http.search("connect_to")) (void)value->as(routes);
+    String caFile;
+    if (Variant const* value = http.search("ca_file")) (void)value->as(caFile);
+    printer.endpoint(useEmulator, routes, caFile);
+    return TRELM_OK();
+}
+
+bool HostSession::allStarted() const {
+    for (auto const& instance : host_.instances()) {
+        if (instance.component == nullptr || instance.component->state() != Component::State::Started) {
+            return false;
+        }
+    }
+    return true;
+}
+
+}  // namespace host
+}  // namespace trelm
