@@ -38,7 +38,8 @@ void bindOne(SqliteStatement& s, int i, std::int64_t v) { s.bind(i, v); }
 void bindOne(SqliteStatement& s, int i, int v) { s.bind(i, static_cast<std::int64_t>(v)); }
 void bindOne(SqliteStatement& s, int i, double v) { s.bind(i, SqlValue::ofReal(v)); }
 void bindOne(SqliteStatement& s, int i, const std::string& v) { s.bind(i, v); }
-void bindOne(SqliteStatement& s, int i, const char* v) { s.bind(i, std::string(v)); }
+// Literal texts outlive the statement's use, so SQLite need not copy them.
+void bindOne(SqliteStatement& s, int i, const char* v) { s.bindStatic(i, v); }
 void bindOne(SqliteStatement& s, int i, std::nullopt_t) { s.bindNull(i); }
 void bindOne(SqliteStatement& s, int i, const std::optional<std::string>& v) {
     if (v) s.bind(i, *v);
@@ -81,7 +82,7 @@ Status DataGenerator::run() {
 bool DataGenerator::writeAll(std::string& error) {
     return Schema::dropSecondaryIndexes(db_, error) && makeUsers(error) && makeFriends(error) && makeAlbums(error) &&
            makePosts(error) && makeRequests(error) && makeThreads(error) && writeSequences(error) &&
-           Schema::createSecondaryIndexes(db_, error) && db_.exec("ANALYZE", error);
+           Schema::createSecondaryIndexes(db_, error) && db_.exec("PRAGMA analysis_limit = 1000; ANALYZE", error);
 }
 
 bool DataGenerator::makeUsers(std::string& error) {
@@ -161,29 +162,31 @@ bool DataGenerator::makeUsers(std::string& error) {
         "status_message, status_time, status_id, locale, about_me, hidden) "
         "VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)",
         error);
-    if (!insert) return false;
+    // Most users have a name and little else.
+    sqlite3_stmt* plain = db_.prepareCached(
+        "INSERT INTO user(uid, name, first_name, last_name, sex, locale) VALUES (?, ?, ?, ?, ?, ?)", error);
+    if (!insert || !plain) return false;
     std::unordered_map<std::int64_t, std::int64_t> statusIds;
     for (std::size_t i = 0; i < uids_.size(); ++i)
         if (isContent[i]) statusIds[uids_[i]] = ++statusSeq_;
     for (std::size_t index : byUid) {
         const std::int64_t uid = uids_[index];
         const Profile& p = profiles[index];
-        std::string first = index == 0 ? "Demo" : kFirstNames[p.first];
-        std::string last = index == 0 ? "User" : kLastNames[p.last];
-        std::string name = first + " " + last;
+        const char* first = index == 0 ? "Demo" : kFirstNames[p.first];
+        const char* last = index == 0 ? "User" : kLastNames[p.last];
+        std::string name = first;
+        name += ' ';
+        name += last;
         const char* sex = p.first % 2 ? "male" : "female";
         if (!isContent[index]) {
-            if (!insertRow(db_, insert, error, uid, name, first, last, std::nullopt, sex, std::nullopt, std::nullopt,
-                           std::nullopt, std::nullopt, std::nullopt, std::nullopt, std::nullopt, kLocales[p.locale],
-                           std::nullopt, 0))
-                return false;
+            if (!insertRow(db_, plain, error, uid, name, first, last, sex, kLocales[p.locale])) return false;
             continue;
         }
         names_[uid] = name;
         const auto& city = kCities[p.city];
         const std::string birthday =
             std::string(kMonths[p.month]) + " " + std::to_string(p.day) + ", " + std::to_string(p.year);
-        const std::string about = "Hello, I am " + first + " from " + city[0] + ".";
+        const std::string about = std::string("Hello, I am ") + first + " from " + city[0] + ".";
         if (!insertRow(db_, insert, error, uid, name, first, last, birthday, sex, city[0], city[1], city[2], city[3],
                        kStatuses[p.status], p.statusTime, statusIds[uid], kLocales[p.locale], about, p.hidden))
             return false;
@@ -198,37 +201,42 @@ bool DataGenerator::makeUsers(std::string& error) {
 }
 
 bool DataGenerator::makeFriends(std::string& error) {
-    std::vector<std::pair<std::int64_t, std::int64_t>> edges;
+    struct Edge {
+        std::int64_t uid1;
+        std::string key2;  // the client's text key of uid2
+        std::int64_t uid2;
+    };
+    std::vector<std::pair<std::int64_t, std::int64_t>> pairs;
+    for (std::int64_t f : demoFriends_) pairs.emplace_back(DemoAccount::uid, f);
+    // Each content user other than the demo user links to half its share of random users;
+    // links arriving from others make up the rest. The demo user keeps exactly its own friends.
     const std::size_t n = uids_.size();
     const std::int64_t perUser = options_.friendsPerUser / 2;
-    edges.reserve(demoFriends_.size() * 2 + (n > 1 ? n * static_cast<std::size_t>(perUser) * 2 : 0));
-    for (std::int64_t f : demoFriends_) {
-        edges.emplace_back(DemoAccount::uid, f);
-        edges.emplace_back(f, DemoAccount::uid);
-    }
-    // Each other user links to about half its share; links arriving from others make up the
-    // rest. The demo user keeps exactly its own friends.
     if (n > 2) {
-        for (std::size_t i = 1; i < n; ++i) {
+        for (std::size_t u = 1; u < contentUsers_.size(); ++u) {
             for (std::int64_t k = 0; k < perUser; ++k) {
-                const std::size_t j = 1 + static_cast<std::size_t>(below(n - 1));
-                if (j == i) continue;
-                edges.emplace_back(uids_[i], uids_[j]);
-                edges.emplace_back(uids_[j], uids_[i]);
+                const std::int64_t other = uids_[1 + static_cast<std::size_t>(below(n - 1))];
+                if (other != contentUsers_[u]) pairs.emplace_back(contentUsers_[u], other);
             }
         }
     }
-    // Rows go in in key order (uid1, then the text key), which keeps the inserts appending.
-    auto keyLess = [](const std::pair<std::int64_t, std::int64_t>& a, const std::pair<std::int64_t, std::int64_t>& b) {
-        if (a.first != b.first) return a.first < b.first;
-        return std::to_string(a.second) < std::to_string(b.second);
-    };
-    std::sort(edges.begin(), edges.end(), keyLess);
-    edges.erase(std::unique(edges.begin(), edges.end()), edges.end());
+    std::vector<Edge> edges;
+    edges.reserve(pairs.size() * 2);
+    for (const auto& [a, b] : pairs) {
+        edges.push_back(Edge{a, std::to_string(b) + " ", b});
+        edges.push_back(Edge{b, std::to_string(a) + " ", a});
+    }
+    // Rows go in in key order, which keeps the inserts appending.
+    std::sort(edges.begin(), edges.end(), [](const Edge& a, const Edge& b) {
+        return a.uid1 != b.uid1 ? a.uid1 < b.uid1 : a.key2 < b.key2;
+    });
+    edges.erase(std::unique(edges.begin(), edges.end(),
+                            [](const Edge& a, const Edge& b) { return a.uid1 == b.uid1 && a.uid2 == b.uid2; }),
+                edges.end());
     sqlite3_stmt* insert = db_.prepareCached("INSERT INTO friend(uid1, key2, uid2) VALUES (?, ?, ?)", error);
     if (!insert) return false;
-    for (const auto& [a, b] : edges)
-        if (!insertRow(db_, insert, error, a, std::to_string(b) + " ", b)) return false;
+    for (const Edge& e : edges)
+        if (!insertRow(db_, insert, error, e.uid1, e.key2, e.uid2)) return false;
     return true;
 }
 

@@ -17,12 +17,13 @@ class SqliteDatabase;
 // What is generated from GeneratorOptions (the same seed and sizes give the same rows):
 // - `users` users with ids of 6 to 10 digits (so that their text order differs from their
 //   numeric order), the demo user among them, with the demo account and application;
-// - `demoFriends` friends of the demo user, and about `friendsPerUser` friends for every other
-//   user; each friendship is stored in both directions;
+// - `demoFriends` friends of the demo user, and about `friendsPerUser` friends for each of the
+//   content users below (the rest are friends of those only, which keeps a million users
+//   fast); each friendship is stored in both directions;
 // - content for the demo user, its friends and a few other users ("content users"): albums
 //   with photos and tags, stream posts of every kind (46 status, 247 photo, 80 link, 56 wall;
 //   the demo user gets at least one of each), some posts and some photos sharing a creation
-//   time; the others have a name and a short profile only, which keeps a million users fast;
+//   time; the others have a name and a short profile only;
 // - `friendRequests` pending requests to the demo user from non-friends;
 // - `threadsPerUser` inbox threads for the demo user with `messagesPerThread` messages each,
 //   and fewer for a few friends.

@@ -118,7 +118,9 @@ FqlPlan FqlTranslator::translate(const FqlSelect& select) {
 }
 
 int FqlTranslator::newInstance(const FqlTable* table) {
-    instances_.push_back(Instance{table, "t" + std::to_string(instances_.size())});
+    std::string alias = "t";
+    alias += std::to_string(instances_.size());
+    instances_.push_back(Instance{table, std::move(alias)});
     return static_cast<int>(instances_.size()) - 1;
 }
 

@@ -15,6 +15,8 @@ void SqliteStatement::bind(int index, const std::string& value) {
     sqlite3_bind_text(stmt_, index, value.data(), static_cast<int>(value.size()), SQLITE_TRANSIENT);
 }
 
+void SqliteStatement::bindStatic(int index, const char* value) { sqlite3_bind_text(stmt_, index, value, -1, SQLITE_STATIC); }
+
 void SqliteStatement::bind(int index, const SqlValue& value) {
     switch (value.kind) {
         case SqlValue::Kind::Null: bindNull(index); break;

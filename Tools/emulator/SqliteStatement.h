@@ -23,6 +23,8 @@ public:
     void bind(int index, std::int64_t value);
     void bind(int index, const std::string& value);
     void bind(int index, const SqlValue& value);
+    // REQUIRES: `value` stays valid until the statement is reset (string literals, static tables).
+    void bindStatic(int index, const char* value);
     void bindNull(int index);
 
     // Advances to the next row: true while there is a row, false when done or on an error
