@@ -1,0 +1,172 @@
+#include <gtest/gtest.h>
+
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "ConfigurationChangedMessage.h"
+#include "EmulatorHost.h"
+#include "GetUserSidMessage.h"
+#include "IQueryItems.h"
+#include "RecordingListener.h"
+
+namespace trelm::test {
+namespace {
+
+constexpr char const* kAppKey = "facebook_source_appkey";
+constexpr char const* kLogin = "facebook_source_login";
+constexpr char const* kPassword = "facebook_source_password";
+constexpr char const* kSessionId = "facebook_source_session_id";
+constexpr char const* kSessionSecret = "facebook_source_session_secret";
+constexpr char const* kSessionUser = "facebook_source_session_user";
+constexpr char const* kLastUser = "facebook_source_lastuser";
+
+std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
+std::string const kSignedIn = "status:0:" + kDemoUid;
+std::string const kSignedOut = "status:8000001c:";
+
+class ConfigurationChangeTest : public ::testing::Test {
+protected:
+    static void SetUpTestSuite() {
+        host = new EmulatorHost();
+        std::string error;
+        ASSERT_TRUE(host->start(error)) << error;
+        observer = new RecordingListener("observer");
+        host->addComponent("observer", *observer);
+    }
+    static void TearDownTestSuite() {
+        delete host;
+        delete observer;
+        host = nullptr;
+        observer = nullptr;
+    }
+
+    static EmulatorHost* host;
+    static RecordingListener* observer;
+};
+
+EmulatorHost* ConfigurationChangeTest::host = nullptr;
+RecordingListener* ConfigurationChangeTest::observer = nullptr;
+
+// Each case configures a fresh source (its own configuration tag, so stored values never mix),
+// puts values into the runtime-configuration store, announces a change of some keys and checks
+// what followed: the account messages the observer (wipe and wake-up lists) received, the sign-in
+// requests the service saw, the user the source reports and whether a contact query can read.
+TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigured) {
+    struct Case {
+        char const* name;
+        bool extendedApi;
+        bool configuredLogin;    // the group holds the demo login and password
+        bool configuredSession;  // the group holds a session of the demo user
+        std::vector<std::pair<char const*, std::string>> stored;  // "$session"/"$secret": a fresh session
+        std::vector<char const*> changed;
+        std::vector<std::string> events;
+        int logins;              // auth.login requests
+        unsigned userCode;       // of "IServiceSource::GetUserSidMessage"
+        unsigned queryCode;      // of the first getRow of a contact query
+    };
+    std::string const email = emu::DemoAccount::email;
+    std::string const password = emu::DemoAccount::password;
+    std::vector<Case> const cases = {
+        {"login and password given sign in", true, false, false,
+         {{kLogin, email}, {kPassword, password}}, {kLogin, kPassword},
+         {kSignedIn}, 1, kSuccess, kSuccess},
+        {"another user than the last one wipes and wakes", true, false, false,
+         {{kLogin, email}, {kPassword, password}, {kLastUser, "42"}}, {kPassword},
+         {"wipe", "wakeup", kSignedIn}, 1, kSuccess, kSuccess},
+        {"login and password both emptied reset the account", true, true, true,
+         {{kLogin, ""}, {kPassword, ""}}, {kLogin, kPassword},
+         {"wipe", kSignedOut}, 0, kNotSignedIn, kNotSignedIn},
+        {"only the password emptied signs in again", true, true, false,
+         {{kPassword, ""}}, {kPassword},
+         {kSignedOut}, 1, kNotSignedIn, kNotSignedIn},
+        {"a new application key drops the session without signing in", true, true, true,
+         {{kAppKey, "another-key"}}, {kAppKey},
+         {}, 0, kNotSignedIn, kNotSignedIn},
+        {"login keys are ignored without the extended api", false, false, true,
+         {{kLogin, email}, {kPassword, password}}, {kLogin, kPassword},
+         {}, 0, kSuccess, kSuccess},
+        {"session keys apply a session without the extended api", false, false, false,
+         {{kSessionId, "$session"}, {kSessionSecret, "$secret"}, {kSessionUser, kDemoUid}}, {kSessionId},
+         {kSignedIn}, 0, kSuccess, kSuccess},
+        {"one empty session key resets the account", false, false, true,
+         {{kSessionId, ""}, {kSessionSecret, "x"}, {kSessionUser, kDemoUid}}, {kSessionSecret},
+         {"wipe", kSignedOut}, 0, kNotSignedIn, kNotSignedIn},
+        {"a session key missing from the store changes nothing", false, false, true,
+         {{kSessionId, "$session"}, {kSessionSecret, "$secret"}}, {kSessionId, kSessionUser},
+         {}, 0, kSuccess, kSuccess},
+        {"session keys are ignored with the extended api", true, false, true,
+         {{kSessionId, ""}, {kSessionSecret, ""}, {kSessionUser, ""}}, {kSessionId},
+         {}, 0, kSuccess, kSuccess},
+        {"a change of other keys does nothing", true, true, true,
+         {{kLogin, ""}, {kPassword, ""}}, {"wipeComponents"},
+         {}, 0, kSuccess, kSuccess},
+    };
+
+    int n = 0;
+    for (Case const& c : cases) {
+        SCOPED_TRACE(c.name);
+        String const name("change" + std::to_string(n++));
+        Configuration::Group group = host->demoGroup(name, c.configuredSession);
+        group.set("haveExtendedApi", Variant(c.extendedApi));
+        group.set("wipeComponents", Variant(Vector<String>{"observer"}));
+        group.set("wakeupComponents", Variant(Vector<String>{"observer"}));
+        if (c.configuredLogin) {
+            group.set(kLogin, Variant(emu::DemoAccount::email));
+            group.set(kPassword, Variant(emu::DemoAccount::password));
+        }
+        FacebookSource& source = host->addSource(group);
+
+        emu::Session fresh = host->emulator().loginDemo();
+        Set<Configuration::Value> values;
+        for (auto const& [key, value] : c.stored) {
+            std::string const text = value == "$session" ? fresh.key : value == "$secret" ? fresh.secret : value;
+            values.insert(Configuration::Value(key, Variant(String(text))));
+        }
+        ASSERT_EQ(host->runtime().store(name, values).code(), kSuccess);
+        observer->clear();
+        host->emulator().log().clear();
+
+        Set<String> changed;
+        for (char const* key : c.changed) changed.insert(key);
+        ConfigurationChangedMessage msg(changed);
+        uError err = source.onMessage(msg);
+        EXPECT_EQ(err.code(), kSuccess) << err;
+
+        EXPECT_EQ(observer->events(), c.events);
+        auto logins = host->emulator().log().entriesFor("auth.login");
+        EXPECT_EQ(logins.size(), size_t(c.logins));
+        for (auto const& login : logins) EXPECT_TRUE(login.https);
+
+        IServiceSource::GetUserSidMessage sid;
+        EXPECT_EQ(source.onMessage(sid).code(), c.userCode);
+        if (c.userCode == kSuccess) {
+            EXPECT_EQ(sid.result.str(), kDemoUid);
+        }
+
+        IQueryItems::StartQueryMessage query(
+            Vector<IQueryItems::Column>(),
+            Vector<IQueryItems::Constraint>{IQueryItems::Constraint{
+                Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), IQueryItems::Constraint::Equal}});
+        ASSERT_EQ(source.onMessage(query).code(), kSuccess);
+        SmartPtr<Map<String, Variant>> row;
+        EXPECT_EQ(query.cursor->getRow(row).code(), c.queryCode);
+    }
+}
+
+TEST_F(ConfigurationChangeTest, ChangesBeforeStartupFailClearlyWhenTheyNeedTheClient) {
+    FacebookSource& source = host->addBareSource("unstarted");
+    ConfigurationChangedMessage login(Set<String>{kLogin});
+    EXPECT_EQ(source.onMessage(login).code(), kNotSet) << "no settings yet";
+
+    Configuration::Group group = host->demoGroup("unstarted", false);
+    group.set("haveExtendedApi", Variant(false));
+    ASSERT_EQ(source.sendConfig(group).code(), kSuccess);
+    ConfigurationChangedMessage session(Set<String>{kSessionId});
+    EXPECT_EQ(source.onMessage(session).code(), kNotSet) << "no client yet";
+    ConfigurationChangedMessage unrelated(Set<String>{"wipeComponents"});
+    EXPECT_EQ(source.onMessage(unrelated).code(), kSuccess);
+}
+
+}  // namespace
+}  // namespace trelm::test

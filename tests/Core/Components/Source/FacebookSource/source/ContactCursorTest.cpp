@@ -1,0 +1,301 @@
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <memory>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "EmulatorHost.h"
+#include "IQueryItems.h"
+#include "trelm/GUID.h"
+
+namespace trelm::test {
+namespace {
+
+using Constraint = IQueryItems::Constraint;
+using Cursor = SmartPtr<IQueryItems::ICursor>;
+
+constexpr int kFriends = 3000;
+constexpr int kWindow = 150;
+constexpr char const* kSourceName = "facebook";
+
+std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
+std::string const kFriendCondition = "uid in (select uid2 from friend where uid1='" + kDemoUid + "')";
+
+std::string firstPage() {
+    return "select uid,name,pic_big from user where " + kFriendCondition + " order by concat(uid,' ') asc limit 150";
+}
+std::string pageAfter(std::string const& uid) {
+    return "select uid,name,pic_big from user where " + kFriendCondition + " and (concat(uid,' ') > '" + uid +
+           " ') order by concat(uid,' ') asc limit 150";
+}
+std::string pageBefore(std::string const& uid) {
+    return "select uid,name,pic_big from user where " + kFriendCondition + " and (concat(uid,' ') < '" + uid +
+           " ') order by concat(uid,' ') desc limit 150";
+}
+
+// A demo user with thousands of friends; the source is signed in with a session of the demo user.
+class ContactCursorTest : public ::testing::Test {
+protected:
+    static void SetUpTestSuite() {
+        emu::GeneratorOptions generator;
+        generator.users = kFriends + 200;
+        generator.demoFriends = kFriends;
+        generator.friendsPerUser = 2;
+        generator.albumsPerUser = 1;
+        generator.photosPerAlbum = 1;
+        generator.postsPerUser = 1;
+        generator.threadsPerUser = 1;
+        generator.messagesPerThread = 1;
+        host = new EmulatorHost(generator);
+        std::string error;
+        ASSERT_TRUE(host->start(error)) << error;
+        source = &host->addSource(host->demoGroup(kSourceName, true));
+        expected = new std::vector<std::string>(referenceOrder());
+        ASSERT_EQ(expected->size(), size_t(kFriends));
+    }
+
+    static void TearDownTestSuite() {
+        delete expected;
+        delete host;
+        expected = nullptr;
+        host = nullptr;
+    }
+
+    void SetUp() override { host->emulator().log().clear(); }
+
+    // The friends' ids as read in one statement by a client of its own, in the cursor's order:
+    // the text of the id with a blank appended, byte-wise.
+    static std::vector<std::string> referenceOrder() {
+        std::vector<std::string> uids =
+            host->fqlColumn("select uid2 from friend where uid1='" + kDemoUid + "'", "friend", "uid2");
+        std::sort(uids.begin(), uids.end(), [](std::string const& a, std::string const& b) { return a + " " < b + " "; });
+        host->emulator().log().clear();
+        return uids;
+    }
+
+    static Cursor open(std::vector<Constraint> extra = {}) {
+        Vector<Constraint> constraints{
+            Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), Constraint::Equal}};
+        for (Constraint const& c : extra) constraints.pushBack(c);
+        IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints);
+        uError err = source->onMessage(msg);
+        EXPECT_EQ(err.code(), kSuccess) << err;
+        return msg.cursor;
+    }
+
+    static std::string uidAt(Cursor const& cursor) {
+        SmartPtr<Map<String, Variant>> row;
+        uError err = cursor->getRow(row);
+        EXPECT_EQ(err.code(), kSuccess) << err;
+        if (!row) return "";
+        Variant const* uid = row->search("core_contact_service_id");
+        return uid ? uid->asString().str() : "";
+    }
+
+    static GUID guidAt(Cursor const& cursor) {
+        SmartPtr<Map<String, Variant>> row;
+        EXPECT_EQ(cursor->getRow(row).code(), kSuccess);
+        return row ? row->search("core_object_id")->asGUID() : GUID();
+    }
+
+    static EmulatorHost* host;
+    static FacebookSource* source;
+    static std::vector<std::string>* expected;
+};
+
+EmulatorHost* ContactCursorTest::host = nullptr;
+FacebookSource* ContactCursorTest::source = nullptr;
+std::vector<std::string>* ContactCursorTest::expected = nullptr;
+
+TEST_F(ContactCursorTest, ForwardSeeksVisitEveryFriendOnceInOrderWithOneStatementPerPage) {
+    Cursor cursor = open();
+    ASSERT_TRUE(cursor);
+    std::vector<std::string> seen;
+    std::set<GUID> guids;
+    int moved = 1;
+    while (moved != 0) {
+        SmartPtr<Map<String, Variant>> row;
+        ASSERT_EQ(cursor->getRow(row).code(), kSuccess);
+        seen.push_back(row->search("core_contact_service_id")->asString().str());
+        guids.insert(row->search("core_object_id")->asGUID());
+        ASSERT_EQ(cursor->seek(1, moved).code(), seen.size() == size_t(kFriends) ? unsigned(kNoData) : kSuccess);
+    }
+    EXPECT_EQ(seen, *expected);
+    EXPECT_EQ(guids.size(), size_t(kFriends)) << "every friend has a GUID of its own";
+
+    // The first page, one page after the last row of each window, and one more that finds the end.
+    std::vector<std::string> statements = host->fqlStatements();
+    ASSERT_EQ(statements.size(), size_t(kFriends / kWindow + 1));
+    EXPECT_EQ(statements[0], firstPage());
+    for (size_t k = 1; k < statements.size(); ++k) {
+        EXPECT_EQ(statements[k], pageAfter((*expected)[k * kWindow - 1])) << "page " << k;
+    }
+}
+
+TEST_F(ContactCursorTest, BackwardSeeksFromTheEndVisitEveryFriendInReverse) {
+    Cursor cursor = open();
+    ASSERT_EQ(cursor->jumpEnd().code(), kSuccess);
+    std::vector<std::string> seen;
+    int moved = -1;
+    while (moved != 0) {
+        seen.push_back(uidAt(cursor));
+        ASSERT_TRUE(cursor->seek(-1, moved).ok());
+    }
+    std::reverse(seen.begin(), seen.end());
+    EXPECT_EQ(seen, *expected);
+
+    std::vector<std::string> statements = host->fqlStatements();
+    ASSERT_EQ(statements.size(), size_t(kFriends / kWindow + 1));
+    EXPECT_EQ(statements[0], "select uid,name,pic_big from user where " + kFriendCondition +
+                                 " order by concat(uid,' ') desc limit 150");
+    for (size_t k = 1; k < statements.size(); ++k) {
+        EXPECT_EQ(statements[k], pageBefore((*expected)[kFriends - k * kWindow])) << "page " << k;
+    }
+}
+
+TEST_F(ContactCursorTest, JumpsAndLongSeeksLandOnTheRightFriendAndKnowTheirIndex) {
+    Cursor cursor = open();
+    GUID const firstGuid = guidAt(cursor);
+    struct Move {
+        enum Op { Jump, Seek, Beginning, End } op;
+        int arg;
+        unsigned code;
+        int index;  // where the cursor must stand afterwards
+        int moved;  // for Seek
+    };
+    Move const moves[] = {
+        {Move::Jump, 1234, kSuccess, 1234, 0},
+        {Move::Seek, -700, kSuccess, 534, -700},    // back across a window edge, 700 rows
+        {Move::Seek, 100, kSuccess, 634, 100},      // forward across the edge of that window
+        {Move::Seek, 2000, kSuccess, 2634, 2000},
+        {Move::Seek, 5000, kNoData, 2999, 365},     // past the end: stops on the last friend
+        {Move::Seek, 0, kSuccess, 2999, 0},
+        {Move::Seek, -5000, kNoData, 0, -2999},     // before the beginning: stops on the first
+        {Move::Jump, kFriends, kNoData, 2999, 0},
+        {Move::Jump, 149, kSuccess, 149, 0},
+        {Move::Jump, 150, kSuccess, 150, 0},
+        {Move::End, 0, kSuccess, 2999, 0},
+        {Move::Seek, -150, kSuccess, 2849, -150},
+        {Move::Beginning, 0, kSuccess, 0, 0},
+        {Move::Jump, 0, kSuccess, 0, 0},
+    };
+    for (Move const& m : moves) {
+        SCOPED_TRACE("move " + std::to_string(m.op) + " " + std::to_string(m.arg));
+        int moved = 0;
+        uError err;
+        switch (m.op) {
+            case Move::Jump: err = cursor->jump(static_cast<unsigned>(m.arg)); break;
+            case Move::Seek: err = cursor->seek(m.arg, moved); break;
+            case Move::Beginning: err = cursor->jumpBeginning(); break;
+            case Move::End: err = cursor->jumpEnd(); break;
+        }
+        ASSERT_EQ(err.code(), m.code) << err;
+        if (m.op == Move::Seek) {
+            EXPECT_EQ(moved, m.moved);
+        }
+        EXPECT_EQ(uidAt(cursor), (*expected)[m.index]);
+        unsigned index = 0;
+        ASSERT_EQ(cursor->curRow(index).code(), kSuccess);
+        EXPECT_EQ(index, unsigned(m.index));
+    }
+    // The cursor keeps the GUIDs it gave out across refills.
+    EXPECT_EQ(guidAt(cursor), firstGuid);
+}
+
+TEST_F(ContactCursorTest, CountingAndPositionStatementsAskForTinyRowsWithoutOrdering) {
+    Cursor cursor = open();
+    unsigned count = 0;
+    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);
+    EXPECT_EQ(count, unsigned(kFriends));
+    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);  // from memory
+    EXPECT_EQ(count, unsigned(kFriends));
+
+    ASSERT_EQ(cursor->jump(200).code(), kSuccess);
+    unsigned index = 0;
+    ASSERT_EQ(cursor->curRow(index).code(), kSuccess);
+    EXPECT_EQ(index, 200u);
+
+    std::string const& at200 = (*expected)[200];
+    std::vector<std::string> const statements = host->fqlStatements();
+    std::vector<std::string> const wanted = {
+        "select '' from user where " + kFriendCondition,
+        firstPage(),
+        "select uid,name,pic_big from user where " + kFriendCondition + " and (concat(uid,' ') > '" +
+            (*expected)[149] + " ') order by concat(uid,' ') asc limit 200",
+        "select '' from user where " + kFriendCondition + " and (concat(uid,' ') <= '" + at200 + " ')",
+    };
+    EXPECT_EQ(statements, wanted);
+}
+
+TEST_F(ContactCursorTest, ShortFirstPageGivesTheCountAndRepeatedJumpsAskNothing) {
+    std::vector<std::string> const& e = *expected;
+    Cursor cursor = open({Constraint{Metadata::Key("core_contact_service_id", TRELM_TYPES::STRING),
+                                     Variant(Vector<String>{String(e[20]), String(e[5]), String(e[10])}),
+                                     Constraint::InList}});
+    ASSERT_EQ(cursor->jumpBeginning().code(), kSuccess);
+    ASSERT_EQ(cursor->jumpBeginning().code(), kSuccess);
+    unsigned count = 0;
+    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);
+    EXPECT_EQ(count, 3u);
+    EXPECT_EQ(uidAt(cursor), e[5]);
+    int moved = 0;
+    EXPECT_EQ(cursor->seek(10, moved).code(), kSuccess);  // the window holds the whole result
+    EXPECT_EQ(moved, 2);
+    EXPECT_EQ(uidAt(cursor), e[20]);
+
+    std::vector<std::string> const wanted = {"select uid,name,pic_big from user where uid in (" + e[20] + "," + e[5] +
+                                             "," + e[10] + ") order by concat(uid,' ') asc limit 150"};
+    EXPECT_EQ(host->fqlStatements(), wanted);
+}
+
+TEST_F(ContactCursorTest, QueryThatCannotMatchAnswersNothingWithoutAsking) {
+    Cursor cursor = open({Constraint{Metadata::Key("core_contact_service", TRELM_TYPES::STRING), Variant("Other"),
+                                     Constraint::Equal}});
+    SmartPtr<Map<String, Variant>> row = makeSmart<Map<String, Variant>>();
+    EXPECT_EQ(cursor->getRow(row).code(), kNoData);
+    EXPECT_FALSE(row);
+    unsigned count = 7;
+    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);
+    EXPECT_EQ(count, 0u);
+    EXPECT_EQ(cursor->jumpEnd().code(), kNoData);
+    int moved = 5;
+    EXPECT_EQ(cursor->seek(3, moved).code(), kSuccess);
+    EXPECT_EQ(moved, 0);
+    Vector<SmartPtr<Map<String, Variant>>> rows;
+    EXPECT_EQ(cursor->getRows(10, rows).code(), kNotSupported);
+    EXPECT_TRUE(host->fqlStatements().empty());
+}
+
+TEST_F(ContactCursorTest, RecordsCarryContactFieldsAndTheSourcesIdentity) {
+    Cursor cursor = open();
+    SmartPtr<Map<String, Variant>> row;
+    ASSERT_EQ(cursor->getRow(row).code(), kSuccess);
+    Map<String, Variant> const& r = *row;
+    EXPECT_EQ(r.search("core_object_type")->asInt32(), 2);
+    EXPECT_EQ(r.search("core_contact_service")->asString(), "Facebook");
+    EXPECT_EQ(r.search("core_contact_service_id")->asString(), String((*expected)[0]));
+    EXPECT_FALSE(r.search("core_contact_display_name")->asString().empty());
+    EXPECT_EQ(*r.search("core_contact_name"), *r.search("core_contact_display_name"));
+    EXPECT_NE(r.search("core_contact_profile_picture_url"), nullptr);
+    EXPECT_EQ(r.search("core_contact_profile_url"), nullptr) << "not in the field list";
+    EXPECT_EQ(r.search("core_object_source")->asString(), kSourceName);
+    EXPECT_EQ(r.search("core_object_origin_importcomponent")->asString(), kSourceName);
+    EXPECT_EQ(r.search("core_object_origin_servicename")->asString(), "Facebook");
+    EXPECT_EQ(*r.search("core_object_deleted"), Variant(false));
+    EXPECT_FALSE(r.search("core_object_id")->asGUID().isNull());
+
+    // The host gets a copy: changing it changes nothing the cursor hands out later.
+    row->insert("core_contact_name", Variant("changed"));
+    SmartPtr<Map<String, Variant>> again;
+    ASSERT_EQ(cursor->getRow(again).code(), kSuccess);
+    EXPECT_NE(again->search("core_contact_name")->asString(), "changed");
+
+    Vector<IQueryItems::Column> schema;
+    ASSERT_EQ(cursor->getSchema(schema).code(), kSuccess);
+    EXPECT_EQ(schema.size(), 4u);
+}
+
+}  // namespace
+}  // namespace trelm::test

@@ -1,0 +1,174 @@
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <vector>
+
+#include "EmulatorHost.h"
+#include "IQueryItems.h"
+
+namespace trelm::test {
+namespace {
+
+using Record = Map<String, Variant>;
+
+constexpr char const* kSourceName = "facebook";
+std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
+
+class DataOperationsIntegrationTest : public ::testing::Test {
+protected:
+    static void SetUpTestSuite() {
+        host = new EmulatorHost();
+        std::string error;
+        ASSERT_TRUE(host->start(error)) << error;
+        source = &host->addSource(host->demoGroup(kSourceName, true));
+
+        char pattern[] = "/tmp/trelm-source-test-XXXXXX";
+        ASSERT_NE(mkdtemp(pattern), nullptr);
+        directory = new std::string(pattern);
+        photo = new std::string(*directory + "/holiday photo.jpg");
+        std::ofstream(*photo, std::ios::binary) << std::string("\xff\xd8\xff\xe0 not really a picture", 26);
+    }
+    static void TearDownTestSuite() {
+        std::filesystem::remove_all(*directory);
+        delete host;
+        delete directory;
+        delete photo;
+        host = nullptr;
+    }
+    void SetUp() override {
+        host->emulator().log().clear();
+        host->emulator().faults().clearAll();
+    }
+
+    static SmartPtr<IQueryItems::ICursor> openContacts() {
+        IQueryItems::StartQueryMessage msg(
+            Vector<IQueryItems::Column>(),
+            Vector<IQueryItems::Constraint>{IQueryItems::Constraint{
+                Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), IQueryItems::Constraint::Equal}});
+        EXPECT_EQ(source->onMessage(msg).code(), kSuccess);
+        return msg.cursor;
+    }
+
+    static EmulatorHost* host;
+    static FacebookSource* source;
+    static std::string* directory;
+    static std::string* photo;
+};
+
+EmulatorHost* DataOperationsIntegrationTest::host = nullptr;
+FacebookSource* DataOperationsIntegrationTest::source = nullptr;
+std::string* DataOperationsIntegrationTest::directory = nullptr;
+std::string* DataOperationsIntegrationTest::photo = nullptr;
+
+TEST_F(DataOperationsIntegrationTest, InsertedStatusIsPostedAndAppearsInTheStream) {
+    std::string const text = "reading about keyset paging";
+    Record status;
+    status.insert("core_object_type", Variant(4));
+    status.insert("core_event_text", Variant(text.c_str()));
+    uError err = source->insert(status);
+    ASSERT_EQ(err.code(), kSuccess) << err;
+
+    auto calls = host->emulator().log().entriesFor("users.setStatus");
+    ASSERT_EQ(calls.size(), 1u);
+    EXPECT_EQ(calls[0].args.at("status"), text);
+    EXPECT_EQ(calls[0].args.at("status_includes_verb"), "1");
+    EXPECT_EQ(status.search("core_service_id"), nullptr) << "nothing is written back for a status";
+
+    std::vector<std::string> messages =
+        host->fqlColumn("select message from stream where source_id='" + kDemoUid + "'", "stream", "message");
+    EXPECT_NE(std::find(messages.begin(), messages.end(), text), messages.end());
+}
+
+// Optional caption and album: each present or absent, sent only when present; the new photo's id
+// comes back into the record and the service holds the photo with that caption in that album.
+TEST_F(DataOperationsIntegrationTest, InsertedPhotoIsUploadedAndItsIdWrittenBack) {
+    std::vector<std::string> const albums =
+        host->fqlColumn("select aid from album where owner='" + kDemoUid + "'", "album", "aid");
+    ASSERT_FALSE(albums.empty());
+    struct Case {
+        char const* name;
+        char const* caption;  // null: no "media_notes"
+        bool intoAlbum;       // "facebook_media_album_service_id" = an album of the user
+    };
+    Case const cases[] = {
+        {"neither caption nor album", nullptr, false},
+        {"caption only", "at the lake", false},
+        {"album only", nullptr, true},
+        {"caption and album", "at the sea", true},
+    };
+    for (Case const& c : cases) {
+        SCOPED_TRACE(c.name);
+        host->emulator().log().clear();
+        Record media;
+        media.insert("core_object_type", Variant(9));
+        media.insert("media_uri", Variant(String("file://" + *photo)));
+        if (c.caption != nullptr) media.insert("media_notes", Variant(c.caption));
+        if (c.intoAlbum) media.insert("facebook_media_album_service_id", Variant(String(albums[0])));
+        uError err = source->insert(media);
+        ASSERT_EQ(err.code(), kSuccess) << err;
+
+        auto uploads = host->emulator().log().entriesFor("photos.upload");
+        ASSERT_EQ(uploads.size(), 1u);
+        EXPECT_TRUE(uploads[0].hadFile);
+        EXPECT_EQ(uploads[0].fileSize, std::filesystem::file_size(*photo));
+        EXPECT_EQ(uploads[0].args.count("caption"), c.caption ? 1u : 0u);
+        EXPECT_EQ(uploads[0].args.count("aid"), c.intoAlbum ? 1u : 0u);
+
+        Variant const* id = media.search("core_service_id");
+        ASSERT_NE(id, nullptr);
+        std::string const pid = id->asString().str();
+        ASSERT_FALSE(pid.empty());
+        std::string const where = " from photo where pid='" + pid + "'";
+        EXPECT_EQ(host->fqlColumn("select caption" + where, "photo", "caption"),
+                  std::vector<std::string>{c.caption ? c.caption : ""});
+        if (c.intoAlbum) {
+            EXPECT_EQ(host->fqlColumn("select aid" + where, "photo", "aid"), std::vector<std::string>{albums[0]});
+        }
+    }
+}
+
+TEST_F(DataOperationsIntegrationTest, FailedUploadLeavesTheRecordWithoutServiceId) {
+    emu::FaultRule unavailable;
+    unavailable.errorCode = 2;
+    host->emulator().faults().set("photos.upload", unavailable);
+    Record media;
+    media.insert("core_object_type", Variant(9));
+    media.insert("media_uri", Variant(String(*photo)));
+    EXPECT_EQ(source->insert(media).code(), kServiceUnavailable);
+    EXPECT_EQ(media.search("core_service_id"), nullptr);
+}
+
+// A record stays retrievable by its GUID while some cursor that produced it is alive.
+TEST_F(DataOperationsIntegrationTest, RetrieveFindsListedRecordsUntilTheLastCursorHoldingThemIsGone) {
+    SmartPtr<IQueryItems::ICursor> first = openContacts();
+    SmartPtr<IQueryItems::ICursor> second = openContacts();
+    SmartPtr<Record> row;
+    ASSERT_EQ(first->getRow(row).code(), kSuccess);
+    SmartPtr<Record> same;
+    ASSERT_EQ(second->getRow(same).code(), kSuccess);
+    GUID const guid = row->search("core_object_id")->asGUID();
+    ASSERT_EQ(same->search("core_object_id")->asGUID(), guid) << "one GUID per friend while both cursors live";
+
+    Record out;
+    out.insert("caller_key", Variant("kept"));
+    uError err = source->retrieve(guid, out, false);
+    ASSERT_EQ(err.code(), kSuccess) << err;
+    for (auto const& [key, value] : *row) EXPECT_EQ(*out.search(key), value) << key;
+    EXPECT_EQ(out.search("caller_key")->asString(), "kept");
+    EXPECT_EQ(out.size(), row->size() + 1);
+
+    first.reset();
+    Record again;
+    EXPECT_EQ(source->retrieve(guid, again, false).code(), kSuccess) << "the second cursor still holds it";
+    second.reset();
+    Record gone;
+    EXPECT_EQ(source->retrieve(guid, gone, false).code(), kNotFound);
+    EXPECT_TRUE(gone.empty());
+}
+
+}  // namespace
+}  // namespace trelm::test

@@ -1,0 +1,97 @@
+#include "EmulatorHost.h"
+
+#include <gtest/gtest.h>
+
+namespace trelm::test {
+
+EmulatorHost::EmulatorHost(emu::GeneratorOptions const& generator) {
+    emu::Emulator::Options options;
+    options.generator = generator;
+    emulator_ = std::make_unique<emu::Emulator>(options);
+}
+
+EmulatorHost::~EmulatorHost() {
+    for (String const& name : registered_) registry_.remove(name);
+    registry_.deactivate();
+    sources_.clear();
+    emulator_->stop();
+}
+
+bool EmulatorHost::start(std::string& error) {
+    if (!emulator_->start(error)) return false;
+    http_.setCaFile(emulator_->caFile().c_str());
+    http_.setConnectTo({
+        String("api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort())),
+        String("api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort())),
+    });
+    addComponent(HttpRequestFactory::kName, http_);
+    addComponent(RuntimeConfiguration::kName, runtime_);
+    registry_.activate();
+    return true;
+}
+
+Configuration::Group EmulatorHost::demoGroup(String const& name, bool session) {
+    Configuration::Group group(name);
+    group.set("facebook_source_appkey", Variant(emu::DemoAccount::apiKey));
+    group.set("facebook_source_appsecret", Variant(emu::DemoAccount::appSecret));
+    if (session) {
+        emu::Session s = emulator_->loginDemo();
+        group.set("facebook_source_session_user", Variant(String::from(static_cast<long long>(s.uid))));
+        group.set("facebook_source_session_id", Variant(String(s.key)));
+        group.set("facebook_source_session_secret", Variant(String(s.secret)));
+    }
+    return group;
+}
+
+FacebookSource& EmulatorHost::addBareSource(String const& name) {
+    sources_.push_back(std::make_unique<FacebookSource>(name));
+    addComponent(name, *sources_.back());
+    return *sources_.back();
+}
+
+FacebookSource& EmulatorHost::addSource(Configuration::Group const& group) {
+    FacebookSource& source = addBareSource(group.name());
+    EXPECT_EQ(source.sendConfig(group).code(), kSuccess);
+    EXPECT_EQ(source.startup().code(), kSuccess);
+    return source;
+}
+
+void EmulatorHost::addComponent(String const& name, Component& component) {
+    EXPECT_EQ(registry_.add(name, &component).code(), kSuccess);
+    registered_.push_back(name);
+}
+
+SmartPtr<FacebookLibrary> EmulatorHost::demoClient() {
+    emu::Session session = emulator_->loginDemo();
+    auto info = makeSmart<FacebookLibrary::ConnectionInfo>("reference");
+    EXPECT_EQ(info->setAppConfig(emu::DemoAccount::apiKey, emu::DemoAccount::appSecret).code(), kSuccess);
+    EXPECT_EQ(info->setSessionConfig(String(session.key), String(session.secret),
+                                     String::from(static_cast<long long>(session.uid)), false, false)
+                  .code(),
+              kSuccess);
+    auto lib = makeSmart<FacebookLibrary>();
+    EXPECT_EQ(lib->setup(info).code(), kSuccess);
+    return lib;
+}
+
+std::vector<std::string> EmulatorHost::fqlColumn(std::string const& query, std::string const& table,
+                                                 std::string const& field) {
+    Vector<Map<String, String>> rows;
+    unsigned count = 0;
+    uError err = demoClient()->runFqlQuery(String(query), String(table), rows, 0, count);
+    EXPECT_EQ(err.code(), kSuccess) << err;
+    std::vector<std::string> out;
+    for (auto const& row : rows) {
+        String const* value = row.search(String(field));
+        out.push_back(value ? value->str() : "");
+    }
+    return out;
+}
+
+std::vector<std::string> EmulatorHost::fqlStatements() {
+    std::vector<std::string> out;
+    for (emu::LoggedRequest const& r : emulator_->log().entriesFor("fql.query")) out.push_back(r.fql);
+    return out;
+}
+
+}  // namespace trelm::test
