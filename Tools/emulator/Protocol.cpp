@@ -35,7 +35,7 @@ std::string malform(const std::string& body) {
 
 using Runner = Status (*)(Store&, std::int64_t viewer, const HttpCall&, XmlNode& root);
 
-struct MethodSpec {
+struct MethodEntry {
     const char* name;
     bool listRoot;
     const char* required;  // a parameter without which the call is invalid (100), or null
@@ -43,7 +43,7 @@ struct MethodSpec {
 };
 
 // Session methods. auth.login, the one application method, is answered by the protocol itself.
-const MethodSpec kMethods[] = {
+const MethodEntry kMethods[] = {
     {"fql.query", true, "query",
      [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) { return s.fqlQuery(v, arg(c, "query"), r); }},
     {"stream.get", false, nullptr,
@@ -74,8 +74,8 @@ const MethodSpec kMethods[] = {
      [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) { return s.friendsGet(v, arg(c, "uid"), r); }},
 };
 
-const MethodSpec* findMethod(const std::string& name) {
-    for (const MethodSpec& m : kMethods)
+const MethodEntry* findMethod(const std::string& name) {
+    for (const MethodEntry& m : kMethods)
         if (name == m.name) return &m;
     return nullptr;
 }
@@ -192,9 +192,9 @@ Protocol::Outcome Protocol::process(const HttpCall& call, const std::string& met
     if (method.empty()) return fail(3);
 
     const bool isLogin = method == "auth.login";
-    const MethodSpec* spec = findMethod(method);
+    const MethodEntry* entry = findMethod(method);
     const std::string sessionKey = arg(call, "session_key");
-    if (spec != nullptr && sessionKey.empty()) return fail(102);
+    if (entry != nullptr && sessionKey.empty()) return fail(102);
 
     // A call that presents a session is checked against it whatever the method, so that its
     // signature can be checked with the session's secret.
@@ -212,14 +212,14 @@ Protocol::Outcome Protocol::process(const HttpCall& call, const std::string& met
     if (!Signature::matches(call.args, session ? session->secret : *appSecret)) return fail(104);
     if (session && options_.strictCallId && !sessions_.acceptCallId(sessionKey, arg(call, "call_id")))
         return fail(103);
-    if (spec == nullptr && !isLogin) return fail(3);
+    if (entry == nullptr && !isLogin) return fail(3);
     if (faults.errorCode != 0) return fail(faults.errorCode);
 
     if (isLogin) {
         if (!call.https) return fail(8);
         return login(call);
     }
-    if (spec->required != nullptr && arg(call, spec->required).empty()) return fail(100);
+    if (entry->required != nullptr && arg(call, entry->required).empty()) return fail(100);
     return runMethod(method, session->uid, call);
 }
 
@@ -246,11 +246,11 @@ Protocol::Outcome Protocol::login(const HttpCall& call) {
 }
 
 Protocol::Outcome Protocol::runMethod(const std::string& method, std::int64_t viewer, const HttpCall& call) {
-    const MethodSpec* spec = findMethod(method);
+    const MethodEntry* entry = findMethod(method);
     Outcome out;
     out.root.name = responseRoot(method);
-    out.root.list = spec->listRoot;
-    out.error = spec->run(store_, viewer, call, out.root);
+    out.root.list = entry->listRoot;
+    out.error = entry->run(store_, viewer, call, out.root);
     return out;
 }
 

@@ -52,31 +52,5 @@ TEST_F(ConcurrencyTest, ParallelClientsAreEachAnsweredAndCountedOnce) {
     EXPECT_EQ(emulator->log().entriesFor("fql.query").size(), static_cast<std::size_t>(kThreads * kCalls));
 }
 
-TEST_F(ConcurrencyTest, StrictCallIdAcceptsEachValueOnceUnderContention) {
-    Emulator::Options o = options();
-    o.strictCallId = true;
-    o.httpsPort = -1;
-    start(o);
-    // Several clients race with the same call_ids on one session: each value is accepted at most
-    // once, and a strictly growing value always is by someone.
-    constexpr int kThreads = 4;
-    constexpr int kIds = 30;
-    std::atomic<int> accepted{0};
-    std::vector<std::thread> threads;
-    for (int t = 0; t < kThreads; ++t) {
-        threads.emplace_back([&] {
-            TestClient c;
-            for (int id = 1; id <= kIds; ++id) {
-                Fields f{{"method", "fql.query"}, {"v", "1.0"}, {"api_key", DemoAccount::apiKey},
-                         {"session_key", session.key}, {"call_id", std::to_string(id)}, {"query", kFql}};
-                if (c.postForm(emulator->httpUrl(), sign(f, session.secret)).errorCode() == 0) ++accepted;
-            }
-        });
-    }
-    for (std::thread& t : threads) t.join();
-    EXPECT_GE(accepted.load(), 1);
-    EXPECT_LE(accepted.load(), kIds);
-}
-
 }  // namespace
 }  // namespace emu::test

@@ -2,8 +2,15 @@
 
 #include <gtest/gtest.h>
 
+#include <tuple>
+
 namespace emu {
 namespace {
+
+auto fields(const FaultRule& f) {
+    return std::tuple(f.every, f.probability, f.seed, f.delayMs, f.drop, f.httpStatus, f.errorCode, f.truncate,
+                      f.malformed, f.expireAfter, f.rate, f.burst);
+}
 
 TEST(FaultsRuleTest, CommandLineTextsParse) {
     struct Case {
@@ -32,18 +39,7 @@ TEST(FaultsRuleTest, CommandLineTextsParse) {
         FaultRule rule;
         ASSERT_TRUE(Faults::parse(c.text, method, rule, error)) << error;
         EXPECT_EQ(method, c.method);
-        EXPECT_EQ(rule.errorCode, c.rule.errorCode);
-        EXPECT_EQ(rule.every, c.rule.every);
-        EXPECT_EQ(rule.probability, c.rule.probability);
-        EXPECT_EQ(rule.seed, c.rule.seed);
-        EXPECT_EQ(rule.delayMs, c.rule.delayMs);
-        EXPECT_EQ(rule.drop, c.rule.drop);
-        EXPECT_EQ(rule.httpStatus, c.rule.httpStatus);
-        EXPECT_EQ(rule.truncate, c.rule.truncate);
-        EXPECT_EQ(rule.malformed, c.rule.malformed);
-        EXPECT_EQ(rule.expireAfter, c.rule.expireAfter);
-        EXPECT_EQ(rule.rate, c.rule.rate);
-        EXPECT_EQ(rule.burst, c.rule.burst);
+        EXPECT_EQ(fields(rule), fields(c.rule));
     }
 }
 
