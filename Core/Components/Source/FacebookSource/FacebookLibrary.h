@@ -165,9 +165,9 @@ public:
 
     // The MD5, as 32 lowercase hex digits, of every "key=value" of `args` in the map's order, run
     // together, followed by the secret: the session secret when a session is set and `args` holds
-    // "session_key", else the application secret (kNotSet when there is none).
-    // REQUIRES: setup has succeeded. Reads the ConnectionInfo without locking: callers other than
-    // addAuth must not race with changes of the session.
+    // "session_key", else the application secret. kNotSet without settings or application data.
+    // Reads the ConnectionInfo without locking: callers other than addAuth must not race with
+    // changes of the session.
     uError makeSignature(Map<String, String> const& args, String& sig);
 
     // One HTTP exchange: a request from "HttpRequestFactory", `args` as form fields, `data` (when
