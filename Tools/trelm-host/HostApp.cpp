@@ -39,7 +39,9 @@ int HostApp::run(int argc, char const* const* argv) {
     bool emulator = true;
     app.add_option("--plugin", options.plugins,
                    "plug-in module to load (repeatable; default: " +
-                       PluginLoader::defaultPluginPath() + ")");
+                       PluginLoader::defaultPluginPath() + ")")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
     app.add_option("--config", options.configPath, "JSON file with the components and settings");
     app.add_option("--format", format, "output: table or json (JSON lines)")
         ->check(CLI::IsMember({"table", "json"}));
@@ -49,7 +51,9 @@ int HostApp::run(int argc, char const* const* argv) {
         "--emulator,!--no-emulator", emulator,
         "run the service emulator in-process (default: on unless an endpoint is configured)");
     app.add_option("--connect-to", options.connectTo,
-                   "route HOST:PORT:TO-HOST:TO-PORT (repeatable; replaces the configured routes)");
+                   "route HOST:PORT:TO-HOST:TO-PORT (repeatable; replaces the configured routes)")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
     app.add_option("--ca-file", options.caFile, "PEM file of the CAs to trust");
 
     CLI::App* state = app.add_subcommand("state", "change values of the runtime-configuration store");

@@ -50,7 +50,9 @@ uError PluginLoader::load(std::string const& path) {
         called = TRELM_ERROR_MSG(kFailure, String("exception: ") + e.what());
     }
     if (called.failed()) {
-        dlclose(handle);
+        // The plug-in's error may point into the module (its stamped file names), and a module
+        // that ran code may have left itself registered elsewhere: it stays open.
+        handles_.push_back(handle);
         return TRELM_WRAP_MSG(kFailure, called, "getComponents of plug-in " + path + " failed");
     }
 

@@ -20,7 +20,8 @@ namespace host {
 // factories of identifiers that earlier ones offered.
 //
 // Lifetime: the modules stay open until the loader is destroyed. Every component made through a
-// factory of the table must be destroyed before that (its code lives in the module).
+// factory of the table, and every error such a component or plug-in returned, must be gone
+// before that (their code and stamped file names live in the module).
 // Thread safety: none; one thread loads, then the table may be read from any thread.
 class PluginLoader {
 public:
@@ -42,8 +43,10 @@ public:
     // Opens the module at `path` (RTLD_NOW | RTLD_LOCAL), calls its getComponents into a table of
     // its own and merges that into table(). Failures, each with the path and the reason in the
     // message: kNotFound when the module cannot be opened or has no getComponents; kFailure
-    // wrapping the plug-in's error when getComponents fails. A failed plug-in is closed again and
-    // adds nothing.
+    // wrapping the plug-in's error when getComponents fails. A plug-in that fails adds nothing
+    // to the table (unless memory runs out halfway through merging). One whose getComponents
+    // ran stays open even when it failed, because its error refers to text inside the module:
+    // use such an error only while the loader lives.
     uError load(std::string const& path);
 
     Table const& table() const noexcept { return table_; }

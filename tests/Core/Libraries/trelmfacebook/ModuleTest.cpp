@@ -1,0 +1,139 @@
+#include <cstdio>
+#include <memory>
+#include <set>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "ModuleHandle.h"
+#include "trelm/Metadata.h"
+
+using trelm::Component;
+using trelm::String;
+using trelm::TRELM_TYPES::TYPES;
+
+namespace {
+
+Component* foreignFactory(String) { return nullptr; }
+
+class ModuleTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        module_ = std::make_unique<ModuleHandle>(TRELMFACEBOOK_MODULE);
+        ASSERT_EQ(module_->error(), "");
+    }
+    void TearDown() override { module_.reset(); }
+
+    std::vector<std::string> idsOf(ModuleHandle::Table const& table) {
+        std::vector<std::string> ids;
+        for (auto const& [id, factory] : table) ids.push_back(id.str());
+        return ids;
+    }
+
+    std::unique_ptr<ModuleHandle> module_;
+};
+
+TEST_F(ModuleTest, EmptyTableGetsExactlyTheSourceAndTheConnector) {
+    ModuleHandle::Table table;
+    trelm::uError result = module_->getComponents(table);
+    ASSERT_EQ(result.code(), trelm::kSuccess) << result;
+    EXPECT_EQ(idsOf(table), (std::vector<std::string>{kConnectorId, kSourceId}));
+    EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
+    EXPECT_EQ(*table.search(kConnectorId), module_->connectorFactory);
+}
+
+TEST_F(ModuleTest, IdentifiersAlreadyPresentGetTheModulesFactoriesAndOtherEntriesStay) {
+    ModuleHandle::Table table;
+    ASSERT_TRUE(table.insert(kSourceId, &foreignFactory).ok());
+    ASSERT_TRUE(table.insert(kConnectorId, &foreignFactory).ok());
+    ASSERT_TRUE(table.insert("@other.example:/thing", &foreignFactory).ok());
+
+    ASSERT_EQ(module_->getComponents(table).code(), trelm::kSuccess);
+    EXPECT_EQ(table.size(), 3u);
+    EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
+    EXPECT_EQ(*table.search(kConnectorId), module_->connectorFactory);
+    EXPECT_EQ(*table.search("@other.example:/thing"), &foreignFactory);
+}
+
+TEST_F(ModuleTest, RepeatedCallsLeaveTheSameTwoEntries) {
+    ModuleHandle::Table table;
+    for (int call = 0; call < 3; ++call) {
+        ASSERT_EQ(module_->getComponents(table).code(), trelm::kSuccess) << "call " << call;
+    }
+    EXPECT_EQ(idsOf(table), (std::vector<std::string>{kConnectorId, kSourceId}));
+    EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
+}
+
+// A factory filed under the wrong identifier, or an identifier that differs from the one the
+// component reports, would make the host configure one component as the other.
+TEST_F(ModuleTest, EveryFactoryMakesIndependentComponentsOfItsOwnIdentifier) {
+    ModuleHandle::Table table;
+    ASSERT_EQ(module_->getComponents(table).code(), trelm::kSuccess);
+    for (auto const& [id, factory] : table) {
+        std::unique_ptr<Component> first(factory("first"));
+        std::unique_ptr<Component> second(factory("second"));
+        ASSERT_NE(first, nullptr) << id;
+        ASSERT_NE(second, nullptr) << id;
+        EXPECT_NE(first.get(), second.get());
+        EXPECT_EQ(first->componentId(), id);
+        EXPECT_EQ(second->componentId(), id);
+        EXPECT_EQ(first->name(), "first");
+        EXPECT_EQ(second->name(), "second");
+        EXPECT_EQ(first->state(), Component::State::Created);
+    }
+}
+
+TEST_F(ModuleTest, LoadingRegistersTheSixteenKeysWithTheirTypes) {
+    struct Expected {
+        char const* name;
+        TYPES type;
+    };
+    // Coordinates and the modification time are text keys on purpose; only the photo count is a
+    // number.
+    Expected const keys[] = {
+        {"facebook_media_owner_service_id", trelm::TRELM_TYPES::STRING},
+        {"facebook_media_album_service_id", trelm::TRELM_TYPES::STRING},
+        {"facebook_media_thumb_uri", trelm::TRELM_TYPES::STRING},
+        {"facebook_photo_tag_photo_service_id", trelm::TRELM_TYPES::STRING},
+        {"facebook_photo_tag_tagged_service_id", trelm::TRELM_TYPES::STRING},
+        {"facebook_photo_tag_x", trelm::TRELM_TYPES::STRING},
+        {"facebook_photo_tag_y", trelm::TRELM_TYPES::STRING},
+        {"facebook_photo_tag_text", trelm::TRELM_TYPES::STRING},
+        {"facebook_album_owner_service_id", trelm::TRELM_TYPES::STRING},
+        {"facebook_album_modified", trelm::TRELM_TYPES::STRING},
+        {"facebook_album_location", trelm::TRELM_TYPES::STRING},
+        {"facebook_album_link", trelm::TRELM_TYPES::STRING},
+        {"facebook_album_notes", trelm::TRELM_TYPES::STRING},
+        {"facebook_album_photocount", trelm::TRELM_TYPES::INT32},
+        {"facebook_album_cover_service_id", trelm::TRELM_TYPES::STRING},
+        {"facebook_album_type", trelm::TRELM_TYPES::STRING},
+    };
+    for (Expected const& key : keys) {
+        TYPES type = trelm::TRELM_TYPES::NONE;
+        trelm::uError found = trelm::Metadata::getType(key.name, type);
+        EXPECT_EQ(found.code(), trelm::kSuccess) << key.name;
+        EXPECT_EQ(type, key.type) << key.name;
+    }
+}
+
+// Anything else the module exported could bind a host's or another plug-in's symbol to the
+// module's private copy.
+TEST(ModuleExportsTest, OnlyTheThreeEntryPointsAreExported) {
+    std::string command = std::string("nm -D --defined-only '") + TRELMFACEBOOK_MODULE + "'";
+    FILE* pipe = popen(command.c_str(), "r");
+    ASSERT_NE(pipe, nullptr);
+    std::set<std::string> exported;
+    char line[4096];
+    while (std::fgets(line, sizeof line, pipe) != nullptr) {
+        std::string text(line);
+        while (!text.empty() && (text.back() == '\n' || text.back() == ' ')) text.pop_back();
+        std::size_t space = text.rfind(' ');
+        exported.insert(space == std::string::npos ? text : text.substr(space + 1));
+    }
+    ASSERT_EQ(pclose(pipe), 0) << command;
+    EXPECT_EQ(exported, (std::set<std::string>{"getComponents", "FacebookSource_component",
+                                               "FacebookConnector_component"}));
+}
+
+}  // namespace

@@ -1,0 +1,178 @@
+// trelm-host run as a user runs it: the built program, the built plug-in, a configuration file
+// and a state folder in a scratch folder.
+#include <sys/stat.h>
+
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include "ProgramRunner.h"
+
+using nlohmann::json;
+
+namespace {
+
+constexpr char const* kSourceId = "@trelm.example:/facebooksource";
+constexpr char const* kConnectorId = "@trelm.example:/facebookconnector";
+
+// The emulator's demo account, as the demo configuration holds it.
+constexpr char const* kConfig = R"({
+  "components": [
+    { "name": "facebook", "id": "@trelm.example:/facebooksource",
+      "config": {
+        "facebook_source_appkey": "4f6b1e0c9a7d4c2e8b3a5d6f7e8c9b0a",
+        "facebook_source_appsecret": "c3d2e1f0a9b8c7d6e5f4a3b2c1d0e9f8",
+        "facebook_source_login": "demo@trelm.example",
+        "facebook_source_password": "demo-password",
+        "wipeComponents": [], "wakeupComponents": [], "haveExtendedApi": true } },
+    { "name": "presence", "id": "@trelm.example:/facebookconnector",
+      "config": { "facebook_polltime": 300, "facebook_maxtime": 3600 } }
+  ]
+})";
+
+class HostProgramTest : public ::testing::Test {
+protected:
+    // Runs the host with the scratch folder's state folder and JSON-lines output.
+    ProgramRunner::Result host(std::vector<std::string> args) {
+        args.insert(args.begin(), {"--format", "json", "--state-dir", stateDir()});
+        return runner_.run(TRELM_HOST_PROGRAM, args);
+    }
+    std::string stateDir() const { return runner_.folder() + "/state"; }
+
+    // The output's lines of one type, parsed.
+    static std::vector<json> linesOfType(ProgramRunner::Result const& result, std::string const& type) {
+        std::vector<json> lines;
+        for (std::string const& line : result.outLines()) {
+            json object = json::parse(line);
+            if (object.at("type") == type) lines.push_back(object);
+        }
+        return lines;
+    }
+
+    ProgramRunner runner_;
+};
+
+TEST_F(HostProgramTest, DemoConfigurationStartsBothComponentsAgainstTheEmbeddedEmulator) {
+    std::string config = runner_.writeFile("config.json", kConfig);
+    auto result = host({"--config", config, "--plugin", TRELMFACEBOOK_MODULE});
+    ASSERT_EQ(result.exitCode, 0) << result.err;
+
+    auto plugins = linesOfType(result, "plugin");
+    ASSERT_EQ(plugins.size(), 1u) << result.out;
+    EXPECT_EQ(plugins[0]["path"], TRELMFACEBOOK_MODULE);
+    EXPECT_EQ(plugins[0]["components"], json::array({kConnectorId, kSourceId}));
+
+    auto endpoints = linesOfType(result, "endpoint");
+    ASSERT_EQ(endpoints.size(), 1u);
+    EXPECT_EQ(endpoints[0]["emulator"], true);
+    ASSERT_EQ(endpoints[0]["connect_to"].size(), 2u);
+    EXPECT_EQ(endpoints[0]["connect_to"][0].get<std::string>().rfind("api.facebook.com:80:127.0.0.1:", 0), 0u);
+    EXPECT_EQ(endpoints[0]["connect_to"][1].get<std::string>().rfind("api.facebook.com:443:127.0.0.1:", 0), 0u);
+
+    auto components = linesOfType(result, "component");
+    ASSERT_EQ(components.size(), 2u) << result.out;
+    EXPECT_EQ(components[0]["name"], "facebook");
+    EXPECT_EQ(components[0]["id"], kSourceId);
+    EXPECT_EQ(components[1]["name"], "presence");
+    EXPECT_EQ(components[1]["id"], kConnectorId);
+    for (json const& component : components) {
+        EXPECT_EQ(component["state"], "started") << component;
+        EXPECT_EQ(component["error"], nullptr) << component;
+    }
+    EXPECT_EQ(result.out.find("demo-password"), std::string::npos);
+    EXPECT_EQ(result.err.find("demo-password"), std::string::npos);
+}
+
+struct BrokenPluginCase {
+    char const* name;
+    std::string plugin;
+    std::vector<std::string> expectedInError;
+};
+
+void PrintTo(BrokenPluginCase const& c, std::ostream* os) { *os << c.name; }
+
+class BrokenPluginTest : public HostProgramTest,
+                         public ::testing::WithParamInterface<BrokenPluginCase> {};
+
+TEST_P(BrokenPluginTest, IsReportedWithItsPathAndStopsTheHost) {
+    BrokenPluginCase const& c = GetParam();
+    std::string config = runner_.writeFile("config.json", kConfig);
+    auto result = host({"--no-emulator", "--config", config, "--plugin", c.plugin});
+    EXPECT_EQ(result.exitCode, 1) << result.err;
+    EXPECT_TRUE(linesOfType(result, "component").empty()) << result.out;
+    EXPECT_NE(result.err.find(c.plugin), std::string::npos) << result.err;
+    for (std::string const& expected : c.expectedInError) {
+        EXPECT_NE(result.err.find(expected), std::string::npos) << expected << "\n" << result.err;
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Plugins, BrokenPluginTest,
+    ::testing::Values(
+        BrokenPluginCase{"Missing", "/nonexistent/libmissing.so",
+                         {"0x80000006", "cannot load plug-in"}},
+        BrokenPluginCase{"WithoutGetComponents", NO_ENTRY_PLUGIN,
+                         {"0x80000006", "has no entry point getComponents"}},
+        BrokenPluginCase{"FailingGetComponents", FAILING_PLUGIN,
+                         {"0x80000001", "getComponents of plug-in", "caused by 0x80000002"}}),
+    [](auto const& info) { return std::string(info.param.name); });
+
+TEST_F(HostProgramTest, ComponentIdThatNoPluginOffersFailsTheRunButNotTheOthers) {
+    std::string config = runner_.writeFile("config.json", R"({"components": [
+        {"name": "ghost", "id": "@trelm.example:/nothing"},
+        {"name": "presence", "id": "@trelm.example:/facebookconnector"}]})");
+    auto result = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
+    EXPECT_EQ(result.exitCode, 2);
+    auto components = linesOfType(result, "component");
+    ASSERT_EQ(components.size(), 2u) << result.out;
+    EXPECT_EQ(components[0]["state"], "not created");
+    EXPECT_NE(components[0]["error"].get<std::string>().find("@trelm.example:/nothing"),
+              std::string::npos);
+    EXPECT_EQ(components[1]["state"], "started");
+}
+
+// The store keeps a component's session between runs: a value put there by one run is handed
+// to the component by the next, and the file stays private to its owner.
+TEST_F(HostProgramTest, StoredValueIsRestoredOnTheNextRunAndTheStoreIsPrivate) {
+    std::string config = runner_.writeFile("config.json", kConfig);
+    auto stored = host({"state", "set", "facebook", "facebook_source_session_id", "stored-session-key"});
+    ASSERT_EQ(stored.exitCode, 0) << stored.err;
+
+    struct stat st {};
+    ASSERT_EQ(stat(stateDir().c_str(), &st), 0);
+    EXPECT_EQ(st.st_mode & 0777, 0700u);
+    ASSERT_EQ(stat((stateDir() + "/runtime-configuration.db").c_str(), &st), 0);
+    EXPECT_EQ(st.st_mode & 0777, 0600u);
+
+    auto started = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
+    ASSERT_EQ(started.exitCode, 0) << started.err;
+    auto components = linesOfType(started, "component");
+    ASSERT_EQ(components.size(), 2u) << started.out;
+    EXPECT_EQ(components[0]["restored"], json::array({"facebook_source_session_id"}));
+    EXPECT_EQ(components[1]["restored"], json::array());
+    EXPECT_EQ(started.out.find("stored-session-key"), std::string::npos);
+
+    auto reset = host({"state", "reset", "facebook", "facebook_source_session_id"});
+    ASSERT_EQ(reset.exitCode, 0) << reset.err;
+    auto again = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
+    ASSERT_EQ(again.exitCode, 0) << again.err;
+    components = linesOfType(again, "component");
+    ASSERT_EQ(components.size(), 2u);
+    EXPECT_EQ(components[0]["restored"], json::array());
+}
+
+TEST_F(HostProgramTest, MalformedConfigurationNamesThePlaceAndStopsTheHost) {
+    std::string config = runner_.writeFile("config.json", R"({"components": [
+        {"name": "facebook", "id": "@trelm.example:/facebooksource",
+         "config": {"facebook_polltime": 1.5}}]})");
+    auto result = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_NE(result.err.find("components[0].config.facebook_polltime"), std::string::npos)
+        << result.err;
+    EXPECT_TRUE(result.out.empty()) << result.out;
+}
+
+}  // namespace

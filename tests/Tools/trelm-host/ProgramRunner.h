@@ -1,0 +1,30 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+// Runs a program as a user would, in a scratch folder of its own that is removed afterwards.
+// HOME points into the scratch folder, so nothing touches the real home.
+class ProgramRunner {
+public:
+    struct Result {
+        int exitCode = -1;  // -1 when the program did not exit normally
+        std::string out;
+        std::string err;
+        std::vector<std::string> outLines() const;
+    };
+
+    ProgramRunner();
+    ~ProgramRunner();
+    ProgramRunner(ProgramRunner const&) = delete;
+    ProgramRunner& operator=(ProgramRunner const&) = delete;
+
+    std::string const& folder() const { return folder_; }
+    // Writes `text` to a file in the scratch folder and returns its path.
+    std::string writeFile(std::string const& name, std::string const& text) const;
+
+    Result run(std::string const& program, std::vector<std::string> const& args) const;
+
+private:
+    std::string folder_;
+};
