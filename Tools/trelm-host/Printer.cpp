@@ -128,19 +128,6 @@ void Printer::finish() {
             }
             out_ << line << '\n';
         }
-        for (auto const& instance : pending_) {
-            if (instance.error.failed()) {
-                out_ << "error of " << instance.name << ":\n";
-                std::string text = instance.error.toText();
-                std::size_t start = 0;
-                while (start <= text.size()) {
-                    std::size_t end = text.find('\n', start);
-                    if (end == std::string::npos) end = text.size();
-                    out_ << "  " << text.substr(start, end - start) << '\n';
-                    start = end + 1;
-                }
-            }
-        }
     }
     pending_.clear();
     out_.flush();

@@ -21,8 +21,9 @@ namespace host {
 //   {"type":"endpoint","emulator":B,"connect_to":[...],"ca_file":F}
 //   {"type":"component","name":N,"id":ID,"state":S,"restored":[KEY,...],"error":null|TEXT}
 //   {"type":"state","tag":T,"action":"set"|"reset","keys":[KEY,...]}
-// States: "not created", "created", "configured", "started", "stopped", "shut down". Errors are
-// the uError chain as uError::format renders it. Values kept in the runtime store are never
+// States: "not created", "created", "configured", "started", "stopped", "shut down". In JSON
+// lines an error is the uError chain as uError::format renders it; the table shows states only
+// (the host writes errors to standard error). Values kept in the runtime store are never
 // printed, only their keys.
 //
 // Lifetime: `out` must outlive the printer. Table rows of components are gathered and written by
