@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include <cstdio>
+#include <mutex>
 #include <string>
 #include <utility>
 #include <vector>
@@ -8,7 +10,9 @@
 #include "EmulatorHost.h"
 #include "GetUserSidMessage.h"
 #include "IQueryItems.h"
-#include "RecordingListener.h"
+#include "LoginStatusMessage.h"
+#include "WakeupMessage.h"
+#include "WipeMessage.h"
 
 namespace trelm::test {
 namespace {
@@ -21,6 +25,40 @@ constexpr char const* kSessionSecret = "facebook_source_session_secret";
 constexpr char const* kSessionUser = "facebook_source_session_user";
 constexpr char const* kLastUser = "facebook_source_lastuser";
 
+// Notes the account messages it receives, in arrival order: "status:<code in hex>:<user>",
+// "wipe" and "wakeup".
+class RecordingListener : public Component {
+public:
+    RecordingListener() : Component("observer", "observer") {}
+
+    std::vector<std::string> events() const {
+        std::lock_guard<std::mutex> lock(mutex_);
+        return events_;
+    }
+    void clear() {
+        std::lock_guard<std::mutex> lock(mutex_);
+        events_.clear();
+    }
+
+protected:
+    uError handleMessage(IMessage& msg) override {
+        std::string event = msg.type() == WipeMessage::kType ? "wipe" : msg.type() == WakeupMessage::kType ? "wakeup" : "";
+        if (msg.type() == ILoginStatus::LoginStatusMessage::kType) {
+            auto& status = static_cast<ILoginStatus::LoginStatusMessage&>(msg);
+            char code[16];
+            std::snprintf(code, sizeof code, "%x", status.status);
+            event = std::string("status:") + code + ":" + status.userId.str();
+        }
+        std::lock_guard<std::mutex> lock(mutex_);
+        if (!event.empty()) events_.push_back(event);
+        return TRELM_OK();
+    }
+
+private:
+    mutable std::mutex mutex_;  // guards events_
+    std::vector<std::string> events_;
+};
+
 std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
 std::string const kSignedIn = "status:0:" + kDemoUid;
 std::string const kSignedOut = "status:8000001c:";
@@ -31,7 +69,7 @@ protected:
         host = new EmulatorHost();
         std::string error;
         ASSERT_TRUE(host->start(error)) << error;
-        observer = new RecordingListener("observer");
+        observer = new RecordingListener();
         host->addComponent("observer", *observer);
     }
     static void TearDownTestSuite() {
