@@ -6,14 +6,14 @@ namespace emu {
 
 namespace {
 
-struct FunctionSpec {
+struct FunctionSignature {
     const char* name;
     FqlFunction function;
     int minArgs;
     int maxArgs;  // -1: any number from minArgs on
 };
 
-const FunctionSpec kFunctions[] = {
+const FunctionSignature kFunctions[] = {
     {"now", FqlFunction::Now, 0, 0},       {"rand", FqlFunction::Rand, 0, 0},
     {"strlen", FqlFunction::Strlen, 1, 1}, {"concat", FqlFunction::Concat, 1, -1},
     {"substr", FqlFunction::Substr, 3, 3}, {"strpos", FqlFunction::Strpos, 2, 2},
@@ -63,15 +63,15 @@ Status FqlChecker::checkExpr(FqlExpr& expr, const FqlTable& table) {
             return std::nullopt;
         }
         case FqlExprKind::Call: {
-            const FunctionSpec* spec = nullptr;
-            for (const FunctionSpec& f : kFunctions)
-                if (equalsIgnoreCase(f.name, expr.text)) spec = &f;
-            if (!spec) return ServiceError{605, expr.text + " is not a valid function name."};
+            const FunctionSignature* signature = nullptr;
+            for (const FunctionSignature& f : kFunctions)
+                if (equalsIgnoreCase(f.name, expr.text)) signature = &f;
+            if (!signature) return ServiceError{605, expr.text + " is not a valid function name."};
             const int given = static_cast<int>(expr.args.size());
-            if (given < spec->minArgs || (spec->maxArgs >= 0 && given > spec->maxArgs))
-                return ServiceError{606, expr.text + " function expects " + std::to_string(spec->minArgs) +
+            if (given < signature->minArgs || (signature->maxArgs >= 0 && given > signature->maxArgs))
+                return ServiceError{606, expr.text + " function expects " + std::to_string(signature->minArgs) +
                                              " parameters; " + std::to_string(given) + " given."};
-            expr.function = spec->function;
+            expr.function = signature->function;
             break;
         }
         case FqlExprKind::InSubquery: {

@@ -11,6 +11,12 @@ namespace {
 const char* const kKeywords[] = {"select", "from", "where", "and", "or", "not", "in",
                                  "order", "by", "asc", "desc", "limit", "offset"};
 
+// Leaves one nesting level when it goes out of scope.
+struct DepthGuard {
+    int& depth;
+    ~DepthGuard() { --depth; }
+};
+
 std::unique_ptr<FqlExpr> makeExpr(FqlExprKind kind, std::size_t position) {
     auto e = std::make_unique<FqlExpr>();
     e->kind = kind;
@@ -65,6 +71,16 @@ Status FqlParser::expect(FqlTokenKind kind) {
 Status FqlParser::expectKeyword(const char* keyword) {
     if (!atKeyword(keyword)) return fqlUnexpected(peek());
     ++at_;
+    return std::nullopt;
+}
+
+Status FqlParser::enter() {
+    if (++depth_ > kMaxDepth) return fqlUnexpected(peek());
+    return std::nullopt;
+}
+
+Status FqlParser::countOperator() {
+    if (++operators_ > kMaxOperators) return fqlUnexpected(peek());
     return std::nullopt;
 }
 
@@ -133,8 +149,11 @@ Status FqlParser::parseCount(std::int64_t& out) {
 }
 
 Status FqlParser::parseExpr(std::unique_ptr<FqlExpr>& out) {
+    if (Status s = enter()) return s;
+    DepthGuard guard{depth_};
     if (Status s = parseAnd(out)) return s;
     while (atKeyword("or")) {
+        if (Status s = countOperator()) return s;
         ++at_;
         std::unique_ptr<FqlExpr> right;
         if (Status s = parseAnd(right)) return s;
@@ -146,6 +165,7 @@ Status FqlParser::parseExpr(std::unique_ptr<FqlExpr>& out) {
 Status FqlParser::parseAnd(std::unique_ptr<FqlExpr>& out) {
     if (Status s = parseNot(out)) return s;
     while (atKeyword("and")) {
+        if (Status s = countOperator()) return s;
         ++at_;
         std::unique_ptr<FqlExpr> right;
         if (Status s = parseNot(right)) return s;
@@ -156,6 +176,8 @@ Status FqlParser::parseAnd(std::unique_ptr<FqlExpr>& out) {
 
 Status FqlParser::parseNot(std::unique_ptr<FqlExpr>& out) {
     if (atKeyword("not")) {
+        if (Status s = enter()) return s;
+        DepthGuard guard{depth_};
         auto e = makeExpr(FqlExprKind::Not, peek().position);
         ++at_;
         std::unique_ptr<FqlExpr> operand;
@@ -218,6 +240,7 @@ Status FqlParser::parseCompare(std::unique_ptr<FqlExpr>& out) {
 Status FqlParser::parseSum(std::unique_ptr<FqlExpr>& out) {
     if (Status s = parseProduct(out)) return s;
     while (peek().kind == FqlTokenKind::Plus || peek().kind == FqlTokenKind::Minus) {
+        if (Status s = countOperator()) return s;
         const FqlBinaryOp op = peek().kind == FqlTokenKind::Plus ? FqlBinaryOp::Add : FqlBinaryOp::Sub;
         ++at_;
         std::unique_ptr<FqlExpr> right;
@@ -230,6 +253,7 @@ Status FqlParser::parseSum(std::unique_ptr<FqlExpr>& out) {
 Status FqlParser::parseProduct(std::unique_ptr<FqlExpr>& out) {
     if (Status s = parseUnary(out)) return s;
     while (peek().kind == FqlTokenKind::Star || peek().kind == FqlTokenKind::Slash) {
+        if (Status s = countOperator()) return s;
         const FqlBinaryOp op = peek().kind == FqlTokenKind::Star ? FqlBinaryOp::Mul : FqlBinaryOp::Div;
         ++at_;
         std::unique_ptr<FqlExpr> right;
@@ -241,6 +265,8 @@ Status FqlParser::parseProduct(std::unique_ptr<FqlExpr>& out) {
 
 Status FqlParser::parseUnary(std::unique_ptr<FqlExpr>& out) {
     if (peek().kind == FqlTokenKind::Minus) {
+        if (Status s = enter()) return s;
+        DepthGuard guard{depth_};
         auto e = makeExpr(FqlExprKind::Negate, peek().position);
         ++at_;
         std::unique_ptr<FqlExpr> operand;

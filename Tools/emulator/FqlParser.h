@@ -20,13 +20,18 @@ namespace emu {
 //   unary      := - unary | primary
 //   primary    := integer | 'text' | "text" | ( expr ) | name ( [expr {, expr}] ) | name {. name}
 // A subquery selects exactly one item. Only one statement is accepted: anything after it is an
-// error. Errors are 601 with the service's texts.
+// error. Errors are 601 with the service's texts. Statements nested deeper than kMaxDepth or with
+// more than kMaxOperators operators are refused where the limit is passed, which bounds the
+// recursion of every later stage whatever a request holds.
 //
 // One parser parses one statement; not thread-safe, cheap to make.
 class FqlParser {
 public:
     // On success `select` holds the tree.
     static Status parse(const std::string& query, std::unique_ptr<FqlSelect>& select);
+
+    static constexpr int kMaxDepth = 64;
+    static constexpr int kMaxOperators = 400;
 
 private:
     explicit FqlParser(std::vector<FqlToken> tokens) : tokens_(std::move(tokens)) {}
@@ -47,9 +52,14 @@ private:
     bool isKeyword(const FqlToken& token) const;
     Status expect(FqlTokenKind kind);
     Status expectKeyword(const char* keyword);
+    // Count one more nesting level or operator at the current token; fail past the limit.
+    Status enter();
+    Status countOperator();
 
     std::vector<FqlToken> tokens_;
     std::size_t at_ = 0;
+    int depth_ = 0;
+    int operators_ = 0;
 };
 
 }  // namespace emu

@@ -80,6 +80,14 @@ std::unique_ptr<FqlExpr> cloneLeaf(const FqlExpr& e) {
     return c;
 }
 
+// Whether rendered SQL is one stored column of `alias` ("t1.key2"). Only an ordering by such a
+// column can run along an index; any other is sorted anyway, and SQLite's own plan is best.
+bool isStoredColumn(const std::string& sql, const std::string& alias) {
+    if (sql.size() <= alias.size() + 1 || sql.compare(0, alias.size(), alias) != 0 || sql[alias.size()] != '.')
+        return false;
+    return sql.find_first_not_of("abcdefghijklmnopqrstuvwxyz_0123456789", alias.size() + 1) == std::string::npos;
+}
+
 const char* operatorSql(FqlBinaryOp op) {
     switch (op) {
         case FqlBinaryOp::Or: return " OR ";
@@ -260,12 +268,14 @@ void FqlTranslator::buildSelect(const FqlSelect& select, FqlPlan* plan, bool ite
 
     Fragment order;
     std::vector<int> ordering;
+    std::string orderSql;
     if (select.orderBy) {
         const char* direction = select.descending ? " DESC" : " ASC";
         Fragment first;
         touched_ = &ordering;
         render(*select.orderBy, root, first);
         touched_ = nullptr;
+        orderSql = first.sql;
         order.sql = " ORDER BY ";
         order.append(first);
         order.sql += direction;
@@ -300,7 +310,8 @@ void FqlTranslator::buildSelect(const FqlSelect& select, FqlPlan* plan, bool ite
     std::vector<int> tables;
     std::sort(ordering.begin(), ordering.end());
     ordering.erase(std::unique(ordering.begin(), ordering.end()), ordering.end());
-    const bool leadByOrder = select.limit && ordering.size() == 1 && scope.instances.size() > 1;
+    const bool leadByOrder = select.limit && ordering.size() == 1 && scope.instances.size() > 1 &&
+                             isStoredColumn(orderSql, instances_[ordering[0]].alias);
     if (leadByOrder) tables.push_back(ordering[0]);
     for (int instance : scope.instances)
         if (!omitted[instance] && !(leadByOrder && instance == ordering[0])) tables.push_back(instance);

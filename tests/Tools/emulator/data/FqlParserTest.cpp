@@ -95,6 +95,38 @@ TEST_P(BadStatementTest, AnswersTheServiceErrorCodeAndText) {
 INSTANTIATE_TEST_SUITE_P(Fql, BadStatementTest, testing::ValuesIn(kBadStatements),
                          [](const auto& info) { return std::string(info.param.name); });
 
+// However a request is built, the engine answers with an error instead of recursing without
+// bound: deep nesting and endless operator chains stop at a fixed limit.
+TEST(FqlStatements, DeeplyNestedOrEndlessStatementsAreRefused) {
+    struct Case {
+        const char* name;
+        std::string query;
+    };
+    std::string parens = "select uid from user where ";
+    for (int i = 0; i < 5000; ++i) parens += "(";
+    std::string nots = "select uid from user where ";
+    for (int i = 0; i < 5000; ++i) nots += "not ";
+    std::string minus = "select uid from user where uid = ";
+    for (int i = 0; i < 5000; ++i) minus += "-";
+    std::string ands = "select uid from user where uid = 1";
+    for (int i = 0; i < 5000; ++i) ands += " and uid = 1";
+    std::string sums = "select 1";
+    for (int i = 0; i < 5000; ++i) sums += " + 1";
+    sums += " from user where uid = 1";
+    const Case cases[] = {{"parentheses", parens + "uid = 1"}, {"not", nots + "uid = 1"}, {"minus", minus + "1"},
+                          {"and", ands},                       {"sum", sums}};
+    for (const Case& c : cases) {
+        FqlPlan plan;
+        Status s = FqlEngine::compile(kViewer, 1300000000, c.query, plan);
+        ASSERT_TRUE(s.has_value()) << c.name;
+        EXPECT_EQ(s->code, 601) << c.name;
+    }
+    std::string wide = "select uid from user where uid in (1";
+    for (int i = 2; i < 3000; ++i) wide += ", " + std::to_string(i);
+    FqlPlan plan;
+    EXPECT_FALSE(FqlEngine::compile(kViewer, 1300000000, wide + ")", plan)) << "a long id list is no nesting";
+}
+
 // Statements the client and hand-written tools send that must be accepted.
 const char* const kGoodStatements[] = {
     "SELECT uid FROM user WHERE uid = 1",

@@ -1,6 +1,7 @@
 // The REST methods' documents and what writes change for later reads.
 #include <algorithm>
 #include <set>
+#include <thread>
 
 #include <gtest/gtest.h>
 
@@ -351,6 +352,36 @@ TEST(SqliteStoreTest, FriendsGetListsTheViewersFriends) {
     XmlNode same("friends_get_response");
     ASSERT_FALSE(data.store().friendsGet(DemoAccount::uid, kMe, same));
     EXPECT_EQ(same.children.size(), 80u);
+}
+
+// The server answers on a pool of threads; concurrent readers and a writer must each see whole
+// answers.
+TEST(SqliteStoreTest, ConcurrentCallersGetTheSameAnswersAsOneCaller) {
+    GeneratedStore data(smallOptions());
+    const std::string page = "select uid,name,pic_big from user where uid in (select uid2 from friend where uid1='" +
+                             kMe + "') order by concat(uid,' ') asc limit 150";
+    const std::vector<Row> expected = data.fql(page);
+    ASSERT_EQ(expected.size(), 80u);
+    std::vector<int> mismatches(4, 0);
+    std::vector<std::thread> threads;
+    for (int t = 0; t < 4; ++t) {
+        threads.emplace_back([&, t] {
+            for (int i = 0; i < 25; ++i) {
+                XmlNode root("fql_query_response");
+                if (data.store().fqlQuery(DemoAccount::uid, page, root) || rowsOf(root) != expected) ++mismatches[t];
+                XmlNode stream("stream_get_response");
+                if (data.store().streamGet(DemoAccount::uid, "", "", "", "10", stream) ||
+                    stream.children[0].children.size() != 10)
+                    ++mismatches[t];
+                XmlNode status("users_setStatus_response");
+                if (t == 0 && data.store().setStatus(DemoAccount::uid, "round " + std::to_string(i), "1", "", status))
+                    ++mismatches[t];
+            }
+        });
+    }
+    for (std::thread& th : threads) th.join();
+    EXPECT_EQ(mismatches, std::vector<int>(4, 0));
+    EXPECT_EQ(data.fql("select status.message from user where uid = me()")[0].at("status.message"), "round 24");
 }
 
 TEST(SqliteStoreTest, DemoAccountAndApplicationAreKnown) {
