@@ -21,8 +21,9 @@ struct DemoAccount {
     static constexpr std::int64_t uid = 100000001;
 };
 
-// Sizes of a generated dataset. The demo user always exists and has `demoFriends` friends; other
-// users get about `friendsPerUser` friends each. The same seed and sizes give the same data.
+// Sizes of a generated dataset. The demo user always exists and has `demoFriends` friends; its
+// friends (and a few other users with content) get about `friendsPerUser` friends each. The same
+// seed and sizes give the same data.
 struct GeneratorOptions {
     std::uint64_t seed = 1;
     std::int64_t users = 200;
