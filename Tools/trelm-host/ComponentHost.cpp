@@ -10,6 +10,7 @@ ComponentHost::ComponentHost() = default;
 
 ComponentHost::~ComponentHost() {
     shutdownAll();
+    for (String const& name : attached_) (void)registry_.remove(name);
     for (auto it = slots_.rbegin(); it != slots_.rend(); ++it) destroy(*it);
     destroy(runtime_);
     destroy(http_);
@@ -133,6 +134,22 @@ ComponentHost::Instance ComponentHost::addComponent(HostConfig::ComponentEntry c
         return finish(TRELM_WRAP_MSG(kFailure, e, "the start-up of " + entry.name + " failed"));
     }
     return finish(uError());
+}
+
+uError ComponentHost::attach(Component& component) {
+    uError e = registry_.add(component.name(), &component);
+    if (e.failed()) return TRELM_WRAP_MSG(kFailure, e, "cannot register " + component.name());
+    attached_.push_back(component.name());
+    return TRELM_OK();
+}
+
+BaseSource* ComponentHost::startedSource(String const& name) const {
+    for (Instance const& instance : instances_) {
+        if (instance.name != name || instance.component == nullptr) continue;
+        if (instance.component->state() != Component::State::Started) return nullptr;
+        return dynamic_cast<BaseSource*>(instance.component);
+    }
+    return nullptr;
 }
 
 void ComponentHost::shutdownOne(Component& component, Vector<uError>* errors) {

@@ -3,6 +3,7 @@
 #include <memory>
 #include <vector>
 
+#include "BaseSource.h"
 #include "Component.h"
 #include "ComponentRegistry.h"
 #include "HostConfig.h"
@@ -60,6 +61,16 @@ public:
     // REQUIRES: startBuiltins() succeeded.
     Instance addComponent(HostConfig::ComponentEntry const& entry, PluginLoader::Table const& table);
 
+    // Registers a component of the host's own (a listener for broadcasts) under its name. The
+    // host does not own it, configure it or start it, and does not list it in instances(); the
+    // registry forgets it when the host is destroyed, and the caller keeps it alive until then.
+    // kFailure wrapping the registry's kInvalid when the name is taken.
+    // REQUIRES: startBuiltins() succeeded.
+    uError attach(Component& component);
+
+    // The configured component named `name` that is a data source and has started, or null.
+    BaseSource* startedSource(String const& name) const;
+
     std::vector<Instance> const& instances() const noexcept { return instances_; }
     // REQUIRES: startBuiltins() succeeded.
     RuntimeConfiguration& runtimeConfiguration();
@@ -90,6 +101,7 @@ private:
     Slot runtime_;   // RuntimeConfiguration
     std::vector<Slot> slots_;          // plug-in components, in creation order
     std::vector<Instance> instances_;  // one per addComponent call, in call order
+    std::vector<String> attached_;     // names of the components registered by attach()
 };
 
 }  // namespace host

@@ -33,6 +33,7 @@ uError HostSession::open(Printer& printer) {
 
     e = host_.startBuiltins(http, config_.runtime(),
                             String(StateDirectory::runtimeStorePath(stateDir_)));
+    if (e.ok()) e = host_.attach(loginListener_);
     if (e.failed()) return e;
 
     for (HostConfig::ComponentEntry const& entry : config_.components()) {
@@ -71,6 +72,13 @@ uError HostSession::prepareEndpoint(Printer& printer, Map<String, Variant>& http
     if (Variant const* value = http.search("ca_file")) (void)value->as(caFile);
     printer.endpoint(useEmulator, routes, caFile);
     return TRELM_OK();
+}
+
+HostConfig::ComponentEntry const* HostSession::entry(String const& name) const {
+    for (HostConfig::ComponentEntry const& candidate : config_.components()) {
+        if (candidate.name == name) return &candidate;
+    }
+    return nullptr;
 }
 
 bool HostSession::allStarted() const {

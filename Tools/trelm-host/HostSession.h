@@ -6,6 +6,7 @@
 #include "EmbeddedEmulator.h"
 #include "HostConfig.h"
 #include "HostOptions.h"
+#include "LoginListener.h"
 #include "PluginLoader.h"
 #include "Printer.h"
 #include "trelm/uError.h"
@@ -15,13 +16,13 @@ namespace host {
 
 // Everything a host command works with, brought up in order: the state folder, the
 // configuration file, the plug-ins, the endpoint (the embedded emulator or the configured
-// routing), the built-in components and then every configured component. Commands that act on
-// components (listing them now; queries and data operations later) open a session and use
-// host() afterwards.
+// routing), the built-in components, the host's login-status listener and then every configured
+// component. Commands that act on components (listing them, queries and data operations) open a
+// session and use host() afterwards.
 //
-// Ownership: owns the loader, the emulator and the component host. Members are ordered so that
-// the components go first, then the emulator they may talk to, then the plug-in modules whose
-// code they run.
+// Ownership: owns the loader, the emulator, the login listener and the component host. Members
+// are ordered so that the components go first, then the listener they broadcast to, then the
+// emulator they may talk to, then the plug-in modules whose code they run.
 // Thread safety: used by the host's controlling thread.
 class HostSession {
 public:
@@ -40,6 +41,9 @@ public:
     bool allStarted() const;
 
     ComponentHost& host() noexcept { return host_; }
+    LoginListener& loginListener() noexcept { return loginListener_; }
+    // The configuration file's entry of the component named `name`, or null.
+    HostConfig::ComponentEntry const* entry(String const& name) const;
     HostConfig const& config() const noexcept { return config_; }
     std::string const& stateDir() const noexcept { return stateDir_; }
 
@@ -50,9 +54,10 @@ private:
     HostConfig config_;
     std::string stateDir_;
 
-    // Destroyed in reverse order: host_, then emulator_, then plugins_.
+    // Destroyed in reverse order: host_, then loginListener_, emulator_, plugins_.
     PluginLoader plugins_;
     EmbeddedEmulator emulator_;
+    LoginListener loginListener_;
     ComponentHost host_;
 };
 
