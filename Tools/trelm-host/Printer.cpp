@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <cstdio>
 
 #include <nlohmann/json.hpp>
 
@@ -31,6 +32,59 @@ std::string joined(Vector<String> const& list, char const* separator, char const
 // Texts from plug-ins are byte strings; replacing invalid UTF-8 keeps every line valid JSON.
 void writeLine(std::ostream& out, json const& object) {
     out << object.dump(-1, ' ', false, json::error_handler_t::replace) << '\n';
+}
+
+json valueToJson(Variant const& value) {
+    switch (value.type()) {
+        case Variant::Empty: return nullptr;
+        case Variant::Bool: {
+            bool b = false;
+            (void)value.as(b);
+            return b;
+        }
+        case Variant::Int32:
+        case Variant::Int64: return value.asInt64();
+        case Variant::UInt32: return value.asUInt32();
+        case Variant::IntList: {
+            Vector<int> list;
+            (void)value.as(list);
+            json array = json::array();
+            for (int n : list) array.push_back(n);
+            return array;
+        }
+        case Variant::StringList: {
+            Vector<String> list;
+            (void)value.as(list);
+            return toJson(list);
+        }
+        case Variant::String:
+        case Variant::Guid: break;
+    }
+    return value.asString().str();
+}
+
+json fieldsToJson(Map<String, Variant> const& fields) {
+    json object = json::object();
+    for (auto const& [key, value] : fields) object[key.str()] = valueToJson(value);
+    return object;
+}
+
+// One "key  value" line per field, the values in one column.
+void writeFields(std::ostream& out, Map<String, Variant> const& fields) {
+    std::size_t width = 0;
+    for (auto const& [key, value] : fields) {
+        (void)value;
+        width = std::max<std::size_t>(width, key.size());
+    }
+    for (auto const& [key, value] : fields) {
+        out << "  " << key << std::string(width - key.size() + 2, ' ') << value.toString() << '\n';
+    }
+}
+
+std::string hex(unsigned code) {
+    char text[16];
+    std::snprintf(text, sizeof text, "0x%08x", code);
+    return text;
 }
 
 std::string stateOf(ComponentHost::Instance const& instance) {
@@ -107,6 +161,82 @@ void Printer::state(String const& tag, char const* action, Vector<String> const&
         return;
     }
     out_ << action << "  " << tag << "  " << joined(keys, ", ", "-") << '\n';
+}
+
+void Printer::login(String const& tag, unsigned code, String const& userId, bool stored) {
+    char const* session = stored ? "stored" : "new";
+    if (format_ == Format::JsonLines) {
+        writeLine(out_, {{"type", "login"},
+                         {"tag", tag.str()},
+                         {"code", hex(code)},
+                         {"user", userId.str()},
+                         {"session", session}});
+        return;
+    }
+    out_ << "login     " << tag << "  ";
+    if ((code & 0x80000000u) != 0) {
+        out_ << "failed with " << hex(code) << '\n';
+    } else {
+        out_ << "signed in as " << userId << " (" << session << " session)\n";
+    }
+}
+
+void Printer::step(int number, std::string const& action) {
+    if (format_ == Format::JsonLines) {
+        writeLine(out_, {{"type", "step"}, {"step", number}, {"action", action}});
+        return;
+    }
+    out_ << "step " << number << "    " << action << '\n';
+}
+
+void Printer::record(unsigned index, Map<String, Variant> const& fields) {
+    if (format_ == Format::JsonLines) {
+        writeLine(out_, {{"type", "record"}, {"index", index}, {"fields", fieldsToJson(fields)}});
+        return;
+    }
+    out_ << '#' << index << '\n';
+    writeFields(out_, fields);
+}
+
+void Printer::listed(int objectType, std::size_t rows, std::optional<unsigned> total) {
+    if (format_ == Format::JsonLines) {
+        json count = nullptr;
+        if (total) count = *total;
+        writeLine(out_, {{"type", "listed"}, {"object_type", objectType}, {"rows", rows}, {"total", count}});
+        return;
+    }
+    out_ << "listed    " << rows << (rows == 1 ? " record" : " records");
+    if (total) out_ << " (" << *total << " in all)";
+    out_ << '\n';
+}
+
+void Printer::inserted(int objectType, std::optional<String> const& serviceId) {
+    if (format_ == Format::JsonLines) {
+        json id = nullptr;
+        if (serviceId) id = serviceId->str();
+        writeLine(out_, {{"type", "inserted"}, {"object_type", objectType}, {"core_service_id", id}});
+        return;
+    }
+    out_ << "inserted  object type " << objectType;
+    if (serviceId) out_ << ", core_service_id " << *serviceId;
+    out_ << '\n';
+}
+
+void Printer::retrieved(String const& guid, Map<String, Variant> const& fields) {
+    if (format_ == Format::JsonLines) {
+        writeLine(out_, {{"type", "retrieved"}, {"guid", guid.str()}, {"fields", fieldsToJson(fields)}});
+        return;
+    }
+    out_ << "retrieved " << guid << '\n';
+    writeFields(out_, fields);
+}
+
+void Printer::check(std::string const& what, bool ok) {
+    if (format_ == Format::JsonLines) {
+        writeLine(out_, {{"type", "check"}, {"what", what}, {"ok", ok}});
+        return;
+    }
+    out_ << "check     " << what << ": " << (ok ? "yes" : "NO") << '\n';
 }
 
 void Printer::finish() {

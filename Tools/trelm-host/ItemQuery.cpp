@@ -1,0 +1,211 @@
+#include "ItemQuery.h"
+
+#include "trelm/GUID.h"
+#include "trelm/Metadata.h"
+#include "trelm/SmartPtr.h"
+
+namespace trelm {
+namespace host {
+
+namespace {
+
+using Column = IQueryItems::Column;
+using Constraint = IQueryItems::Constraint;
+
+// In the order the help text lists them.
+constexpr ItemQuery::Kind kKinds[] = {
+    {"contacts", Metadata::Object::TYPE_CONTACT, true},
+    {"status", Metadata::Object::TYPE_STATUS, false},
+    {"photos", Metadata::Object::TYPE_PHOTO_EVENT, false},
+    {"media", Metadata::Object::TYPE_MEDIA, true},
+    {"messages", Metadata::Object::TYPE_MESSAGE, false},
+    {"albums", Metadata::Object::TYPE_ALBUM, true},
+    {"friend-requests", Metadata::Object::TYPE_FRIEND_REQUEST, true},
+    {"photo-tags", Metadata::Object::TYPE_PHOTO_TAG, true},
+};
+
+// The ordering a kind's cursor refuses to start without.
+Vector<Column> orderingOf(int type) {
+    Column const time{Metadata::Key("core_object_time", TRELM_TYPES::INT32), false};
+    Metadata::Key const service("core_event_service", TRELM_TYPES::STRING);
+    Metadata::Key const serviceId("core_event_serviceid", TRELM_TYPES::STRING);
+    switch (type) {
+        case Metadata::Object::TYPE_STATUS:
+        case Metadata::Object::TYPE_PHOTO_EVENT:
+        case Metadata::Object::TYPE_MESSAGE:
+            return Vector<Column>{time, Column{service, false}, Column{serviceId, false}};
+        case Metadata::Object::TYPE_FRIEND_REQUEST:
+            return Vector<Column>{Column{service, true}, Column{serviceId, true}};
+        default:
+            return Vector<Column>{};
+    }
+}
+
+struct Operator {
+    char const* text;
+    Constraint::Function function;
+};
+// Two-character operators first, so that "<=" is not read as "<".
+constexpr Operator kOperators[] = {
+    {"<=", Constraint::LessOrEqual}, {">=", Constraint::GreaterOrEqual}, {"!=", Constraint::NotEqual},
+    {"<", Constraint::LessThan},     {">", Constraint::GreaterThan},     {"=", Constraint::Equal},
+};
+
+// One value of a condition, read as the key's type.
+uError typedValue(TRELM_TYPES::TYPES type, String const& text, Variant& out) {
+    uError e;
+    switch (type) {
+        case TRELM_TYPES::INT32: {
+            int v = 0;
+            e = text.to(v);
+            if (e.ok()) out = v;
+            break;
+        }
+        case TRELM_TYPES::UINT32: {
+            unsigned v = 0;
+            e = text.to(v);
+            if (e.ok()) out = v;
+            break;
+        }
+        case TRELM_TYPES::INT64:
+        case TRELM_TYPES::UINT64: {
+            long long v = 0;
+            e = text.to(v);
+            if (e.ok()) out = v;
+            break;
+        }
+        case TRELM_TYPES::GUID_TYPE: {
+            GUID v;
+            e = GUID::fromString(text, v);
+            if (e.ok()) out = v;
+            break;
+        }
+        case TRELM_TYPES::BOOL: {
+            bool v = false;
+            e = Variant(text).as(v);
+            if (e.ok()) out = v;
+            break;
+        }
+        default:
+            out = text;
+            break;
+    }
+    return e;
+}
+
+}  // namespace
+
+ItemQuery::Kind const* ItemQuery::findKind(std::string const& name) {
+    for (Kind const& kind : kKinds) {
+        if (name == kind.name) return &kind;
+    }
+    return nullptr;
+}
+
+ItemQuery::Kind const* ItemQuery::findKind(int type) {
+    for (Kind const& kind : kKinds) {
+        if (kind.type == type) return &kind;
+    }
+    return nullptr;
+}
+
+std::vector<std::string> ItemQuery::kindNames() {
+    std::vector<std::string> names;
+    for (Kind const& kind : kKinds) names.emplace_back(kind.name);
+    return names;
+}
+
+ItemQuery::ItemQuery(Kind const& kind) : kind_(&kind) {}
+
+uError ItemQuery::where(std::string const& text) {
+    auto bad = [&](std::string const& reason) {
+        return TRELM_ERROR_MSG(kInvalid, "condition \"" + text + "\": " + reason);
+    };
+    std::size_t at = text.find_first_of("<>!=");
+    if (at == std::string::npos) return bad("needs an operator (= != < <= > >=)");
+    Operator const* op = nullptr;
+    for (Operator const& candidate : kOperators) {
+        if (text.compare(at, std::char_traits<char>::length(candidate.text), candidate.text) == 0) {
+            op = &candidate;
+            break;
+        }
+    }
+    if (op == nullptr) return bad("needs an operator (= != < <= > >=)");
+    String const key(text.substr(0, at));
+    if (key.empty()) return bad("needs a key before the operator");
+    std::string const valueText = text.substr(at + std::char_traits<char>::length(op->text));
+
+    // Keys the plug-ins did not register are compared as text.
+    TRELM_TYPES::TYPES type = TRELM_TYPES::STRING;
+    (void)Metadata::getType(key, type);
+
+    Constraint condition;
+    condition.key = Metadata::Key(key, type);
+    condition.function = op->function;
+    if (op->function == Constraint::Equal && valueText.find(',') != std::string::npos) {
+        condition.function = Constraint::InList;
+        Vector<int> numbers;
+        Vector<String> texts;
+        std::size_t begin = 0;
+        while (true) {
+            std::size_t end = valueText.find(',', begin);
+            String item(valueText.substr(begin, end == std::string::npos ? std::string::npos : end - begin));
+            Variant value;
+            uError e = typedValue(type, item, value);
+            if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "condition \"" + text + "\": \"" + item.str() + "\" does not fit the key");
+            e = type == TRELM_TYPES::INT32 ? numbers.pushBack(value.asInt32()) : texts.pushBack(item);
+            if (e.failed()) return e;
+            if (end == std::string::npos) break;
+            begin = end + 1;
+        }
+        condition.value = type == TRELM_TYPES::INT32 ? Variant(numbers) : Variant(texts);
+    } else {
+        uError e = typedValue(type, String(valueText), condition.value);
+        if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "condition \"" + text + "\": the value does not fit the key");
+    }
+    return conditions_.pushBack(condition);
+}
+
+uError ItemQuery::fill(IQueryItems::StartQueryMessage& msg) const {
+    Constraint type;
+    type.key = Metadata::Key("core_object_type", TRELM_TYPES::INT32);
+    type.function = Constraint::Equal;
+    type.value = kind_->type;
+    Vector<Constraint> constraints;
+    uError e = constraints.pushBack(type);
+    for (Constraint const& c : conditions_) {
+        if (e.ok()) e = constraints.pushBack(c);
+    }
+    if (e.failed()) return e;
+    msg.columns = orderingOf(kind_->type);
+    msg.constraints = std::move(constraints);
+    msg.position = -1;
+    return TRELM_OK();
+}
+
+uError ItemQuery::walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows) const {
+    uError e = cursor.jumpBeginning();
+    if (e.failed()) return e;
+    for (unsigned i = 0; i < skip; ++i) {
+        int moved = 0;
+        e = cursor.seek(1, moved);
+        if (e.failed()) return e;
+        if (moved <= 0) return TRELM_OK();  // fewer rows than were to be passed over
+    }
+    while (!limit || rows.size() < *limit) {
+        SmartPtr<Record> row;
+        e = cursor.getRow(row);
+        if (e.failed()) return e;
+        if (e.code() == kNoData || !row) break;
+        rows.push_back(*row);
+        if (limit && rows.size() >= *limit) break;
+        int moved = 0;
+        e = cursor.seek(1, moved);
+        if (e.failed()) return e;
+        if (moved <= 0) break;
+    }
+    return TRELM_OK();
+}
+
+}  // namespace host
+}  // namespace trelm

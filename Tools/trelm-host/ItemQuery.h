@@ -1,0 +1,77 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "IQueryItems.h"
+#include "trelm/Map.h"
+#include "trelm/String.h"
+#include "trelm/Variant.h"
+#include "trelm/Vector.h"
+#include "trelm/uError.h"
+
+namespace trelm {
+namespace host {
+
+// One item query as a person asks for it ("contacts, skip 10, at most 5, where X=Y"), turned
+// into the start-query message a data source understands, and the walk over the cursor that
+// the source answers with.
+//
+// The message carries the kind's "core_object_type" as an Equal constraint, the conditions
+// given with where(), and as its columns the ordering the kind's cursor serves: the event
+// cursors (status posts, photo posts, inbox messages) want "core_object_time",
+// "core_event_service", "core_event_serviceid", all descending; friend requests want
+// "core_event_service", "core_event_serviceid", both ascending; the others take no ordering.
+//
+// A plain value; not guarded.
+class ItemQuery {
+public:
+    using Record = Map<String, Variant>;
+
+    // One kind of item that can be asked for by name.
+    struct Kind {
+        char const* name;  // as typed: "contacts", "friend-requests", ...
+        int type;          // "core_object_type"
+        // The cursor can count its rows (an FQL cursor); the stream and inbox cursors cannot.
+        bool countable;
+    };
+
+    // The kind named `name`, or null.
+    static Kind const* findKind(std::string const& name);
+    static Kind const* findKind(int type);
+    // Every name, in table order.
+    static std::vector<std::string> kindNames();
+
+    explicit ItemQuery(Kind const& kind);
+
+    Kind const& kind() const noexcept { return *kind_; }
+
+    // Adds a condition written KEY=VALUE, KEY!=VALUE, KEY<VALUE, KEY<=VALUE, KEY>VALUE or
+    // KEY>=VALUE. The value is read by the key's registered metadata type (integers, GUIDs,
+    // booleans; text otherwise); "KEY=A,B,C" asks for any of a list. kInvalid, naming the
+    // condition, when it has no operator, no key, or a value its type cannot hold.
+    uError where(std::string const& text);
+
+    // Rows to pass over before the first one listed.
+    unsigned skip = 0;
+    // At most this many rows; unset: every row.
+    std::optional<unsigned> limit;
+
+    // Sets the columns, constraints and position of `msg` for this query (the cursor and the
+    // interactive flag are left alone).
+    uError fill(IQueryItems::StartQueryMessage& msg) const;
+
+    // Walks `cursor` from its beginning: passes over `skip` rows, then copies rows into `rows`
+    // until `limit` rows are listed or the cursor cannot move on. Moves are seek(1) steps, which
+    // every cursor of the source supports. The cursor's failure is returned as it is; `rows`
+    // then holds what was read before it.
+    uError walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows) const;
+
+private:
+    Kind const* kind_;
+    Vector<IQueryItems::Constraint> conditions_;
+};
+
+}  // namespace host
+}  // namespace trelm

@@ -1,0 +1,165 @@
+#include "SourceClient.h"
+
+#include <filesystem>
+#include <fstream>
+#include <system_error>
+#include <utility>
+
+#include "GetUserSidMessage.h"
+#include "trelm/Metadata.h"
+
+namespace trelm {
+namespace host {
+
+namespace {
+
+// The service's refusal of a session may arrive wrapped by the cursor or the source.
+bool sessionRefused(uError const& e) {
+    for (uError const* level = &e; level != nullptr; level = level->cause()) {
+        if (level->code() == kNotSignedIn) return true;
+    }
+    return false;
+}
+
+}  // namespace
+
+SourceClient::SourceClient(HostSession& session, Printer& printer)
+    : session_(session), printer_(printer) {}
+
+SourceClient::~SourceClient() = default;
+
+uError SourceClient::open() {
+    for (ComponentHost::Instance const& instance : session_.host().instances()) {
+        source_ = session_.host().startedSource(instance.name);
+        if (source_ != nullptr) {
+            name_ = instance.name;
+            break;
+        }
+    }
+    if (source_ == nullptr) {
+        return TRELM_ERROR_MSG(kNotFound, "no data source is configured and started");
+    }
+    HostConfig::ComponentEntry const* entry = session_.entry(name_);
+    if (entry == nullptr) return TRELM_ERROR_MSG(kNotFound, "no configuration entry for " + name_);
+    signIn_.emplace(session_.host(), session_.loginListener(), *entry);
+
+    bool stored = false;
+    uError e = signIn_->sessionStored(stored);
+    if (e.failed()) return e;
+    if (!stored && signIn_->possible()) return signIn();
+
+    // The source took the stored session (or its configured one) with its configuration.
+    IServiceSource::GetUserSidMessage user;
+    e = user.send(name_);
+    printer_.login(name_, e.code(), user.result, true);
+    printer_.finish();
+    return TRELM_OK();
+}
+
+uError SourceClient::signIn() {
+    LoginListener::Status status;
+    uError e = signIn_->signIn(status);
+    ++signIns_;
+    if (!status.tag.empty()) printer_.login(name_, status.code, status.userId, false);
+    printer_.finish();
+    return e;
+}
+
+template <class Operation>
+uError SourceClient::retrying(Operation operation) {
+    uError e = operation();
+    if (!sessionRefused(e) || !signIn_->possible()) return e;
+    uError signedIn = signIn();
+    if (signedIn.failed()) {
+        return TRELM_WRAP_MSG(kNotSignedIn, signedIn, "the service refused the session and signing in again failed");
+    }
+    return operation();
+}
+
+uError SourceClient::query(ItemQuery const& query, Listing& listing) {
+    // The previous cursor's records leave the source's cache before the new query fills it.
+    cursor_.reset();
+    listed_.clear();
+    Listing result;
+    SmartPtr<IQueryItems::ICursor> cursor;
+    uError e = retrying([&]() -> uError {
+        result = Listing();
+        cursor.reset();
+        IQueryItems::StartQueryMessage msg;
+        uError step = query.fill(msg);
+        if (step.failed()) return step;
+        step = source_->startQuery(msg, true);
+        if (step.failed()) return step;
+        if (!msg.cursor) {
+            return TRELM_ERROR_MSG(kFailure, name_ + " answered the query without a cursor");
+        }
+        cursor = msg.cursor;
+        step = query.walk(*cursor, result.rows);
+        if (step.failed()) return step;
+        if (query.kind().countable) {
+            unsigned total = 0;
+            step = cursor->numRows(total);
+            if (step.failed()) return step;
+            result.total = total;
+        }
+        return TRELM_OK();
+    });
+    if (e.failed()) return e;
+    cursor_ = std::move(cursor);
+    listed_ = result.rows;
+    listing = std::move(result);
+    return TRELM_OK();
+}
+
+uError SourceClient::insert(Record& record) {
+    Record const original = record;
+    return retrying([&]() -> uError {
+        record = original;
+        return source_->insert(record);
+    });
+}
+
+uError SourceClient::postStatus(String const& text) {
+    Record record;
+    uError e = record.insert("core_object_type", Variant(static_cast<int>(Metadata::Object::TYPE_STATUS)));
+    if (e.ok()) e = record.insert("core_event_text", Variant(text));
+    if (e.ok()) e = insert(record);
+    return e;
+}
+
+uError SourceClient::uploadPhoto(std::string const& path, String const& caption, String const& albumId,
+                                 String& serviceId) {
+    // The source reads the file only when the request goes out; a missing file is better told
+    // here, by its name.
+    std::error_code ec;
+    std::filesystem::path file = std::filesystem::absolute(path, ec);
+    if (ec || !std::ifstream(file, std::ios::binary)) {
+        return TRELM_ERROR_MSG(kNotFound, "cannot read the photo " + path);
+    }
+    Record record;
+    uError e = record.insert("core_object_type", Variant(static_cast<int>(Metadata::Object::TYPE_MEDIA)));
+    if (e.ok()) e = record.insert("media_uri", Variant(String(file.string())));
+    if (e.ok() && !caption.empty()) e = record.insert("media_notes", Variant(caption));
+    if (e.ok() && !albumId.empty()) e = record.insert("facebook_media_album_service_id", Variant(albumId));
+    if (e.ok()) e = insert(record);
+    if (e.failed()) return e;
+    Variant const* id = record.search("core_service_id");
+    String text;
+    if (id == nullptr || id->as(text).failed() || text.empty()) {
+        return TRELM_ERROR_MSG(kFailure, name_ + " uploaded the photo but gave back no core_service_id");
+    }
+    serviceId = text;
+    return TRELM_OK();
+}
+
+uError SourceClient::retrieve(GUID const& guid, Record& record) {
+    return source_->retrieve(guid, record, false);
+}
+
+SourceClient::Record const* SourceClient::listed(std::size_t n) const {
+    if (n == 0 || n > listed_.size()) return nullptr;
+    return &listed_[n - 1];
+}
+
+}  // namespace host
+}  // namespace trelm
