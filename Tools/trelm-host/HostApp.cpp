@@ -2,7 +2,10 @@
 
 #include <CLI/CLI.hpp>
 
+#include "DemoTour.h"
 #include "HostSession.h"
+#include "HostShell.h"
+#include "ItemCommands.h"
 #include "RuntimeConfiguration.h"
 #include "StateDirectory.h"
 #include "trelm/Configuration.h"
@@ -23,7 +26,8 @@ uError openStore(HostOptions const& options, RuntimeConfiguration& store) {
 
 }  // namespace
 
-HostApp::HostApp(std::ostream& out, std::ostream& err) : out_(out), err_(err) {}
+HostApp::HostApp(std::istream& in, std::ostream& out, std::ostream& err)
+    : in_(in), out_(out), err_(err) {}
 
 void HostApp::report(uError const& error) {
     err_ << "trelm-host: " << error.toText() << '\n';
@@ -68,6 +72,16 @@ int HostApp::run(int argc, char const* const* argv) {
     stateReset->add_option("tag", tag, "component name")->required();
     stateReset->add_option("keys", keys, "keys")->required();
 
+    CLI::App* demo = app.add_subcommand("demo", "sign in, list friends, post a status, upload a photo, fetch a friend again");
+    DemoTour::Options tour;
+    demo->add_option("--friends", tour.friends, "how many friends to list")
+        ->default_val(tour.friends)
+        ->check(CLI::NonNegativeNumber);
+    demo->add_option("--status", tour.status, "the status to post (default: a greeting with the time)");
+    demo->add_option("--photo", tour.photo, "the image to upload (default: a small built-in PNG)");
+    ItemCommands items(app, false);
+    CLI::App* shell = app.add_subcommand("shell", "read query, insert and retrieve commands from standard input");
+
     try {
         app.parse(argc, argv);
     } catch (CLI::ParseError const& e) {
@@ -78,6 +92,26 @@ int HostApp::run(int argc, char const* const* argv) {
 
     if (stateSet->parsed()) return runStateSet(options, tag, key, value);
     if (stateReset->parsed()) return runStateReset(options, tag, keys);
+    if (demo->parsed()) {
+        return runWithSource(options, [&](SourceClient& client, Printer& printer, HostSession& session) {
+            return DemoTour(tour, session.stateDir()).run(client, printer);
+        });
+    }
+    if (items.parsed()) {
+        return runWithSource(options, [&](SourceClient& client, Printer& printer, HostSession&) {
+            uError e = client.open();
+            return e.failed() ? e : items.run(client, printer);
+        });
+    }
+    if (shell->parsed()) {
+        return runWithSource(options, [&](SourceClient& client, Printer& printer, HostSession&) {
+            uError e = client.open();
+            if (e.failed()) return e;
+            int failures = HostShell(in_, out_, err_).run(client, printer);
+            if (failures == 0) return TRELM_OK();
+            return TRELM_ERROR_MSG(kFailure, std::to_string(failures) + " shell command(s) failed");
+        });
+    }
     return runStart(options);
 }
 
@@ -97,6 +131,37 @@ int HostApp::runStart(HostOptions const& options) {
     for (auto const& instance : session.host().instances()) {
         if (instance.error.failed()) report(instance.error);
     }
+    return started ? kExitOk : kExitComponentFailed;
+}
+
+int HostApp::runWithSource(
+    HostOptions const& options,
+    std::function<uError(SourceClient& client, Printer& printer, HostSession& session)> const& command) {
+    Printer printer(options.format, out_);
+    HostSession session(options);
+    uError e = session.open(printer);
+    printer.finish();
+    if (e.failed()) {
+        report(e);
+        return kExitSetupFailed;
+    }
+    // A component that failed is told now, before the command's own output explains why.
+    for (auto const& instance : session.host().instances()) {
+        if (instance.error.failed()) report(instance.error);
+    }
+    bool started = session.allStarted();
+    uError result;
+    {
+        // The client's cursor runs plug-in code: it goes before the components shut down.
+        SourceClient client(session, printer);
+        result = command(client, printer, session);
+        printer.finish();
+    }
+    if (result.failed()) report(result);
+    Vector<uError> errors;
+    session.host().shutdownAll(&errors);
+    for (uError const& error : errors) report(error);
+    if (result.failed()) return kExitCommandFailed;
     return started ? kExitOk : kExitComponentFailed;
 }
 

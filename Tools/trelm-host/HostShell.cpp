@@ -1,0 +1,56 @@
+#include "HostShell.h"
+
+#include <unistd.h>
+
+#include <string>
+
+#include <CLI/CLI.hpp>
+
+#include "ItemCommands.h"
+
+namespace trelm {
+namespace host {
+
+HostShell::HostShell(std::istream& in, std::ostream& out, std::ostream& err)
+    : in_(in), out_(out), err_(err) {}
+
+int HostShell::run(SourceClient& client, Printer& printer) {
+    bool const prompt = isatty(STDIN_FILENO) == 1 && &in_ == &std::cin;
+    int failures = 0;
+    std::string line;
+    while (true) {
+        if (prompt) out_ << "trelm> " << std::flush;
+        if (!std::getline(in_, line)) break;
+        std::size_t first = line.find_first_not_of(" \t\r");
+        if (first == std::string::npos || line[first] == '#') continue;
+
+        // Each line gets fresh definitions: CLI11 keeps what it parsed in the app.
+        CLI::App app{"trelm-host shell"};
+        app.require_subcommand(1);
+        ItemCommands commands(app, true);
+        std::string word = line.substr(first, line.find_first_of(" \t\r", first) - first);
+        auto known = app.get_subcommands([&](CLI::App* command) { return command->check_name(word); });
+        if (known.empty()) {
+            err_ << "trelm-host: unknown command \"" << word << "\" (query, insert, retrieve, quit)\n";
+            ++failures;
+            continue;
+        }
+        try {
+            app.parse(line, false);
+        } catch (CLI::ParseError const& e) {
+            int code = app.exit(e, out_, err_);
+            if (code != 0) ++failures;
+            continue;
+        }
+        if (commands.quitParsed()) break;
+        uError e = commands.run(client, printer);
+        if (e.failed()) {
+            err_ << "trelm-host: " << e.toText() << '\n';
+            ++failures;
+        }
+    }
+    return failures;
+}
+
+}  // namespace host
+}  // namespace trelm

@@ -1,0 +1,141 @@
+#include "ItemCommands.h"
+
+#include <cstddef>
+#include <string>
+
+#include "ItemQuery.h"
+#include "trelm/GUID.h"
+
+namespace trelm {
+namespace host {
+
+namespace {
+
+std::string joined(std::vector<std::string> const& words) {
+    std::string text;
+    for (std::string const& word : words) {
+        if (!text.empty()) text += ' ';
+        text += word;
+    }
+    return text;
+}
+
+std::string kindList() {
+    std::string list;
+    for (std::string const& name : ItemQuery::kindNames()) list += (list.empty() ? "" : "|") + name;
+    return list;
+}
+
+}  // namespace
+
+ItemCommands::ItemCommands(CLI::App& app, bool shell) {
+    query_ = app.add_subcommand("query", "list items of the data source");
+    query_->add_option("type", type_, kindList())->required()->check(CLI::IsMember(ItemQuery::kindNames()));
+    CLI::Option* limit = query_->add_option("--limit", limit_, "list at most N items")
+                             ->default_val(kDefaultLimit)
+                             ->check(CLI::NonNegativeNumber);
+    query_->add_option("--skip", skip_, "pass over the first N items")->check(CLI::NonNegativeNumber);
+    query_->add_option("--where", where_, "condition KEY=VALUE (also != < <= > >=; =A,B for a list)")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    query_->add_flag("--all", all_, "list every item")->excludes(limit);
+
+    CLI::App* insert = app.add_subcommand("insert", "publish an item through the data source");
+    insert->require_subcommand(1);
+    insertStatus_ = insert->add_subcommand("status", "post a status");
+    insertStatus_->add_option("text", words_, "the status text (words are joined with blanks)")->required();
+    insertPhoto_ = insert->add_subcommand("photo", "upload a photo");
+    insertPhoto_->add_option("file", file_, "the image file")->required();
+    insertPhoto_->add_option("--caption", caption_, "the photo's caption");
+    insertPhoto_->add_option("--album", album_, "the album's service id (default: the application's album)");
+
+    if (shell) {
+        retrieve_ = app.add_subcommand("retrieve", "show a record of the last listing again");
+        retrieve_->add_option("record", target_, "its GUID, or #N for the N-th record listed")->required();
+        quit_ = app.add_subcommand("quit", "leave the shell");
+    }
+}
+
+bool ItemCommands::parsed() const {
+    for (CLI::App const* command : {query_, insertStatus_, insertPhoto_, retrieve_, quit_}) {
+        if (command != nullptr && command->parsed()) return true;
+    }
+    return false;
+}
+
+bool ItemCommands::quitParsed() const { return quit_ != nullptr && quit_->parsed(); }
+
+uError ItemCommands::run(SourceClient& client, Printer& printer) {
+    uError e;
+    if (query_->parsed()) {
+        e = runQuery(client, printer);
+    } else if (insertStatus_->parsed()) {
+        e = client.postStatus(String(joined(words_)));
+        if (e.ok()) printer.inserted(Metadata::Object::TYPE_STATUS, std::nullopt);
+    } else if (insertPhoto_->parsed()) {
+        e = runInsertPhoto(client, printer);
+    } else if (retrieve_ != nullptr && retrieve_->parsed()) {
+        e = runRetrieve(client, printer);
+    }
+    printer.finish();
+    return e;
+}
+
+uError ItemCommands::runQuery(SourceClient& client, Printer& printer) {
+    ItemQuery::Kind const* kind = ItemQuery::findKind(type_);
+    if (kind == nullptr) return TRELM_ERROR_MSG(kInvalid, "unknown item type " + type_);
+    ItemQuery query(*kind);
+    for (std::string const& condition : where_) {
+        uError e = query.where(condition);
+        if (e.failed()) return e;
+    }
+    query.skip = skip_;
+    if (!all_) query.limit = limit_;
+
+    SourceClient::Listing listing;
+    uError e = client.query(query, listing);
+    if (e.failed()) {
+        return TRELM_WRAP_MSG(kFailure, e, client.sourceName() + " cannot list " + type_);
+    }
+    for (std::size_t i = 0; i < listing.rows.size(); ++i) {
+        printer.record(static_cast<unsigned>(i + 1), listing.rows[i]);
+    }
+    printer.listed(kind->type, listing.rows.size(), listing.total);
+    return TRELM_OK();
+}
+
+uError ItemCommands::runInsertPhoto(SourceClient& client, Printer& printer) {
+    String id;
+    uError e = client.uploadPhoto(file_, String(caption_), String(album_), id);
+    if (e.ok()) printer.inserted(Metadata::Object::TYPE_MEDIA, id);
+    return e;
+}
+
+uError ItemCommands::runRetrieve(SourceClient& client, Printer& printer) {
+    GUID guid;
+    if (!target_.empty() && target_[0] == '#') {
+        unsigned n = 0;
+        SourceClient::Record const* record = nullptr;
+        if (String(target_.substr(1)).to(n).ok()) record = client.listed(n);
+        if (record == nullptr) {
+            return TRELM_ERROR_MSG(kNotFound, "the last listing has no record " + target_);
+        }
+        Variant const* id = record->search("core_object_id");
+        if (id == nullptr || id->as(guid).failed()) {
+            return TRELM_ERROR_MSG(kNotFound, "record " + target_ + " has no core_object_id");
+        }
+    } else {
+        uError e = GUID::fromString(String(target_), guid);
+        if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "\"" + target_ + "\" is neither a GUID nor #N");
+    }
+    SourceClient::Record record;
+    uError e = client.retrieve(guid, record);
+    if (e.failed()) {
+        return TRELM_WRAP_MSG(kFailure, e, client.sourceName() + " has no record " + guid.toString().str());
+    }
+    printer.retrieved(guid.toString(), record);
+    return TRELM_OK();
+}
+
+}  // namespace host
+}  // namespace trelm
