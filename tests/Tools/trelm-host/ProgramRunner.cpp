@@ -46,7 +46,10 @@ std::string ProgramRunner::writeFile(std::string const& name, std::string const&
 }
 
 ProgramRunner::Result ProgramRunner::run(std::string const& program,
-                                         std::vector<std::string> const& args) const {
+                                         std::vector<std::string> const& args,
+                                         std::string const& input) const {
+    // A program never waits for a terminal: its input is a file, empty unless given.
+    std::string inPath = writeFile("stdin", input);
     std::string outPath = folder_ + "/stdout";
     std::string errPath = folder_ + "/stderr";
     std::string home = folder_ + "/home";
@@ -68,9 +71,12 @@ ProgramRunner::Result ProgramRunner::run(std::string const& program,
 
     pid_t pid = fork();
     if (pid == 0) {
+        int in = open(inPath.c_str(), O_RDONLY);
         int out = open(outPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
         int err = open(errPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
-        if (out < 0 || err < 0 || dup2(out, 1) < 0 || dup2(err, 2) < 0) _exit(126);
+        if (in < 0 || out < 0 || err < 0 || dup2(in, 0) < 0 || dup2(out, 1) < 0 || dup2(err, 2) < 0) {
+            _exit(126);
+        }
         execve(program.c_str(), argv.data(), envp.data());
         _exit(127);
     }

@@ -23,7 +23,9 @@ public:
     // Writes `text` to a file in the scratch folder and returns its path.
     std::string writeFile(std::string const& name, std::string const& text) const;
 
-    Result run(std::string const& program, std::vector<std::string> const& args) const;
+    // Runs `program` with `args`, `input` as its standard input, and waits for it to end.
+    Result run(std::string const& program, std::vector<std::string> const& args,
+               std::string const& input = {}) const;
 
 private:
     std::string folder_;

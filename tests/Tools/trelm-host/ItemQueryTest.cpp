@@ -1,0 +1,224 @@
+#include <optional>
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "ItemQuery.h"
+#include "trelm/GUID.h"
+
+using trelm::GUID;
+using trelm::Map;
+using trelm::SmartPtr;
+using trelm::String;
+using trelm::Variant;
+using trelm::Vector;
+using trelm::uError;
+using trelm::host::ItemQuery;
+using Constraint = trelm::IQueryItems::Constraint;
+namespace Types = trelm::TRELM_TYPES;
+
+namespace {
+
+ItemQuery contacts() { return ItemQuery(*ItemQuery::findKind("contacts")); }
+
+struct ConditionCase {
+    char const* name;
+    char const* text;
+    char const* key;
+    Types::TYPES type;
+    Constraint::Function function;
+    Variant value;
+};
+
+void PrintTo(ConditionCase const& c, std::ostream* os) { *os << c.name; }
+
+class ConditionTest : public ::testing::TestWithParam<ConditionCase> {};
+
+// The condition follows the type the key was registered with: a number compared as text (or
+// text as a number) would make the source's cursors refuse or misread it.
+TEST_P(ConditionTest, BecomesAConstraintOfTheKeysType) {
+    ConditionCase const& c = GetParam();
+    ItemQuery query = contacts();
+    ASSERT_EQ(query.where(c.text).code(), trelm::kSuccess);
+    trelm::IQueryItems::StartQueryMessage msg;
+    ASSERT_EQ(query.fill(msg).code(), trelm::kSuccess);
+    ASSERT_EQ(msg.constraints.size(), 2u);
+    EXPECT_EQ(msg.constraints[0].key.name(), "core_object_type");
+    EXPECT_EQ(msg.constraints[0].value, Variant(2));
+    Constraint const& added = msg.constraints[1];
+    EXPECT_EQ(added.key.name(), c.key);
+    EXPECT_EQ(added.key.type(), c.type);
+    EXPECT_EQ(added.function, c.function);
+    EXPECT_EQ(added.value, c.value);
+}
+
+GUID const kGuid = [] {
+    GUID g;
+    (void)GUID::fromString("0f1e2d3c-4b5a-4978-8695-a4b3c2d1e0f9", g);
+    return g;
+}();
+
+INSTANTIATE_TEST_SUITE_P(
+    Conditions, ConditionTest,
+    ::testing::Values(
+        ConditionCase{"TextEqual", "core_contact_name=Anna Moreau", "core_contact_name", Types::STRING,
+                      Constraint::Equal, Variant("Anna Moreau")},
+        ConditionCase{"TimeAtLeast", "core_object_time>=1000", "core_object_time", Types::INT32,
+                      Constraint::GreaterOrEqual, Variant(1000)},
+        ConditionCase{"TimeBelowNegative", "core_object_time<-5", "core_object_time", Types::INT32,
+                      Constraint::LessThan, Variant(-5)},
+        ConditionCase{"NotEqual", "core_contact_service!=Facebook", "core_contact_service", Types::STRING,
+                      Constraint::NotEqual, Variant("Facebook")},
+        ConditionCase{"IdList", "core_contact_service_id=12,34", "core_contact_service_id", Types::STRING,
+                      Constraint::InList, Variant(Vector<String>{"12", "34"})},
+        ConditionCase{"TypeList", "core_object_type=2,11", "core_object_type", Types::INT32,
+                      Constraint::InList, Variant(Vector<int>{2, 11})},
+        ConditionCase{"Guid", "core_object_id=0F1E2D3C-4B5A-4978-8695-A4B3C2D1E0F9", "core_object_id",
+                      Types::GUID_TYPE, Constraint::Equal, Variant(kGuid)},
+        ConditionCase{"UnregisteredKeyIsText", "no_such_key<=7", "no_such_key", Types::STRING,
+                      Constraint::LessOrEqual, Variant("7")},
+        ConditionCase{"EqualSignInTheValue", "core_event_text=a=b", "core_event_text", Types::STRING,
+                      Constraint::Equal, Variant("a=b")}),
+    [](auto const& info) { return std::string(info.param.name); });
+
+TEST(ConditionRejectTest, MalformedConditionsAreInvalidAndAddNothing) {
+    struct Bad {
+        char const* text;
+        char const* reason;
+    };
+    Bad const cases[] = {
+        {"core_contact_name", "needs an operator"},
+        {"=5", "needs a key"},
+        {"core_object_time>soon", "does not fit the key"},
+        {"core_object_type=2,x", "\"x\" does not fit the key"},
+        {"core_object_id=not-a-guid", "does not fit the key"},
+    };
+    for (Bad const& c : cases) {
+        ItemQuery query = contacts();
+        uError e = query.where(c.text);
+        EXPECT_EQ(e.code(), trelm::kInvalid) << c.text;
+        EXPECT_NE(e.toText().find(c.reason), std::string::npos) << c.text << ": " << e;
+        EXPECT_NE(e.toText().find(c.text), std::string::npos) << e;
+        trelm::IQueryItems::StartQueryMessage msg;
+        ASSERT_EQ(query.fill(msg).code(), trelm::kSuccess);
+        EXPECT_EQ(msg.constraints.size(), 1u) << c.text;
+    }
+}
+
+// The event cursors refuse to start without their exact ordering; friend requests want the
+// opposite sense; the FQL cursors of other kinds take none.
+TEST(ItemQueryTest, EachKindAsksForTheOrderingItsCursorServes) {
+    using Column = trelm::IQueryItems::Column;
+    using trelm::Metadata::Key;
+    Vector<Column> const events{{Key("core_object_time", Types::INT32), false},
+                                {Key("core_event_service", Types::STRING), false},
+                                {Key("core_event_serviceid", Types::STRING), false}};
+    Vector<Column> const requests{{Key("core_event_service", Types::STRING), true},
+                                  {Key("core_event_serviceid", Types::STRING), true}};
+    struct Expected {
+        char const* kind;
+        int type;
+        Vector<Column> ordering;
+    };
+    Expected const kinds[] = {
+        {"contacts", 2, {}},     {"status", 4, events},          {"photos", 5, events},
+        {"media", 9, {}},        {"messages", 10, events},       {"albums", 11, {}},
+        {"friend-requests", 12, requests}, {"photo-tags", 13, {}},
+    };
+    ASSERT_EQ(ItemQuery::kindNames().size(), std::size(kinds));
+    for (Expected const& k : kinds) {
+        ItemQuery::Kind const* kind = ItemQuery::findKind(k.kind);
+        ASSERT_NE(kind, nullptr) << k.kind;
+        trelm::IQueryItems::StartQueryMessage msg;
+        ASSERT_EQ(ItemQuery(*kind).fill(msg).code(), trelm::kSuccess);
+        EXPECT_EQ(msg.columns, k.ordering) << k.kind;
+        ASSERT_EQ(msg.constraints.size(), 1u);
+        EXPECT_EQ(msg.constraints[0].function, Constraint::Equal);
+        EXPECT_EQ(msg.constraints[0].value, Variant(k.type)) << k.kind;
+        EXPECT_EQ(msg.position, -1);
+    }
+}
+
+// A cursor over `rows` records {"n": i} that moves only by seek(1), like the stream cursor, and
+// can be told to fail reading one row.
+class StepCursor : public trelm::IQueryItems::ICursor {
+public:
+    StepCursor(int rows, int failAt) : rows_(rows), failAt_(failAt) {}
+
+    uError getSchema(Vector<trelm::IQueryItems::Column>&) override { return uError(); }
+    uError getRow(SmartPtr<Map<String, Variant>>& row) override {
+        if (rows_ == 0) {
+            row.reset();
+            return TRELM_ERROR(trelm::kNoData);
+        }
+        if (position_ == failAt_) return TRELM_ERROR(trelm::kServiceUnavailable);
+        row = trelm::makeSmart<Map<String, Variant>>();
+        return row->insert("n", Variant(position_));
+    }
+    uError getRows(unsigned, Vector<SmartPtr<Map<String, Variant>>>&) override {
+        return TRELM_ERROR(trelm::kNotSupported);
+    }
+    uError seek(int delta, int& moved) override {
+        if (delta != 1) return TRELM_ERROR(trelm::kNotSupported);
+        moved = position_ + 1 < rows_ ? 1 : 0;
+        position_ += moved;
+        return uError();
+    }
+    uError jumpBeginning() override {
+        position_ = 0;
+        return uError();
+    }
+    uError jumpEnd() override { return TRELM_ERROR(trelm::kNotSupported); }
+    uError jump(unsigned) override { return TRELM_ERROR(trelm::kNotSupported); }
+    uError curRow(unsigned&) override { return TRELM_ERROR(trelm::kNotSupported); }
+    uError numRows(unsigned&) override { return TRELM_ERROR(trelm::kNotSupported); }
+
+private:
+    int const rows_;
+    int const failAt_;
+    int position_ = 5;  // not at the beginning: the walk must go there itself
+};
+
+struct WalkCase {
+    char const* name;
+    int rows;
+    unsigned skip;
+    std::optional<unsigned> limit;
+    std::vector<int> listed;
+    unsigned code = trelm::kSuccess;
+    int failAt = -1;
+};
+
+void PrintTo(WalkCase const& c, std::ostream* os) { *os << c.name; }
+
+class WalkTest : public ::testing::TestWithParam<WalkCase> {};
+
+TEST_P(WalkTest, ListsTheRowsBetweenSkipAndLimit) {
+    WalkCase const& c = GetParam();
+    ItemQuery query = contacts();
+    query.skip = c.skip;
+    query.limit = c.limit;
+    StepCursor cursor(c.rows, c.failAt);
+    std::vector<ItemQuery::Record> rows;
+    EXPECT_EQ(query.walk(cursor, rows).code(), c.code);
+    std::vector<int> listed;
+    for (auto const& row : rows) listed.push_back(row.search("n")->asInt32());
+    EXPECT_EQ(listed, c.listed);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Walks, WalkTest,
+    ::testing::Values(WalkCase{"FirstPage", 5, 0, 3, {0, 1, 2}},
+                      WalkCase{"LimitBeyondTheEnd", 3, 0, 10, {0, 1, 2}},
+                      WalkCase{"SkipThenLimit", 10, 4, 3, {4, 5, 6}},
+                      WalkCase{"SkipToTheLastRow", 5, 4, std::nullopt, {4}},
+                      WalkCase{"SkipPastTheEnd", 5, 5, std::nullopt, {}},
+                      WalkCase{"EmptyResult", 0, 0, std::nullopt, {}},
+                      WalkCase{"ZeroLimit", 5, 0, 0u, {}},
+                      WalkCase{"FailureKeepsTheRowsBefore", 5, 0, std::nullopt, {0, 1},
+                               trelm::kServiceUnavailable, 2}),
+    [](auto const& info) { return std::string(info.param.name); });
+
+}  // namespace
