@@ -30,7 +30,7 @@ std::string kindList() {
 
 ItemCommands::ItemCommands(CLI::App& app, bool shell) {
     query_ = app.add_subcommand("query", "list items of the data source");
-    query_->add_option("type", type_, kindList())->required()->check(CLI::IsMember(ItemQuery::kindNames()));
+    query_->add_option("type", type_, "the kind of items: " + kindList())->required()->check(CLI::IsMember(ItemQuery::kindNames()));
     CLI::Option* limit = query_->add_option("--limit", limit_, "list at most N items")
                              ->default_val(kDefaultLimit)
                              ->check(CLI::NonNegativeNumber);

@@ -18,7 +18,7 @@ constexpr ItemQuery::Kind kKinds[] = {
     {"status", Metadata::Object::TYPE_STATUS, false},
     {"photos", Metadata::Object::TYPE_PHOTO_EVENT, false},
     {"media", Metadata::Object::TYPE_MEDIA, true},
-    {"messages", Metadata::Object::TYPE_MESSAGE, false},
+    {"messages", Metadata::Object::TYPE_MESSAGE, true},
     {"albums", Metadata::Object::TYPE_ALBUM, true},
     {"friend-requests", Metadata::Object::TYPE_FRIEND_REQUEST, true},
     {"photo-tags", Metadata::Object::TYPE_PHOTO_TAG, true},

@@ -33,7 +33,8 @@ public:
     struct Kind {
         char const* name;  // as typed: "contacts", "friend-requests", ...
         int type;          // "core_object_type"
-        // The cursor can count its rows (an FQL cursor); the stream and inbox cursors cannot.
+        // The cursor can count its rows: the FQL cursors with a counting statement, the inbox
+        // cursor from memory; the stream and photo-event cursors cannot.
         bool countable;
     };
 
