@@ -15,73 +15,31 @@ GUID const kGuid = [] {
     return g;
 }();
 
-// Runs the conversion into an out-parameter pre-set to a sentinel. On success `result` holds the
-// converted value; on failure `untouched` tells whether the sentinel survived.
-uError convert(Variant const& in, Target target, Variant& result, bool& untouched) {
-    uError e;
-    switch (target) {
-        case Target::Int: {
-            int out = -777;
-            e = in.as(out);
-            result = out;
-            untouched = out == -777;
-            break;
-        }
-        case Target::Int64: {
-            long long out = -777;
-            e = in.as(out);
-            result = out;
-            untouched = out == -777;
-            break;
-        }
-        case Target::UInt: {
-            unsigned out = 777;
-            e = in.as(out);
-            result = out;
-            untouched = out == 777;
-            break;
-        }
-        case Target::Bool: {
-            // Two runs so that either sentinel value would show a write.
-            bool out = true;
-            e = in.as(out);
-            bool out2 = false;
-            in.as(out2);
-            result = out;
-            untouched = out && !out2;
-            break;
-        }
-        case Target::Guid: {
-            GUID out = GUID::generate();
-            GUID const before = out;
-            e = in.as(out);
-            result = out;
-            untouched = out == before;
-            break;
-        }
-        case Target::Str: {
-            String out("sentinel");
-            e = in.as(out);
-            result = out;
-            untouched = out == "sentinel";
-            break;
-        }
-        case Target::IntList: {
-            Vector<int> out{-777};
-            e = in.as(out);
-            result = out;
-            untouched = out == Vector<int>{-777};
-            break;
-        }
-        case Target::StrList: {
-            Vector<String> out{"sentinel"};
-            e = in.as(out);
-            result = out;
-            untouched = out == Vector<String>{"sentinel"};
-            break;
-        }
-    }
+// Runs the conversion twice, into out-parameters pre-set to two different sentinels, so that any
+// write on refusal shows. On success `result` holds the converted value.
+template <class T>
+uError tryAs(Variant const& in, T first, T second, Variant& result, bool& untouched) {
+    T const a = first, b = second;
+    uError e = in.as(first);
+    in.as(second);
+    result = first;
+    untouched = first == a && second == b;
     return e;
+}
+
+uError convert(Variant const& in, Target target, Variant& result, bool& untouched) {
+    switch (target) {
+        case Target::Int: return tryAs(in, -777, -778, result, untouched);
+        case Target::Int64: return tryAs(in, -777LL, -778LL, result, untouched);
+        case Target::UInt: return tryAs(in, 777u, 778u, result, untouched);
+        case Target::Bool: return tryAs(in, true, false, result, untouched);
+        case Target::Guid: return tryAs(in, GUID::generate(), GUID::generate(), result, untouched);
+        case Target::Str: return tryAs(in, String("sentinel"), String("other"), result, untouched);
+        case Target::IntList: return tryAs(in, Vector<int>{-777}, Vector<int>{}, result, untouched);
+        case Target::StrList:
+            return tryAs(in, Vector<String>{"sentinel"}, Vector<String>{}, result, untouched);
+    }
+    return uError();
 }
 
 struct ConversionCase {

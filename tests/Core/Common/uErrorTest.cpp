@@ -39,22 +39,16 @@ TEST(uErrorTest, FormatRendersTheWholeChainOuterFirst) {
     uError inner(kOutOfMemory, "node", "Core/Common/Include/trelm/Map", 31);
     uError middle(kInvalid, inner, "", "Core/Components/Source/FacebookSource/FacebookSource", 7);
     uError outer(kFailure, middle, nullptr, "Core/Libraries/trelmfacebook/loader", 46);
-    String text;
+    String text("trace: ");  // appended to, not replaced
     outer.format(text);
     EXPECT_EQ(text,
-              "0x80000001 at Core/Libraries/trelmfacebook/loader:46\n"
+              "trace: 0x80000001 at Core/Libraries/trelmfacebook/loader:46\n"
               "  caused by 0x80000004 at Core/Components/Source/FacebookSource/FacebookSource:7\n"
               "  caused by 0x80000010 at Core/Common/Include/trelm/Map:31: node");
     ASSERT_NE(outer.cause(), nullptr);
     ASSERT_NE(outer.cause()->cause(), nullptr);
     EXPECT_EQ(outer.cause()->cause()->code(), kOutOfMemory);
     EXPECT_EQ(outer.cause()->cause()->cause(), nullptr);
-}
-
-TEST(uErrorTest, FormatAppendsToExistingText) {
-    String text("trace: ");
-    uError(kNoData, "", "a/b", 2).format(text);
-    EXPECT_EQ(text, "trace: 0x00000001 at a/b:2");
 }
 
 TEST(uErrorTest, CopiesShareTheCauseAndSurviveTheOriginal) {
