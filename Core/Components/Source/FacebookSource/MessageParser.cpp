@@ -11,17 +11,15 @@ constexpr char const* kTid = ".mailbox_getThreadMessages_response.message.tid";
 }  // namespace
 
 MessageParser::MessageParser(Vector<FacebookLibrary::MessageObj>& messages, String const& context)
-    : context_(context), messages_(&messages) {}
+    : ServiceAnswerParser(kRoot), context_(context), messages_(&messages) {}
 
 MessageParser::~MessageParser() = default;
 
 uError MessageParser::parse(String const& xml) {
-    depth_ = 0;
     appended_ = 0;
-    errorCode_ = String();
     timeSent_ = String();
     attachment_ = String();
-    return runParser(xml);
+    return runAnswer(xml);
 }
 
 FacebookLibrary::MessageObj* MessageParser::current() {
@@ -29,9 +27,7 @@ FacebookLibrary::MessageObj* MessageParser::current() {
     return &(*messages_)[messages_->size() - 1];
 }
 
-uError MessageParser::start(String const& name, Vector<String> const&) {
-    if (depth_ == 0 && name != kRoot && name != "error_response") return TRELM_ERROR(kFailure);
-    ++depth_;
+uError MessageParser::answerStart(String const&) {
     if (path() == kMessage) {
         FacebookLibrary::MessageObj message;
         message.context = context_;
@@ -43,7 +39,7 @@ uError MessageParser::start(String const& name, Vector<String> const&) {
     return TRELM_OK();
 }
 
-uError MessageParser::end(String const& name) {
+uError MessageParser::answerEnd(String const& name) {
     String const& at = path();
     if (name == "time_sent" && at == kMessage) {
         if (FacebookLibrary::MessageObj* message = current()) message->timeSent = std::atoi(timeSent_.cStr());
@@ -51,19 +47,12 @@ uError MessageParser::end(String const& name) {
         if (FacebookLibrary::MessageObj* message = current()) {
             message->hasAttachment = attachment_ == "true" || std::atoi(timeSent_.cStr()) != 0;
         }
-    } else if (name == "code" && at == ".error_response") {
-        return FacebookLibrary::resolveBaseFacebookErrorCode(errorCode_);
     }
-    --depth_;
     return TRELM_OK();
 }
 
-uError MessageParser::chars(String const& text) {
+uError MessageParser::answerChars(String const& text) {
     String const& at = path();
-    if (at == ".error_response.code") {
-        errorCode_ += text;
-        return TRELM_OK();
-    }
     FacebookLibrary::MessageObj* message = current();
     if (message == nullptr) return TRELM_OK();
     // First match wins. The second thread-id test never matches, so attachment_ stays empty; the

@@ -1,9 +1,9 @@
 #pragma once
 
 #include "FacebookLibrary.h"
+#include "ServiceAnswerParser.h"
 #include "trelm/String.h"
 #include "trelm/Vector.h"
-#include "trelm/XMLParser.h"
 #include "trelm/uError.h"
 
 namespace trelm {
@@ -24,7 +24,7 @@ namespace trelm {
 // Records appended before a failure stay.
 //
 // Lifetime: `messages` must outlive the parser. Thread safety: one thread at a time.
-class MessageParser : public XMLParser {
+class MessageParser : public ServiceAnswerParser {
 public:
     MessageParser(Vector<FacebookLibrary::MessageObj>& messages, String const& context);
     ~MessageParser() override;
@@ -32,9 +32,9 @@ public:
     uError parse(String const& xml);
 
 protected:
-    uError start(String const& name, Vector<String> const& attributes) override;
-    uError end(String const& name) override;
-    uError chars(String const& text) override;
+    uError answerStart(String const& name) override;
+    uError answerEnd(String const& name) override;
+    uError answerChars(String const& text) override;
 
 private:
     // The record being read; null before the first message of this parse.
@@ -43,9 +43,7 @@ private:
     // Constant after construction.
     String const context_;
     // State of one parse.
-    unsigned depth_ = 0;
     unsigned appended_ = 0;  // records this parse appended
-    String errorCode_;
     String timeSent_;
     String attachment_;
     Vector<FacebookLibrary::MessageObj>* messages_;

@@ -1,8 +1,7 @@
 #pragma once
 
+#include "ServiceAnswerParser.h"
 #include "trelm/String.h"
-#include "trelm/Vector.h"
-#include "trelm/XMLParser.h"
 #include "trelm/uError.h"
 
 namespace trelm {
@@ -14,7 +13,7 @@ namespace trelm {
 // translation (FacebookLibrary::resolveBaseFacebookErrorCode); any other root gives kFailure.
 //
 // Lifetime: `photoId` must outlive the parser. Thread safety: one thread at a time.
-class PhotoUploadParser : public XMLParser {
+class PhotoUploadParser : public ServiceAnswerParser {
 public:
     explicit PhotoUploadParser(String& photoId);
     ~PhotoUploadParser() override;
@@ -23,14 +22,9 @@ public:
     uError parse(String const& xml);
 
 protected:
-    uError start(String const& name, Vector<String> const& attributes) override;
-    uError end(String const& name) override;
-    uError chars(String const& text) override;
+    uError answerChars(String const& text) override;
 
 private:
-    // State of one parse.
-    unsigned depth_ = 0;
-    String errorCode_;
     String* photoId_;
 };
 

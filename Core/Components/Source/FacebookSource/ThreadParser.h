@@ -1,9 +1,9 @@
 #pragma once
 
 #include "FacebookLibrary.h"
+#include "ServiceAnswerParser.h"
 #include "trelm/String.h"
 #include "trelm/Vector.h"
-#include "trelm/XMLParser.h"
 #include "trelm/uError.h"
 
 namespace trelm {
@@ -17,7 +17,7 @@ namespace trelm {
 // that can't grow gives kOutOfMemory. Records appended before a failure stay.
 //
 // Lifetime: `threads` must outlive the parser. Thread safety: one thread at a time.
-class ThreadParser : public XMLParser {
+class ThreadParser : public ServiceAnswerParser {
 public:
     explicit ThreadParser(Vector<FacebookLibrary::ThreadObj>& threads);
     ~ThreadParser() override;
@@ -25,18 +25,16 @@ public:
     uError parse(String const& xml);
 
 protected:
-    uError start(String const& name, Vector<String> const& attributes) override;
-    uError end(String const& name) override;
-    uError chars(String const& text) override;
+    uError answerStart(String const& name) override;
+    uError answerEnd(String const& name) override;
+    uError answerChars(String const& text) override;
 
 private:
     // The record being read; null before the first thread of this parse.
     FacebookLibrary::ThreadObj* current();
 
     // State of one parse.
-    unsigned depth_ = 0;
     unsigned appended_ = 0;  // records this parse appended
-    String errorCode_;
     String lastUpdate_;
     Vector<FacebookLibrary::ThreadObj>* threads_;
 };
