@@ -2,6 +2,7 @@
 // that build signed calls the way the client does.
 #pragma once
 
+#include <expat.h>
 #include <gtest/gtest.h>
 
 #include <atomic>
@@ -21,6 +22,14 @@ inline std::string elementText(const std::string& body, const std::string& name)
     std::smatch m;
     if (std::regex_search(body, m, std::regex("<" + name + ">([^<]*)</" + name + ">"))) return m[1];
     return {};
+}
+
+// Whether `body` is a whole, well-formed XML document.
+inline bool wellFormed(const std::string& body) {
+    XML_Parser p = XML_ParserCreate(nullptr);
+    const bool ok = XML_Parse(p, body.data(), static_cast<int>(body.size()), 1) == XML_STATUS_OK;
+    XML_ParserFree(p);
+    return ok;
 }
 
 // Members are public so that table cases (lambdas) can build their requests with them.

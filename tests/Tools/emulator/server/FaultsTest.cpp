@@ -1,6 +1,4 @@
 // Injected faults, seen by a real client over loopback.
-#include <expat.h>
-
 #include <chrono>
 
 #include "EmulatorFixture.h"
@@ -73,13 +71,6 @@ TEST_F(FaultsTest, SeededProbabilityRepeatsItsPattern) {
     EXPECT_EQ(pattern(), first);
     EXPECT_NE(first.find('x'), std::string::npos) << first;
     EXPECT_NE(first.find('.'), std::string::npos) << first;
-}
-
-bool wellFormed(const std::string& body) {
-    XML_Parser p = XML_ParserCreate(nullptr);
-    const bool ok = XML_Parse(p, body.data(), static_cast<int>(body.size()), 1) == XML_STATUS_OK;
-    XML_ParserFree(p);
-    return ok;
 }
 
 TEST_F(FaultsTest, TransportFaultsReachTheClientAsTransportFailures) {

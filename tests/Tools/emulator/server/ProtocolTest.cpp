@@ -1,6 +1,4 @@
 // The emulator's protocol over real loopback HTTP and HTTPS with libcurl.
-#include <expat.h>
-
 #include <chrono>
 #include <functional>
 
@@ -9,14 +7,14 @@
 namespace emu::test {
 namespace {
 
-bool wellFormed(const std::string& body) {
-    XML_Parser p = XML_ParserCreate(nullptr);
-    const bool ok = XML_Parse(p, body.data(), static_cast<int>(body.size()), 1) == XML_STATUS_OK;
-    XML_ParserFree(p);
-    return ok;
-}
-
 using ProtocolTest = EmulatorFixture;
+
+// A signed query call changed by `change`, then signed again with the session secret.
+Fields resigned(ProtocolTest& t, const std::function<void(Fields&)>& change) {
+    Fields f = t.fqlCall();
+    change(f);
+    return sign(f, t.session.secret);
+}
 
 struct ErrorCase {
     const char* name;
@@ -38,27 +36,11 @@ TEST_F(ProtocolTest, EachInvalidRequestGetsItsErrorDocument) {
          104},
         {"signed with the application secret instead of the session's", false,
          [](ProtocolTest& t) { return sign(t.fqlCall(), DemoAccount::appSecret); }, 104},
-        {"unknown api_key", false,
-         [](ProtocolTest& t) {
-             auto f = t.fqlCall();
-             f["api_key"] = "0123";
-             return sign(f, t.session.secret);
-         },
+        {"unknown api_key", false, [](ProtocolTest& t) { return resigned(t, [](Fields& f) { f["api_key"] = "0123"; }); },
          101},
-        {"missing api_key", false,
-         [](ProtocolTest& t) {
-             auto f = t.fqlCall();
-             f.erase("api_key");
-             return sign(f, t.session.secret);
-         },
+        {"missing api_key", false, [](ProtocolTest& t) { return resigned(t, [](Fields& f) { f.erase("api_key"); }); },
          101},
-        {"missing method", false,
-         [](ProtocolTest& t) {
-             auto f = t.fqlCall();
-             f.erase("method");
-             return sign(f, t.session.secret);
-         },
-         3},
+        {"missing method", false, [](ProtocolTest& t) { return resigned(t, [](Fields& f) { f.erase("method"); }); }, 3},
         {"unknown method", false, [](ProtocolTest& t) { return t.sessionCall("facebook.photos.delete"); }, 3},
         {"missing session", false,
          [](ProtocolTest& t) { return t.appCall("facebook.fql.query", {{"query", kFql}}); }, 102},
