@@ -21,20 +21,28 @@ namespace {
 using test::LoopbackServer;
 using test::TempDir;
 
-// One POST through `request`; returns the sendRequest result and fills status and body when the
-// exchange completed.
-uError post(HttpRequest& request, std::string const& url, Map<String, String> const& fields,
-            int& status, std::string& body, SmartPtr<InputDataStream> upload = {}) {
-    uError e = request.setup(String(url));
-    if (e.ok()) e = request.setPostData(fields);
-    if (e.ok() && upload) e = request.setUploadData(upload);
-    if (e.ok()) e = request.sendRequest();
-    if (e.failed()) return e;
+// One POST through `request`: the sendRequest result, and status and body when the exchange
+// completed.
+struct Posted {
+    uError err;
+    int status = 0;
+    std::string body;
+};
+
+Posted post(HttpRequest& request, std::string const& url, Map<String, String> const& fields,
+            SmartPtr<InputDataStream> upload = {}) {
+    Posted out;
+    out.err = request.setup(String(url));
+    if (out.err.ok()) out.err = request.setPostData(fields);
+    if (out.err.ok() && upload) out.err = request.setUploadData(upload);
+    if (out.err.ok()) out.err = request.sendRequest();
+    if (out.err.failed()) return out;
     String data;
-    EXPECT_EQ(request.getResponseCode(status).code(), kSuccess);
+    EXPECT_EQ(request.getResponseCode(out.status).code(), kSuccess);
     EXPECT_EQ(request.getResponseData(data).code(), kSuccess);
-    body = data.str();
-    return request.disconnect();
+    out.body = data.str();
+    out.err = request.disconnect();
+    return out;
 }
 
 SmartPtr<HttpRequest> newRequest(HttpRequestFactory& factory) {
@@ -59,9 +67,7 @@ TEST_P(HttpStatusTest, StatusReachesCallerAsSent) {
     HttpRequestFactory factory;
     ASSERT_EQ(factory.setTimeoutMs(5000).code(), kSuccess);
     SmartPtr<HttpRequest> r = newRequest(factory);
-    int status = 0;
-    std::string body;
-    uError e = post(*r, server.url("/status/" + std::to_string(GetParam().sent)), {}, status, body);
+    auto [e, status, body] = post(*r, server.url("/status/" + std::to_string(GetParam().sent)), {});
     if (GetParam().completes) {
         ASSERT_EQ(e.code(), kSuccess) << e;
         EXPECT_EQ(status, GetParam().sent);
@@ -88,9 +94,7 @@ TEST(HttpRequestTest, FormFieldsArriveIntact) {
         {"lines", "one\r\ntwo\n"},
     };
     HttpRequest r;  // default settings, private connections
-    int status = 0;
-    std::string body;
-    ASSERT_EQ(post(r, server.url("/echo"), fields, status, body).code(), kSuccess);
+    ASSERT_EQ(post(r, server.url("/echo"), fields).err.code(), kSuccess);
     auto seen = server.requests();
     ASSERT_EQ(seen.size(), 1u);
     EXPECT_EQ(seen[0].contentType, "application/x-www-form-urlencoded");
@@ -116,11 +120,10 @@ TEST(HttpRequestTest, MultipartUploadArrivesWhole) {
     LoopbackServer server;
     HttpRequestFactory factory;
     SmartPtr<HttpRequest> r = newRequest(factory);
-    int status = 0;
-    std::string body;
     Map<String, String> fields{{"method", "photos.upload"}, {"caption", "See & say \xE2\x98\xBA"}, {"aid", ""}};
-    ASSERT_EQ(post(*r, server.url("/echo"), fields, status, body, upload).code(), kSuccess);
-    EXPECT_EQ(status, 200);
+    Posted answer = post(*r, server.url("/echo"), fields, upload);
+    ASSERT_EQ(answer.err.code(), kSuccess);
+    EXPECT_EQ(answer.status, 200);
 
     auto seen = server.requests();
     ASSERT_EQ(seen.size(), 1u);
@@ -140,9 +143,7 @@ TEST(HttpRequestTest, UnreadableUploadFailsWithoutSendingAnything) {
     auto upload = makeSmart<InputDataStream>();
     ASSERT_EQ(upload->setUri("/nonexistent/dir/photo.jpg").code(), kSuccess);
     HttpRequest r;
-    int status = 0;
-    std::string body;
-    EXPECT_EQ(post(r, server.url("/echo"), {{"a", "b"}}, status, body, upload).code(), kFailure);
+    EXPECT_EQ(post(r, server.url("/echo"), {{"a", "b"}}, upload).err.code(), kFailure);
     EXPECT_TRUE(server.requests().empty());
 }
 
@@ -151,9 +152,7 @@ TEST(HttpRequestTest, ServerThatNeverAnswersIsCutOffByTimeout) {
     HttpRequestFactory factory;
     ASSERT_EQ(factory.setTimeoutMs(300).code(), kSuccess);
     SmartPtr<HttpRequest> r = newRequest(factory);
-    int status = 0;
-    std::string body;
-    uError e = post(*r, server.url("/hang"), {}, status, body);
+    uError e = post(*r, server.url("/hang"), {}).err;
     EXPECT_EQ(e.code(), kFailure);
     EXPECT_NE(e.message().str().find("timed out"), std::string::npos) << e;
     server.release();
@@ -198,10 +197,9 @@ TEST_P(ConnectionReuseTest, RequestsOfOneFactoryShareOneConnectionAcrossDisconne
     factory.setCaFile(String(files_.caCertPath));
     for (int i = 0; i < 3; ++i) {
         SmartPtr<HttpRequest> r = newRequest(factory);  // a new request object every time
-        int status = 0;
-        std::string body;
-        ASSERT_EQ(post(*r, server->url("/echo"), {{"echo", "x"}}, status, body).code(), kSuccess);
-        EXPECT_EQ(body, "x");
+        Posted answer = post(*r, server->url("/echo"), {{"echo", "x"}});
+        ASSERT_EQ(answer.err.code(), kSuccess);
+        EXPECT_EQ(answer.body, "x");
     }
     auto seen = server->requests();
     ASSERT_EQ(seen.size(), 3u);
@@ -216,9 +214,7 @@ TEST_P(ConnectionReuseTest, RequestsWithPrivateConnectionsConnectAgain) {
     settings.caFile = String(files_.caCertPath);
     for (int i = 0; i < 2; ++i) {
         HttpRequest r(settings, {});
-        int status = 0;
-        std::string body;
-        ASSERT_EQ(post(r, server->url("/echo"), {}, status, body).code(), kSuccess);
+        ASSERT_EQ(post(r, server->url("/echo"), {}).err.code(), kSuccess);
     }
     auto seen = server->requests();
     ASSERT_EQ(seen.size(), 2u);
@@ -246,10 +242,9 @@ TEST_F(HttpsTest, ServiceHostNameIsSentToLoopbackOverPlainAndTls) {
 
     for (char const* url : {"http://api.facebook.com/echo", "https://api.facebook.com/echo"}) {
         SmartPtr<HttpRequest> r = newRequest(factory);
-        int status = 0;
-        std::string body;
-        ASSERT_EQ(post(*r, url, {{"echo", url}}, status, body).code(), kSuccess) << url;
-        EXPECT_EQ(body, url);
+        Posted answer = post(*r, url, {{"echo", url}});
+        ASSERT_EQ(answer.err.code(), kSuccess) << url;
+        EXPECT_EQ(answer.body, url);
     }
     ASSERT_EQ(plain.requests().size(), 1u);
     ASSERT_EQ(tls.requests().size(), 1u);
@@ -277,9 +272,7 @@ TEST_F(HttpsTest, UntrustedOrMisnamedCertificateIsRefused) {
         factory.setCaFile(String(c.caFile));
         factory.setConnectTo({String(c.connectTo)});
         SmartPtr<HttpRequest> r = newRequest(factory);
-        int status = 0;
-        std::string body;
-        EXPECT_EQ(post(*r, c.url, {{"password", "secret"}}, status, body).code(), kFailure) << c.what;
+        EXPECT_EQ(post(*r, c.url, {{"password", "secret"}}).err.code(), kFailure) << c.what;
     }
     EXPECT_TRUE(tls.requests().empty());
 }
@@ -299,10 +292,8 @@ TEST_F(HttpsTest, ManyThreadsRunRequestsOfOneFactoryAtOnce) {
                 LoopbackServer& server = (i % 2 == 0) ? tls : plain;
                 std::string tag = std::to_string(t) + "-" + std::to_string(i);
                 SmartPtr<HttpRequest> r = newRequest(factory);
-                int status = 0;
-                std::string body;
-                if (post(*r, server.url("/echo"), {{"echo", String(tag)}}, status, body).failed() ||
-                    status != 200 || body != tag) {
+                Posted answer = post(*r, server.url("/echo"), {{"echo", String(tag)}});
+                if (answer.err.failed() || answer.status != 200 || answer.body != tag) {
                     ++wrong;
                 }
             }

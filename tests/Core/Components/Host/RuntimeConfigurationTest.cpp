@@ -71,23 +71,15 @@ TEST_F(RuntimeConfigurationTest, StoredValuesComeBackAsTextAndUnknownKeysStayEmp
               (Texts{"s1", "", "42", "-5000000000", "true", std::string("a\0b", 3), "-"}));
 }
 
-TEST_F(RuntimeConfigurationTest, StoringAgainReplacesAndResetForgetsOnlyNamedKeys) {
+TEST_F(RuntimeConfigurationTest, StoringAgainReplacesAndResetForgetsOnlyNamedKeysOfItsTag) {
     ASSERT_EQ(put("src", {{"a", Variant("1")}, {"b", Variant("2")}, {"c", Variant("3")}}).code(), kSuccess);
+    ASSERT_EQ(put("other", {{"a", Variant("100")}, {"b", Variant("200")}}).code(), kSuccess);
     ASSERT_EQ(put("src", {{"a", Variant("one")}}).code(), kSuccess);
     ASSERT_EQ(reset("src", {"b", "never-stored"}).code(), kSuccess);
     EXPECT_EQ(get("src", {"a", "b", "c"}), (Texts{"one", "-", "3"}));
-}
+    EXPECT_EQ(get("other", {"a", "b"}), (Texts{"100", "200"}));
 
-TEST_F(RuntimeConfigurationTest, TagsAreKeptApart) {
-    ASSERT_EQ(put("first", {{"user", Variant("100")}}).code(), kSuccess);
-    ASSERT_EQ(put("second", {{"user", Variant("200")}}).code(), kSuccess);
-    ASSERT_EQ(reset("first", {"user"}).code(), kSuccess);
-    EXPECT_EQ(get("first", {"user"}), (Texts{"-"}));
-    EXPECT_EQ(get("second", {"user"}), (Texts{"200"}));
-}
-
-TEST_F(RuntimeConfigurationTest, GetLeavesCallerValuesOfUnknownKeysAlone) {
-    Map<String, Variant> values{{"absent", Variant("caller's")}};
+    Map<String, Variant> values{{"absent", Variant("caller's")}};  // unknown keys keep the caller's value
     GetRuntimeConfigurationMessage msg("src", values);
     ASSERT_EQ(msg.send("RuntimeConfiguration").code(), kSuccess);
     EXPECT_EQ(values.search("absent")->asString(), "caller's");
