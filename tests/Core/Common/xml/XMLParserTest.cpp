@@ -6,8 +6,6 @@
 #include <string>
 #include <vector>
 
-#include "XmlFixtures.h"
-
 namespace trelm {
 namespace {
 
