@@ -2,8 +2,13 @@
 
 #include <gtest/gtest.h>
 
+#include <sys/wait.h>
+#include <unistd.h>
+
 #include <regex>
 #include <set>
+#include <thread>
+#include <vector>
 
 namespace trelm {
 namespace {
@@ -17,6 +22,61 @@ TEST(GUIDTest, GeneratedValuesAreDistinctAndInLowercaseCanonicalForm) {
         EXPECT_TRUE(std::regex_match(g.toString().str(), form)) << g.toString();
         EXPECT_TRUE(seen.insert(g).second) << "duplicate " << g;
     }
+}
+
+// Identifiers are derived in per-thread blocks; threads running at once, each through several
+// blocks, must still never meet.
+TEST(GUIDTest, ConcurrentThreadsNeverProduceTheSameValue) {
+    constexpr int kThreads = 4;
+    constexpr int kEach = 3000;
+    std::vector<std::vector<GUID>> made(kThreads);
+    std::vector<std::thread> threads;
+    for (int t = 0; t < kThreads; ++t) {
+        threads.emplace_back([&made, t] {
+            for (int i = 0; i < kEach; ++i) made[t].push_back(GUID::generate());
+        });
+    }
+    for (std::thread& th : threads) th.join();
+    std::set<GUID> seen;
+    for (auto const& list : made) {
+        for (GUID const& g : list) EXPECT_TRUE(seen.insert(g).second) << "duplicate " << g;
+    }
+    EXPECT_EQ(seen.size(), static_cast<std::size_t>(kThreads * kEach));
+}
+
+// A child process inherits the parent's half-used block; it must not hand out the identifiers
+// the parent is about to make.
+TEST(GUIDTest, ForkedChildDoesNotRepeatTheParentsNextValues) {
+    constexpr int kCount = 8;
+    (void)GUID::generate();  // the block is live when the process forks
+    int fds[2];
+    ASSERT_EQ(pipe(fds), 0);
+    pid_t const child = fork();
+    ASSERT_NE(child, -1);
+    if (child == 0) {
+        close(fds[0]);
+        for (int i = 0; i < kCount; ++i) {
+            GUID const g = GUID::generate();
+            if (write(fds[1], g.bytes().data(), g.bytes().size()) != 16) _exit(1);
+        }
+        _exit(0);
+    }
+    close(fds[1]);
+    std::set<GUID> parents;
+    for (int i = 0; i < kCount; ++i) parents.insert(GUID::generate());
+    int matches = 0;
+    int received = 0;
+    GUID::Bytes bytes;
+    while (read(fds[0], bytes.data(), bytes.size()) == 16) {
+        ++received;
+        matches += parents.count(GUID(bytes)) != 0;
+    }
+    close(fds[0]);
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
+    EXPECT_EQ(received, kCount);
+    EXPECT_EQ(matches, 0);
 }
 
 TEST(GUIDTest, TextRoundTripsAndUppercaseIsAccepted) {

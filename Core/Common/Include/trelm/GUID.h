@@ -22,7 +22,9 @@ public:
     GUID() noexcept = default;
     explicit GUID(Bytes const& bytes) noexcept : bytes_(bytes) {}
 
-    // A new random GUID (libuuid, version 4).
+    // A new GUID in the version 4 (random) layout, distinct from every other this process makes.
+    // The randomness comes from libuuid, one draw per block of identifiers per thread; the
+    // identifiers are unique, not unpredictable (one can be guessed from its neighbours).
     static GUID generate();
     // Parses the 8-4-4-4-12 hexadecimal form (either case). Anything else gives kInvalid and
     // leaves `out` untouched.
