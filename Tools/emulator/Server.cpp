@@ -108,7 +108,9 @@ void deliver(const httplib::Request& req, httplib::Response& res, HttpReply repl
     switch (reply.delivery) {
         case HttpReply::Delivery::Whole:
             res.status = reply.status;
-            res.set_content(std::move(reply.body), reply.contentType.c_str());
+            // set_content would copy the body; a fresh response has no headers to replace.
+            res.body = std::move(reply.body);
+            res.set_header("Content-Type", reply.contentType);
             return;
         case HttpReply::Delivery::Dropped: {
             // Shutting the socket down makes the library's write of the answer fail; it then closes

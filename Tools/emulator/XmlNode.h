@@ -2,6 +2,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -36,18 +37,33 @@ struct XmlNode {
     }
 };
 
-// Escapes &, <, >, " and ' for element text and attribute values.
-inline void appendEscaped(std::string& out, const std::string& text) {
-    for (char c : text) {
-        switch (c) {
+// Escapes &, <, >, " and ' for element text and attribute values. Runs of plain text are copied
+// whole: most answer text has nothing to escape.
+inline void appendEscaped(std::string& out, std::string_view text) {
+    std::size_t start = 0;
+    while (start < text.size()) {
+        const std::size_t special = text.find_first_of("&<>\"'", start);
+        if (special == std::string_view::npos) {
+            out.append(text.data() + start, text.size() - start);
+            return;
+        }
+        out.append(text.data() + start, special - start);
+        switch (text[special]) {
             case '&': out += "&amp;"; break;
             case '<': out += "&lt;"; break;
             case '>': out += "&gt;"; break;
             case '"': out += "&quot;"; break;
-            case '\'': out += "&apos;"; break;
-            default: out += c;
+            default: out += "&apos;"; break;
         }
+        start = special + 1;
     }
+}
+
+// About the size of `node` rendered (before escaping), to size the output once.
+inline std::size_t renderedSizeHint(const XmlNode& node) {
+    std::size_t size = 2 * node.name.size() + node.text.size() + 24;
+    for (const XmlNode& c : node.children) size += renderedSizeHint(c);
+    return size;
 }
 
 inline void renderNode(std::string& out, const XmlNode& node, bool root) {
@@ -75,7 +91,9 @@ inline void renderNode(std::string& out, const XmlNode& node, bool root) {
 
 // The whole document: XML declaration, then the root with the service's namespaces.
 inline std::string renderDocument(const XmlNode& root) {
-    std::string out = "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n";
+    std::string out;
+    out.reserve(renderedSizeHint(root) + 160);
+    out += "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n";
     renderNode(out, root, true);
     out += '\n';
     return out;
