@@ -39,9 +39,23 @@ protected:
     uError getSid(RecordPtr const& record, Metadata::Key& key, String& serviceId) override;
 
 private:
+    // An answer field, the record key it is copied to, and that key's registered type.
+    struct Field {
+        String rowField;
+        String recordKey;
+        TRELM_TYPES::TYPES type;
+    };
+
     // Set by derivedStart, constant afterwards.
+    // Fills fields_ and prototype_.
+    uError makePrototype();
+
     String baseCondition_;
     bool conditionGiven_ = false;  // baseCondition_ names the users; else the friends of the user
+    // The keys every contact record carries with the same value ("core_contact_service",
+    // "core_object_type" and the base fields): each record starts as a copy of this one.
+    Record prototype_;
+    Vector<Field> fields_;
 };
 
 }  // namespace trelm

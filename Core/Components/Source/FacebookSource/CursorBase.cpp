@@ -39,13 +39,18 @@ uError CursorBase::start() {
 }
 
 uError CursorBase::addBaseFields(RecordPtr& record) {
-    uError err = record->insert("core_object_source", Variant(sourceId_));
+    // Called for every converted row: the key texts are made once, not per call.
+    static String const sourceKey("core_object_source");
+    static String const deletedKey("core_object_deleted");
+    static String const importKey("core_object_origin_importcomponent");
+    static String const serviceKey("core_object_origin_servicename");
+    uError err = record->insert(sourceKey, Variant(sourceId_));
     if (err.failed()) return err;
-    err = record->insert("core_object_deleted", Variant(false));
+    err = record->insert(deletedKey, Variant(false));
     if (err.failed()) return err;
-    err = record->insert("core_object_origin_importcomponent", Variant(sourceId_));
+    err = record->insert(importKey, Variant(sourceId_));
     if (err.failed()) return err;
-    return record->insert("core_object_origin_servicename", Variant("Facebook"));
+    return record->insert(serviceKey, Variant("Facebook"));
 }
 
 }  // namespace trelm

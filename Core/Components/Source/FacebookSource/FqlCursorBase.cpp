@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <climits>
+#include <new>
 #include <utility>
 
 #include "MappingCache.h"
@@ -28,11 +29,13 @@ uError FacebookSource::FqlCursorBase::getRow(RecordPtr& row) {
         return TRELM_ERROR(kOutOfWindow);
     }
     // The host gets its own copy: the window's record is shared with the mapping cache and is
-    // replaced, not changed, by later refills.
-    RecordPtr copy = makeSmart<Record>();
-    for (auto const& [key, value] : *window_[position_]) {
-        err = copy->insert(key, value);
-        if (err.failed()) return err;
+    // replaced, not changed, by later refills. Copying the whole map at once copies its tree as
+    // it is, without a key search per entry.
+    RecordPtr copy;
+    try {
+        copy = makeSmart<Record>(*window_[position_]);
+    } catch (std::bad_alloc const&) {
+        return TRELM_ERROR(kOutOfMemory);
     }
     row = std::move(copy);
     return TRELM_OK();
@@ -302,6 +305,7 @@ uError FacebookSource::FqlCursorBase::convertItems(Vector<Map<String, String>> c
 
     err = clearWindow();
     if (err.failed()) return err;
+    static String const objectIdKey("core_object_id");
     for (RecordPtr& record : fresh) {
         Metadata::Key key;
         String serviceId;
@@ -310,7 +314,7 @@ uError FacebookSource::FqlCursorBase::convertItems(Vector<Map<String, String>> c
         GUID guid;
         err = cache_->getGuid(tag_, MappingCache::SidMapKey(key, serviceId), true, guid);
         if (err.failed()) return err;
-        err = record->insert("core_object_id", Variant(guid));
+        err = record->insert(objectIdKey, Variant(guid));
         if (err.failed()) return err;
         err = cache_->setItem(tag_, key, record);
         if (err.failed()) return err;
@@ -331,11 +335,17 @@ void FacebookSource::FqlCursorBase::setEmptyResult() {
 
 uError FacebookSource::FqlCursorBase::copyField(Map<String, String> const& row, String const& field,
                                                 String const& recordKey, RecordPtr& record) {
-    String const* text = row.search(field);
-    if (text == nullptr) return TRELM_OK();
     TRELM_TYPES::TYPES type = TRELM_TYPES::STRING;
     Metadata::getType(recordKey, type);  // an unregistered key is kept as text
-    Variant value(*text);
+    return copyField(row, field, recordKey, type, record);
+}
+
+uError FacebookSource::FqlCursorBase::copyField(Map<String, String> const& row, String const& field,
+                                                String const& recordKey, TRELM_TYPES::TYPES type,
+                                                RecordPtr& record) {
+    String const* text = row.search(field);
+    if (text == nullptr) return TRELM_OK();
+    Variant value;
     uError err;
     switch (type) {
         case TRELM_TYPES::UINT32: {
@@ -364,10 +374,11 @@ uError FacebookSource::FqlCursorBase::copyField(Map<String, String> const& row, 
             break;
         }
         default:
+            value = *text;
             break;
     }
     if (err.failed()) return TRELM_WRAP_MSG(kInvalid, err, "field " + field + " does not convert");
-    return record->insert(recordKey, value);
+    return record->insert(recordKey, std::move(value));
 }
 
 uError FacebookSource::FqlCursorBase::ensureLoaded() {

@@ -103,6 +103,10 @@ protected:
     // conversion's error) for a text that does not convert.
     static uError copyField(Map<String, String> const& row, String const& field, String const& recordKey,
                             RecordPtr& record);
+    // The same with the key's type already known (a cursor that converts many rows looks the
+    // types of its keys up once).
+    static uError copyField(Map<String, String> const& row, String const& field, String const& recordKey,
+                            TRELM_TYPES::TYPES type, RecordPtr& record);
 
 private:
     // Loads the first window when nothing has been loaded yet.

@@ -4,9 +4,6 @@
 
 namespace trelm {
 
-namespace {
-char const* const kObjectIdKey = "core_object_id";
-}  // namespace
 
 FacebookSource::MappingCache::MappingCache() = default;
 
@@ -37,42 +34,41 @@ uError FacebookSource::MappingCache::getTag(String& tag) {
 
 uError FacebookSource::MappingCache::getGuid(String const& tag, SidMapKey const& key, bool create, GUID& guid) {
     TRELM_CACHE_LOCK(lock);
-    Set<SidMapKey>* tagSet = tagSids_.search(tag);
-    bool const tagHeld = tagSet != nullptr && tagSet->contains(key);
-
-    SidMapValue value;
-    if (SidMapValue const* found = sidMap_.search(key)) {
-        value = *found;
-        if (!tagHeld) ++value.refCount;
-    } else if (create) {
-        value.guid = GUID::generate();
-        value.refCount = 1;
-    } else {
-        return TRELM_ERROR(kNotFound);
-    }
+    SidMapValue* found = sidMap_.search(key);
+    if (found == nullptr && !create) return TRELM_ERROR(kNotFound);
 
     // The tag's set is updated first: if it cannot grow, sidMap_ is still as it was and the
-    // counts stay consistent.
-    if (!tagHeld) {
-        if (tagSet == nullptr) {
-            Set<SidMapKey> fresh;
-            uError err = fresh.insert(key);
-            if (err.failed()) return err;
-            err = tagSids_.insert(tag, std::move(fresh));
-            if (err.failed()) return err;
-        } else {
-            uError err = tagSet->insert(key);
-            if (err.failed()) return err;
-        }
+    // counts stay consistent. A key that sidMap_ lacks is in no tag's set, so for a new key the
+    // insertion always adds it; for a known one the set's size tells whether the tag held it.
+    Set<SidMapKey>* tagSet = tagSids_.search(tag);
+    bool added = true;
+    if (tagSet == nullptr) {
+        Set<SidMapKey> fresh;
+        uError err = fresh.insert(key);
+        if (err.failed()) return err;
+        err = tagSids_.insert(tag, std::move(fresh));
+        if (err.failed()) return err;
+    } else {
+        unsigned const before = tagSet->size();
+        uError err = tagSet->insert(key);
+        if (err.failed()) return err;
+        added = tagSet->size() != before;
     }
+
+    if (found != nullptr) {
+        if (added) ++found->refCount;
+        guid = found->guid;
+        return TRELM_OK();
+    }
+    SidMapValue value;
+    value.guid = GUID::generate();
+    value.refCount = 1;
     uError err = sidMap_.insert(key, value);
     if (err.failed()) {
         // Undo the tag's membership so that no tag holds a key that sidMap_ lacks.
-        if (!tagHeld) {
-            Set<SidMapKey>* set = tagSids_.search(tag);
-            set->remove(key);
-            if (set->empty()) tagSids_.remove(tag);
-        }
+        Set<SidMapKey>* set = tagSids_.search(tag);
+        set->remove(key);
+        if (set->empty()) tagSids_.remove(tag);
         return err;
     }
     guid = value.guid;
@@ -83,7 +79,8 @@ uError FacebookSource::MappingCache::setItem(String const& tag, Metadata::Key co
                                              SmartPtr<Map<String, Variant>> const& item) {
     TRELM_CACHE_LOCK(lock);
     if (!item) return TRELM_ERROR_MSG(kInvalid, "null record");
-    Variant const* idValue = item->search(kObjectIdKey);
+    static String const objectIdKey("core_object_id");
+    Variant const* idValue = item->search(objectIdKey);
     if (idValue == nullptr) return TRELM_ERROR_MSG(kInvalid, "record without core_object_id");
     GUID guid;
     uError err = idValue->as(guid);

@@ -53,9 +53,11 @@ public:
         SidMapKey(Metadata::Key const& key, String const& sid) : key(key), sid(sid) {}
 
         friend bool operator<(SidMapKey const& a, SidMapKey const& b) {
-            if (a.key.name() < b.key.name()) return true;
-            if (a.key.name() == b.key.name()) return a.sid < b.sid;
-            return false;
+            // One pass over the names (usually equal: one kind of id per cursor), the same
+            // byte order as String's operator<.
+            int const byName = a.key.name().view().compare(b.key.name().view());
+            if (byName != 0) return byName < 0;
+            return a.sid < b.sid;
         }
         friend bool operator==(SidMapKey const& a, SidMapKey const& b) {
             return a.key.name() == b.key.name() && a.sid == b.sid;
