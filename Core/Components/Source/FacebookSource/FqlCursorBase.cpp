@@ -175,15 +175,8 @@ uError FacebookSource::FqlCursorBase::curRow(unsigned& index) {
         index = position_;
         return TRELM_OK();
     }
-    String query;
-    err = generateBaseQuery("''", window_[position_], kUpTo, false, query);
-    if (err.failed()) return err;
-    String type;
-    err = getObjectType(type);
-    if (err.failed()) return err;
-    Vector<Map<String, String>> rows;
     unsigned total = 0;
-    err = library_->runFqlQuery(query, type, rows, 0, total);
+    err = countRows(window_[position_], kUpTo, total);
     if (err.failed()) return err;
     if (total == 0) return TRELM_ERROR_MSG(kNoData, "the current record is no longer in the result");
     index = total - 1;
@@ -195,20 +188,25 @@ uError FacebookSource::FqlCursorBase::numRows(unsigned& count) {
         count = rowCount_;
         return TRELM_OK();
     }
-    String query;
-    uError err = generateBaseQuery("''", RecordPtr(), kAfter, false, query);
-    if (err.failed()) return err;
-    String type;
-    err = getObjectType(type);
-    if (err.failed()) return err;
-    Vector<Map<String, String>> rows;
     unsigned total = 0;
-    err = library_->runFqlQuery(query, type, rows, 0, total);
+    uError err = countRows(RecordPtr(), kAfter, total);
     if (err.failed()) return err;
     rowCount_ = total;
     rowCountKnown_ = true;
     count = total;
     return TRELM_OK();
+}
+
+uError FacebookSource::FqlCursorBase::countRows(RecordPtr const& key, Direction direction, unsigned& total) {
+    String query;
+    uError err = generateBaseQuery("''", key, direction, false, query);
+    if (err.failed()) return err;
+    String type;
+    err = getObjectType(type);
+    if (err.failed()) return err;
+    Vector<Map<String, String>> rows;
+    total = 0;
+    return library_->runFqlQuery(query, type, rows, 0, total);
 }
 
 uError FacebookSource::FqlCursorBase::refreshWindow(RecordPtr const& key, unsigned offset, unsigned count,

@@ -111,6 +111,9 @@ protected:
 private:
     // Loads the first window when nothing has been loaded yet.
     uError ensureLoaded();
+    // Runs the counting statement (field list '' and no ORDER BY) for the rows `direction` gives
+    // from `key` (null: the whole result) and reports how many the service answered.
+    uError countRows(RecordPtr const& key, Direction direction, unsigned& total);
     uError seekUnpaged(int delta, int& moved);
     // Empties the window and releases its records in the cache.
     uError clearWindow();
