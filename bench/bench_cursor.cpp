@@ -74,11 +74,11 @@ public:
 
         emu::Session session = emulator_->loginDemo();
         trelm::Configuration::Group group("facebook");
-        group.set("facebook_source_appkey", trelm::Variant(emu::DemoAccount::apiKey));
-        group.set("facebook_source_appsecret", trelm::Variant(emu::DemoAccount::appSecret));
-        group.set("facebook_source_session_user", trelm::Variant(String::from(static_cast<long long>(session.uid))));
-        group.set("facebook_source_session_id", trelm::Variant(String(session.key)));
-        group.set("facebook_source_session_secret", trelm::Variant(String(session.secret)));
+        check(group.set("facebook_source_appkey", trelm::Variant(emu::DemoAccount::apiKey)), "configure");
+        check(group.set("facebook_source_appsecret", trelm::Variant(emu::DemoAccount::appSecret)), "configure");
+        check(group.set("facebook_source_session_user", trelm::Variant(String::from(static_cast<long long>(session.uid)))), "configure");
+        check(group.set("facebook_source_session_id", trelm::Variant(String(session.key))), "configure");
+        check(group.set("facebook_source_session_secret", trelm::Variant(String(session.secret))), "configure");
         source_ = std::make_unique<trelm::FacebookSource>("facebook");
         check(registry_.add("facebook", source_.get()), "register source");
         check(source_->sendConfig(group), "configure source");
@@ -88,9 +88,10 @@ public:
     }
 
     ~Host() {
-        registry_.remove("facebook");
-        registry_.remove(trelm::RuntimeConfiguration::kName);
-        registry_.remove(trelm::HttpRequestFactory::kName);
+        // Tearing down: each was registered by the constructor, so removal finds it.
+        registry_.remove("facebook").ignore();
+        registry_.remove(trelm::RuntimeConfiguration::kName).ignore();
+        registry_.remove(trelm::HttpRequestFactory::kName).ignore();
         registry_.deactivate();
         source_.reset();
         emulator_->stop();
@@ -103,16 +104,16 @@ public:
             Constraint{trelm::Metadata::Key("core_object_type", trelm::TRELM_TYPES::INT32), trelm::Variant(2),
                        Constraint::Equal}};
         trelm::IQueryItems::StartQueryMessage msg(trelm::Vector<trelm::IQueryItems::Column>(), constraints);
-        if (uError err = source_->onMessage(msg); err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(source_->onMessage(msg));
         trelm::SmartPtr<trelm::IQueryItems::ICursor> cursor = msg.cursor;
         if (!cursor) return TRELM_ERROR(trelm::kFailure);
         rows = 0;
         for (int moved = 1; moved != 0;) {
             trelm::SmartPtr<trelm::Map<String, trelm::Variant>> row;
-            if (uError err = cursor->getRow(row); err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(cursor->getRow(row));
             benchmark::DoNotOptimize(row.get());
             ++rows;
-            if (uError err = cursor->seek(1, moved); err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(cursor->seek(1, moved));
         }
         return TRELM_OK();
     }

@@ -17,7 +17,8 @@ ComponentHost::~ComponentHost() {
 }
 
 void ComponentHost::destroy(Slot& slot) {
-    if (slot.registered) registry_.remove(slot.component->name());
+    // A registered slot is in the registry, so removal finds it.
+    if (slot.registered) registry_.remove(slot.component->name()).ignore();
     slot.registered = false;
     slot.component.reset();
 }
@@ -48,8 +49,7 @@ uError ComponentHost::startBuiltins(Map<String, Variant> const& http,
     uError e = registry_.add(http_.component->name(), http_.component.get());
     if (e.failed()) return TRELM_WRAP_MSG(kFailure, e, "cannot register HttpRequestFactory");
     http_.registered = true;
-    e = addBuiltin(*http_.component, http);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(addBuiltin(*http_.component, http));
 
     runtime_.component = std::make_unique<RuntimeConfiguration>();
     e = registry_.add(runtime_.component->name(), runtime_.component.get());
@@ -57,8 +57,7 @@ uError ComponentHost::startBuiltins(Map<String, Variant> const& http,
     runtime_.registered = true;
     Map<String, Variant> runtimeValues = runtime;
     if (!runtimeValues.contains("path")) {
-        e = runtimeValues.insert("path", Variant(runtimeStorePath));
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(runtimeValues.insert("path", Variant(runtimeStorePath)));
     }
     return addBuiltin(*runtime_.component, runtimeValues);
 }
@@ -70,12 +69,10 @@ uError ComponentHost::restore(HostConfig::ComponentEntry const& entry, Configura
     Map<String, Variant> stored;
     for (auto const& [key, value] : entry.config) {
         (void)value;
-        uError e = stored.insert(key, Variant());
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(stored.insert(key, Variant()));
     }
     for (String const& key : entry.runtimeKeys) {
-        uError e = stored.insert(key, Variant());
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(stored.insert(key, Variant()));
     }
     uError e = runtimeConfiguration().get(entry.name, stored);
     if (e.failed()) return e;

@@ -53,15 +53,14 @@ uError DemoTour::writeBuiltInPhoto(std::string const& folder, std::string& path)
 uError DemoTour::run(SourceClient& client, Printer& printer) {
     printer.step(1, "sign in");
     printer.finish();
-    uError e = client.open();
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(client.open());
 
     printer.step(2, "list the first " + std::to_string(options_.friends) + " friends of " +
                         client.sourceName().str());
     ItemQuery friends(*ItemQuery::findKind(Metadata::Object::TYPE_CONTACT));
     friends.limit = options_.friends;
     SourceClient::Listing listing;
-    e = client.query(friends, listing);
+    uError e = client.query(friends, listing);
     if (e.failed()) return TRELM_WRAP_MSG(kFailure, e, "listing the friends failed");
     for (std::size_t i = 0; i < listing.rows.size(); ++i) {
         printer.record(static_cast<unsigned>(i + 1), listing.rows[i]);
@@ -78,8 +77,7 @@ uError DemoTour::run(SourceClient& client, Printer& printer) {
 
     std::string photo = options_.photo;
     if (photo.empty()) {
-        e = writeBuiltInPhoto(stateFolder_, photo);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(writeBuiltInPhoto(stateFolder_, photo));
     }
     printer.step(4, "upload the photo " + photo);
     String photoId;

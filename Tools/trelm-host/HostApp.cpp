@@ -105,8 +105,7 @@ int HostApp::run(int argc, char const* const* argv) {
     }
     if (shell->parsed()) {
         return runWithSource(options, [&](SourceClient& client, Printer& printer, HostSession&) {
-            uError e = client.open();
-            if (e.failed()) return e;
+            TRELM_RETURN_IF_ERROR(client.open());
             int failures = HostShell(in_, out_, err_).run(client, printer);
             if (failures == 0) return TRELM_OK();
             return TRELM_ERROR_MSG(kFailure, std::to_string(failures) + " shell command(s) failed");

@@ -53,8 +53,7 @@ uError toVariant(json const& value, std::string const& origin, std::string const
             Vector<String> list;
             for (json const& item : value) {
                 if (!item.is_string()) return invalid(origin, where, "lists may hold strings only");
-                uError e = list.pushBack(String(item.get<std::string>()));
-                if (e.failed()) return e;
+                TRELM_RETURN_IF_ERROR(list.pushBack(String(item.get<std::string>())));
             }
             out = list;
             return TRELM_OK();
@@ -103,8 +102,7 @@ uError toComponent(json const& entry, std::string const& origin, std::string con
     if (e.ok()) e = requiredString(entry, "id", origin, where, out.id);
     if (e.failed()) return e;
     if (auto it = entry.find("config"); it != entry.end()) {
-        e = toValues(*it, origin, where + ".config", out.config);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(toValues(*it, origin, where + ".config", out.config));
     }
     out.runtimeKeys = HostConfig::defaultRuntimeKeys();
     if (auto it = entry.find("runtime_keys"); it != entry.end()) {
@@ -152,8 +150,7 @@ uError HostConfig::parse(std::string const& text, std::string const& origin, Hos
             for (std::size_t i = 0; i < value.size(); ++i) {
                 std::string where = key + "[" + std::to_string(i) + "]";
                 ComponentEntry entry;
-                e = toComponent(value[i], origin, where, entry);
-                if (e.failed()) return e;
+                TRELM_RETURN_IF_ERROR(toComponent(value[i], origin, where, entry));
                 if (!names.insert(entry.name).second) {
                     return invalid(origin, where,
                                    "a component named \"" + entry.name.str() + "\" already exists");

@@ -15,21 +15,18 @@ uError HostSession::open(Printer& printer) {
     uError e = StateDirectory::prepare(options_.stateDir, stateDir_);
     if (e.failed()) return e;
     if (!options_.configPath.empty()) {
-        e = HostConfig::load(options_.configPath, config_);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(HostConfig::load(options_.configPath, config_));
     }
 
     std::vector<std::string> paths = options_.plugins;
     if (paths.empty()) paths.push_back(PluginLoader::defaultPluginPath());
     for (std::string const& path : paths) {
-        e = plugins_.load(path);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(plugins_.load(path));
         printer.plugin(plugins_.plugins().back());
     }
 
     Map<String, Variant> http = config_.http();
-    e = prepareEndpoint(printer, http);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(prepareEndpoint(printer, http));
 
     e = host_.startBuiltins(http, config_.runtime(),
                             String(StateDirectory::runtimeStorePath(stateDir_)));
@@ -55,15 +52,12 @@ uError HostSession::prepareEndpoint(Printer& printer, Map<String, Variant>& http
     if (!options_.connectTo.empty()) {
         Vector<String> routes;
         for (std::string const& route : options_.connectTo) {
-            e = routes.pushBack(String(route));
-            if (e.failed()) return e;
+            TRELM_RETURN_IF_ERROR(routes.pushBack(String(route)));
         }
-        e = http.insert("connect_to", Variant(routes));
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(http.insert("connect_to", Variant(routes)));
     }
     if (!options_.caFile.empty()) {
-        e = http.insert("ca_file", Variant(String(options_.caFile)));
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(http.insert("ca_file", Variant(String(options_.caFile))));
     }
 
     Vector<String> routes;

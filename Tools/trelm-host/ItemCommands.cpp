@@ -86,8 +86,7 @@ uError ItemCommands::runQuery(SourceClient& client, Printer& printer) {
     if (kind == nullptr) return TRELM_ERROR_MSG(kInvalid, "unknown item type " + type_);
     ItemQuery query(*kind);
     for (std::string const& condition : where_) {
-        uError e = query.where(condition);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(query.where(condition));
     }
     query.skip = skip_;
     if (!all_) query.limit = limit_;

@@ -153,8 +153,7 @@ uError ItemQuery::where(std::string const& text) {
             Variant value;
             uError e = typedValue(type, item, value);
             if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "condition \"" + text + "\": \"" + item.str() + "\" does not fit the key");
-            e = type == TRELM_TYPES::INT32 ? numbers.pushBack(value.asInt32()) : texts.pushBack(item);
-            if (e.failed()) return e;
+            TRELM_RETURN_IF_ERROR(type == TRELM_TYPES::INT32 ? numbers.pushBack(value.asInt32()) : texts.pushBack(item));
             if (end == std::string::npos) break;
             begin = end + 1;
         }
@@ -188,8 +187,7 @@ uError ItemQuery::walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows) 
     if (e.failed()) return e;
     for (unsigned i = 0; i < skip; ++i) {
         int moved = 0;
-        e = cursor.seek(1, moved);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(cursor.seek(1, moved));
         if (moved <= 0) return TRELM_OK();  // fewer rows than were to be passed over
     }
     while (!limit || rows.size() < *limit) {
@@ -200,8 +198,7 @@ uError ItemQuery::walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows) 
         rows.push_back(*row);
         if (limit && rows.size() >= *limit) break;
         int moved = 0;
-        e = cursor.seek(1, moved);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(cursor.seek(1, moved));
         if (moved <= 0) break;
     }
     return TRELM_OK();

@@ -44,13 +44,12 @@ uError SourceClient::open() {
     signIn_.emplace(session_.host(), session_.loginListener(), *entry);
 
     bool stored = false;
-    uError e = signIn_->sessionStored(stored);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(signIn_->sessionStored(stored));
     if (!stored && signIn_->possible()) return signIn();
 
     // The source took the stored session (or its configured one) with its configuration.
     IServiceSource::GetUserSidMessage user;
-    e = user.send(name_);
+    uError e = user.send(name_);
     printer_.login(name_, e.code(), user.result, true);
     printer_.finish();
     return TRELM_OK();
@@ -86,20 +85,17 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
         result = Listing();
         cursor.reset();
         IQueryItems::StartQueryMessage msg;
-        uError step = query.fill(msg);
-        if (step.failed()) return step;
-        step = source_->startQuery(msg, true);
-        if (step.failed()) return step;
+        TRELM_RETURN_IF_ERROR(query.fill(msg));
+        TRELM_RETURN_IF_ERROR(source_->startQuery(msg, true));
         if (!msg.cursor) {
             return TRELM_ERROR_MSG(kFailure, name_ + " answered the query without a cursor");
         }
         cursor = msg.cursor;
-        step = query.walk(*cursor, result.rows);
+        uError step = query.walk(*cursor, result.rows);
         if (step.failed()) return step;
         if (query.kind().countable) {
             unsigned total = 0;
-            step = cursor->numRows(total);
-            if (step.failed()) return step;
+            TRELM_RETURN_IF_ERROR(cursor->numRows(total));
             result.total = total;
         }
         return TRELM_OK();

@@ -8,42 +8,34 @@ BaseSource::BaseSource(String const& name, String const& componentId)
 BaseSource::~BaseSource() = default;
 
 uError BaseSource::insert(Record& record) {
-    uError e = manageInputDataImpl(record, false);
-    if (e.failed()) return e;
-    e = insertData(record);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(manageInputDataImpl(record, false));
+    TRELM_RETURN_IF_ERROR(insertData(record));
     return postInsert(record);
 }
 
 uError BaseSource::update(Record& record) {
-    uError e = manageUpdateDataImpl(record, Record());
-    if (e.failed()) return e;
-    e = updateData(record);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(manageUpdateDataImpl(record, Record()));
+    TRELM_RETURN_IF_ERROR(updateData(record));
     return postUpdate(record);
 }
 
 uError BaseSource::remove(GUID const& guid, bool flag) {
-    uError e = removeData(guid, flag);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(removeData(guid, flag));
     return postRemove(guid);
 }
 
 uError BaseSource::markInvisible(GUID const& guid) {
-    uError e = markDataInvisible(guid);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(markDataInvisible(guid));
     return postMarkInvisible(guid);
 }
 
 uError BaseSource::retrieve(GUID const& guid, Record& record, bool flag) {
-    uError e = retrieveData(guid, record, flag);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(retrieveData(guid, record, flag));
     return modifyRetrievedData(record);
 }
 
 uError BaseSource::startQuery(IQueryItems::StartQueryMessage& msg, bool interactive) {
-    uError e = checkQuery(msg, interactive);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(checkQuery(msg, interactive));
     return doStartQuery(msg, interactive);
 }
 

@@ -31,10 +31,10 @@ uError Component::shutdown() {
 }
 
 uError Component::onMessage(IMessage& msg) {
-    uError pre = preMessageImpl(msg);
-    if (pre.failed()) return pre;
+    TRELM_RETURN_IF_ERROR(preMessageImpl(msg));
     uError result = handleMessage(msg);
-    postMessageImpl(msg, result);
+    // The hook observes the outcome; the message's own result is what the sender learns.
+    postMessageImpl(msg, result).ignore();
     return result;
 }
 

@@ -45,8 +45,12 @@ Component* ComponentRegistry::find(String const& name) const {
 Vector<String> ComponentRegistry::names() const {
     std::lock_guard<std::mutex> lock(mutex_);
     Vector<String> result;
-    result.reserve(static_cast<unsigned>(entries_.size()));
-    for (auto const& entry : entries_) result.pushBack(entry.first);
+    // Out of memory while listing yields the names gathered so far: a listing is a diagnostic
+    // and has no error channel.
+    if (result.reserve(static_cast<unsigned>(entries_.size())).failed()) return result;
+    for (auto const& entry : entries_) {
+        if (result.pushBack(entry.first).failed()) break;
+    }
     return result;
 }
 

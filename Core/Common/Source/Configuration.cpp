@@ -29,8 +29,7 @@ uError Group::get(String const& key, Vector<String>& out, Vector<String> const& 
     }
     if (value->type() == Variant::String) {
         Vector<String> single;
-        uError e = single.pushBack(value->asString());
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(single.pushBack(value->asString()));
         out = std::move(single);
         return TRELM_OK();
     }

@@ -8,8 +8,7 @@ FlatParseObj::~FlatParseObj() = default;
 
 uError FlatParseObj::parse(String const& xml, String& out) {
     text_ = String();
-    uError e = runParser(xml);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(runParser(xml));
     out = text_;
     return TRELM_OK();
 }

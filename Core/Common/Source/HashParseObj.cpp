@@ -10,11 +10,9 @@ uError HashParseObj::parse(String const& xml, Map<String, String>& out) {
     values_.clear();
     text_ = String();
     leafOpen_ = false;
-    uError e = runParser(xml);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(runParser(xml));
     for (auto const& [key, value] : values_) {
-        uError ins = out.insert(key, value);
-        if (ins.failed()) return ins;
+        TRELM_RETURN_IF_ERROR(out.insert(key, value));
     }
     values_.clear();
     return TRELM_OK();

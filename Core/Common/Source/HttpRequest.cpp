@@ -57,8 +57,7 @@ struct HttpRequest::ConnectionCache::Impl {
 };
 
 uError HttpRequest::ConnectionCache::create(SmartPtr<ConnectionCache>& out) {
-    uError e = initCurlOnce();
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(initCurlOnce());
     auto impl = std::make_unique<Impl>();
     impl->share = curl_share_init();
     if (impl->share == nullptr) return TRELM_ERROR_MSG(kResource, "cannot create a libcurl share handle");
@@ -252,8 +251,7 @@ uError HttpRequest::setUploadData(SmartPtr<InputDataStream> data) {
 uError HttpRequest::sendRequest() {
     Impl& d = *impl_;
     if (d.url.empty()) return TRELM_ERROR_MSG(kInvalid, "request not set up");
-    uError e = initCurlOnce();
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(initCurlOnce());
 
     d.releaseHandle();
     d.response.clear();
@@ -261,8 +259,7 @@ uError HttpRequest::sendRequest() {
     d.completed = false;
     d.easy = curl_easy_init();
     if (d.easy == nullptr) return TRELM_ERROR_MSG(kResource, "cannot create a libcurl handle");
-    e = d.configure();
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(d.configure());
 
     CURLcode rc = curl_easy_perform(d.easy);
     if (rc != CURLE_OK) {

@@ -1,5 +1,7 @@
 #include "trelm/Trace.h"
 
+#include "trelm/uError.h"
+
 #include <cstdio>
 #include <cstdlib>
 #include <mutex>
@@ -38,6 +40,23 @@ void trace(String const& line) {
         current(line);
     } else {
         defaultSink(line);
+    }
+}
+
+void traceError(char const* who, char const* what, uError const& err) {
+    String text;
+    err.format(text);
+    String const lead = String(who) + ": ";
+    unsigned begin = 0;
+    bool first = true;
+    while (begin <= text.size()) {
+        unsigned end = text.find('\n', begin);
+        if (end == String::npos) end = text.size();
+        String line = first ? lead + what + ": " : lead;
+        line += text.substr(begin, end - begin);
+        trace(line);
+        first = false;
+        begin = end + 1;
     }
 }
 

@@ -119,18 +119,16 @@ uError Variant::as(Vector<int>& out) const {
     if (heldInteger(v_, value)) {
         if (value < INT_MIN || value > INT_MAX) return TRELM_ERROR(kInvalid);
         Vector<int> result;
-        uError e = result.pushBack(static_cast<int>(value));
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(result.pushBack(static_cast<int>(value)));
         out = std::move(result);
         return TRELM_OK();
     }
     if (auto texts = std::get_if<Vector<trelm::String>>(&v_)) {
         Vector<int> result;
-        uError e = result.reserve(texts->size());
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(result.reserve(texts->size()));
         for (auto const& text : *texts) {
             if (text.to(single).failed()) return TRELM_ERROR(kInvalid);
-            result.pushBack(single);
+            TRELM_RETURN_IF_ERROR(result.pushBack(single));
         }
         out = std::move(result);
         return TRELM_OK();
@@ -145,9 +143,8 @@ uError Variant::as(Vector<trelm::String>& out) const {
     }
     if (auto numbers = std::get_if<Vector<int>>(&v_)) {
         Vector<trelm::String> result;
-        uError e = result.reserve(numbers->size());
-        if (e.failed()) return e;
-        for (int n : *numbers) result.pushBack(trelm::String::from(n));
+        TRELM_RETURN_IF_ERROR(result.reserve(numbers->size()));
+        for (int n : *numbers) TRELM_RETURN_IF_ERROR(result.pushBack(trelm::String::from(n)));
         out = std::move(result);
         return TRELM_OK();
     }
@@ -156,31 +153,31 @@ uError Variant::as(Vector<trelm::String>& out) const {
 
 GUID Variant::asGUID() const {
     GUID g;
-    as(g);
+    as(g).ignore();  // a value that does not convert reads as the default
     return g;
 }
 
 int Variant::asInt32() const {
     int n = 0;
-    as(n);
+    as(n).ignore();  // a value that does not convert reads as the default
     return n;
 }
 
 long long Variant::asInt64() const {
     long long n = 0;
-    as(n);
+    as(n).ignore();  // a value that does not convert reads as the default
     return n;
 }
 
 unsigned Variant::asUInt32() const {
     unsigned n = 0;
-    as(n);
+    as(n).ignore();  // a value that does not convert reads as the default
     return n;
 }
 
 trelm::String Variant::asString() const {
     trelm::String s;
-    as(s);
+    as(s).ignore();  // a value that does not convert reads as the default
     return s;
 }
 

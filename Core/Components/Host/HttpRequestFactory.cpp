@@ -31,8 +31,7 @@ uError HttpRequestFactory::createRequest(SmartPtr<HttpRequest>& out) {
     {
         std::lock_guard<std::mutex> lock(mutex_);
         if (!cache_) {
-            uError e = HttpRequest::ConnectionCache::create(cache_);
-            if (e.failed()) return e;
+            TRELM_RETURN_IF_ERROR(HttpRequest::ConnectionCache::create(cache_));
         }
         settings = settings_;
         cache = cache_;
@@ -74,9 +73,8 @@ uError HttpRequestFactory::sendConfigImpl(Configuration::Group const& group) {
     // Built aside and swapped in whole, so a bad value changes nothing.
     std::lock_guard<std::mutex> lock(mutex_);
     HttpRequest::Settings next = settings_;
-    uError e = readPositive(group, "connect_timeout_ms", next.connectTimeoutMs);
-    if (e.failed()) return e;
-    e = readPositive(group, "timeout_ms", next.timeoutMs);
+    TRELM_RETURN_IF_ERROR(readPositive(group, "connect_timeout_ms", next.connectTimeoutMs));
+    uError e = readPositive(group, "timeout_ms", next.timeoutMs);
     if (e.failed()) return e;
     Variant ca = group.get(String("ca_file"));
     if (!ca.empty()) {

@@ -113,8 +113,7 @@ uError RuntimeConfiguration::openLocked(String const& path) {
     openFailed_ = true;
     if (path.empty()) return TRELM_ERROR_MSG(kInvalid, "empty store path");
     if (path != kMemory) {
-        uError e = createPrivateFile(path);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(createPrivateFile(path));
     }
     sqlite3* db = nullptr;
     int rc = sqlite3_open_v2(path.cStr(), &db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE, nullptr);
@@ -146,13 +145,11 @@ uError RuntimeConfiguration::ensureOpenLocked() {
 
 uError RuntimeConfiguration::store(String const& tag, Set<Configuration::Value> const& values) {
     std::lock_guard<std::mutex> lock(mutex_);
-    uError e = ensureOpenLocked();
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(ensureOpenLocked());
     Transaction tx{db_};
-    e = tx.begin("BEGIN IMMEDIATE");
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(tx.begin("BEGIN IMMEDIATE"));
     Statement st;
-    e = prepare(db_, "INSERT OR REPLACE INTO runtime_configuration (tag, key, value) VALUES (?1, ?2, ?3)", st);
+    uError e = prepare(db_, "INSERT OR REPLACE INTO runtime_configuration (tag, key, value) VALUES (?1, ?2, ?3)", st);
     if (e.failed()) return e;
     for (Configuration::Value const& value : values) {
         String text;
@@ -170,13 +167,11 @@ uError RuntimeConfiguration::store(String const& tag, Set<Configuration::Value> 
 
 uError RuntimeConfiguration::reset(String const& tag, Set<String> const& keys) {
     std::lock_guard<std::mutex> lock(mutex_);
-    uError e = ensureOpenLocked();
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(ensureOpenLocked());
     Transaction tx{db_};
-    e = tx.begin("BEGIN IMMEDIATE");
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(tx.begin("BEGIN IMMEDIATE"));
     Statement st;
-    e = prepare(db_, "DELETE FROM runtime_configuration WHERE tag = ?1 AND key = ?2", st);
+    uError e = prepare(db_, "DELETE FROM runtime_configuration WHERE tag = ?1 AND key = ?2", st);
     if (e.failed()) return e;
     for (String const& key : keys) {
         sqlite3_reset(st.stmt);
@@ -190,15 +185,13 @@ uError RuntimeConfiguration::reset(String const& tag, Set<String> const& keys) {
 
 uError RuntimeConfiguration::get(String const& tag, Map<String, Variant>& values) {
     std::lock_guard<std::mutex> lock(mutex_);
-    uError e = ensureOpenLocked();
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(ensureOpenLocked());
     Statement st;
-    e = prepare(db_, "SELECT value FROM runtime_configuration WHERE tag = ?1 AND key = ?2", st);
-    if (e.failed()) return e;
+    TRELM_RETURN_IF_ERROR(prepare(db_, "SELECT value FROM runtime_configuration WHERE tag = ?1 AND key = ?2", st));
     // Read everything first so that a failure leaves the caller's map untouched.
     Map<String, Variant> found;
     Transaction tx{db_};
-    e = tx.begin("BEGIN");
+    uError e = tx.begin("BEGIN");
     if (e.failed()) return e;
     for (auto const& entry : values) {
         sqlite3_reset(st.stmt);
@@ -209,8 +202,7 @@ uError RuntimeConfiguration::get(String const& tag, Map<String, Variant>& values
         if (rc == SQLITE_ROW) {
             auto const* text = reinterpret_cast<char const*>(sqlite3_column_text(st.stmt, 0));
             int size = sqlite3_column_bytes(st.stmt, 0);
-            e = found.insert(entry.first, Variant(String(text != nullptr ? text : "", static_cast<unsigned>(size))));
-            if (e.failed()) return e;
+            TRELM_RETURN_IF_ERROR(found.insert(entry.first, Variant(String(text != nullptr ? text : "", static_cast<unsigned>(size)))));
         } else if (rc != SQLITE_DONE) {
             return sqliteError(db_, "get");
         }
@@ -218,8 +210,7 @@ uError RuntimeConfiguration::get(String const& tag, Map<String, Variant>& values
     e = tx.commit();
     if (e.failed()) return e;
     for (auto const& [key, value] : found) {
-        e = values.insert(key, value);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(values.insert(key, value));
     }
     return TRELM_OK();
 }

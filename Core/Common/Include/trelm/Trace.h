@@ -20,6 +20,15 @@ using TraceSink = std::function<void(String const& line)>;
 
 TRELM_API void trace(String const& line);
 
+class uError;
+
+// Reports an error that `who` goes on without: one trace line per level of the chain,
+//   "<who>: <what>: 0x80000001 at Core/.../FacebookLibrary:120"
+//   "<who>:   caused by 0x80000010 at Core/Common/Include/trelm/Map:70"
+// `what` names the step that failed. The chain holds codes, locations and the messages the code
+// gave them, so what is traced is only as secret as those messages (none carries a credential).
+TRELM_API void traceError(char const* who, char const* what, uError const& err);
+
 // Installs `sink` for every later trace (an empty function restores the default) and returns
 // the sink it replaces (empty when that was the default).
 TRELM_API TraceSink setTraceSink(TraceSink sink);

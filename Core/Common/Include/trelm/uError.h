@@ -42,7 +42,7 @@ enum ErrorCode : unsigned {
 // path); it is kept as a pointer. The message is copied. The cause is shared between copies, so
 // copying an uError is cheap.
 // Thread safety: an uError is an immutable value; distinct threads may copy and read it freely.
-class TRELM_API uError {
+class [[nodiscard, TRELM_API_ATTR]] uError {
 public:
     // Success without a location.
     uError() noexcept = default;
@@ -60,6 +60,8 @@ public:
     // True when the high bit of the code is set.
     bool failed() const noexcept { return (code_ & 0x80000000u) != 0; }
     bool ok() const noexcept { return !failed(); }
+    // Drops this result on purpose. Every call says beside it why nothing is to be done.
+    void ignore() const noexcept {}
 
     String message() const;
     // Project-relative path without extension, e.g. "Core/Common/Source/Variant"; "" if unknown.
@@ -117,6 +119,17 @@ struct SourcePath {
                 if (root[rootLen - 1] != '/' && file[begin] == '/') ++begin;
             }
         }
+        // A build that compiles with relative paths (ccache's base_dir, for one) names files
+        // "../../Core/..." from the build folder: the leading "./" and "../" steps are dropped.
+        while (true) {
+            if (begin + 3 <= N - 1 && file[begin] == '.' && file[begin + 1] == '.' && file[begin + 2] == '/') {
+                begin += 3;
+            } else if (begin + 2 <= N - 1 && file[begin] == '.' && file[begin + 1] == '/') {
+                begin += 2;
+            } else {
+                break;
+            }
+        }
         std::size_t end = N - 1;
         for (std::size_t i = N - 1; i > begin; --i) {
             if (file[i - 1] == '/') break;
@@ -147,5 +160,13 @@ struct SourcePath {
 #define TRELM_WRAP(code, cause) ::trelm::uError((code), (cause), "", TRELM_SOURCE_FILE, __LINE__)
 #define TRELM_WRAP_MSG(code, cause, msg) \
     ::trelm::uError((code), (cause), (msg), TRELM_SOURCE_FILE, __LINE__)
+
+// Evaluates an uError expression once and returns it, unchanged (cause and location kept), from
+// the enclosing function when it failed. A success, kNoData included, falls through.
+#define TRELM_RETURN_IF_ERROR(...)                                       \
+    do {                                                                 \
+        ::trelm::uError trelmReturnIfError_ = (__VA_ARGS__);            \
+        if (trelmReturnIfError_.failed()) return trelmReturnIfError_;   \
+    } while (0)
 
 #include "trelm/String.h"

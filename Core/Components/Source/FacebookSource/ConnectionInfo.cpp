@@ -83,12 +83,10 @@ uError FacebookLibrary::ConnectionInfo::setUserConfig(String const& userId, bool
     userId_ = userId;
     userSet_ = true;
     if (storeUser) {
-        uError err = sendStore({Configuration::Value(kSessionUserKey, userId)});
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(sendStore({Configuration::Value(kSessionUserKey, userId)}));
     }
     if (storeLastUser) {
-        uError err = sendStore({Configuration::Value(kLastUserKey, userId)});
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(sendStore({Configuration::Value(kLastUserKey, userId)}));
     }
     return TRELM_OK();
 }
@@ -136,14 +134,10 @@ uError FacebookLibrary::ConnectionInfo::storeSession(String const& sessionId, St
                                                      String const& userId, bool storeSession,
                                                      bool storeLastUser) const {
     if (storeSession) {
-        uError err = sendStore({Configuration::Value(kSessionIdKey, sessionId),
-                                Configuration::Value(kSessionSecretKey, sessionSecret),
-                                Configuration::Value(kSessionUserKey, userId)});
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(sendStore({Configuration::Value(kSessionIdKey, sessionId), Configuration::Value(kSessionSecretKey, sessionSecret), Configuration::Value(kSessionUserKey, userId)}));
     }
     if (storeLastUser) {
-        uError err = sendStore({Configuration::Value(kLastUserKey, userId)});
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(sendStore({Configuration::Value(kLastUserKey, userId)}));
     }
     return TRELM_OK();
 }
@@ -162,8 +156,7 @@ uError FacebookLibrary::ConnectionInfo::storeSessionReset(bool withUser) const {
     // "facebook_source_lastuser" is never reset: it is how a change of user is told later.
     Set<String> keys{kSessionIdKey, kSessionSecretKey};
     if (withUser) {
-        uError err = keys.insert(kSessionUserKey);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(keys.insert(kSessionUserKey));
     }
     return sendReset(std::move(keys));
 }

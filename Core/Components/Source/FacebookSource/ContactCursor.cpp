@@ -104,8 +104,7 @@ uError ContactCursor::derivedStart() {
         for (Fixed const& fixed : fixedValues) {
             if (name != fixed.key) continue;
             bool matches = false;
-            uError err = doFixedComparison<String>(c.function, c.value, *fixed.value, matches);
-            if (err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(doFixedComparison<String>(c.function, c.value, *fixed.value, matches));
             canMatch = canMatch && matches;
             handled = true;
             break;
@@ -123,17 +122,14 @@ uError ContactCursor::makePrototype() {
     if (err.failed()) return err;
     for (FieldMapping const& m : kFieldMap) {
         Field field{m.rowField, m.recordKey, TRELM_TYPES::STRING};
-        Metadata::getType(field.recordKey, field.type);  // an unregistered key is kept as text
-        err = fields_.pushBack(std::move(field));
-        if (err.failed()) return err;
+        // An unregistered key is kept as text.
+        Metadata::getType(field.recordKey, field.type).ignore();
+        TRELM_RETURN_IF_ERROR(fields_.pushBack(std::move(field)));
     }
     RecordPtr prototype = makeSmart<Record>();
-    err = prototype->insert("core_contact_service", Variant(kServiceName));
-    if (err.failed()) return err;
-    err = prototype->insert("core_object_type", Variant(FacebookSource::kContact));
-    if (err.failed()) return err;
-    err = addBaseFields(prototype);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(prototype->insert("core_contact_service", Variant(kServiceName)));
+    TRELM_RETURN_IF_ERROR(prototype->insert("core_object_type", Variant(FacebookSource::kContact)));
+    TRELM_RETURN_IF_ERROR(addBaseFields(prototype));
     prototype_ = std::move(*prototype);
     return TRELM_OK();
 }
@@ -155,8 +151,7 @@ uError ContactCursor::generateBaseQuery(String const& fields, RecordPtr const& k
     String text = "select " + fields + " from user where " + baseCondition_;
     if (!conditionGiven_) {
         String userId;
-        uError err = library_->getUserId(userId);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(library_->getUserId(userId));
         text += userId + "')";
     }
     if (!keyset.empty()) text += " and (" + keyset + ")";
@@ -189,16 +184,14 @@ uError ContactCursor::convertItem(Map<String, String> const& row, RecordPtr& rec
             *record = prototype_;
         } else {
             for (auto const& [key, value] : prototype_) {
-                uError err = record->insert(key, value);
-                if (err.failed()) return err;
+                TRELM_RETURN_IF_ERROR(record->insert(key, value));
             }
         }
     } catch (std::bad_alloc const&) {
         return TRELM_ERROR(kOutOfMemory);
     }
     for (Field const& f : fields_) {
-        uError err = copyField(row, f.rowField, f.recordKey, f.type, record);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(copyField(row, f.rowField, f.recordKey, f.type, record));
     }
     return TRELM_OK();
 }
@@ -208,8 +201,7 @@ uError ContactCursor::getSid(RecordPtr const& record, Metadata::Key& key, String
     Variant const* value = record->search(serviceIdKey);
     if (value == nullptr) return TRELM_ERROR_MSG(kInvalid, "contact record without a service id");
     String id;
-    uError err = value->as(id);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(value->as(id));
     static Metadata::Key const sidKey(kServiceIdKey, TRELM_TYPES::STRING);
     key = sidKey;
     serviceId = std::move(id);

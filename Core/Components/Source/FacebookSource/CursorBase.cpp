@@ -2,6 +2,8 @@
 
 #include <utility>
 
+#include "trelm/Trace.h"
+
 namespace trelm {
 
 CursorBase::CursorBase(SmartPtr<FacebookLibrary> library, SmartPtr<FacebookSource::MappingCache> cache,
@@ -23,8 +25,10 @@ CursorBase::CursorBase(SmartPtr<FacebookLibrary> library, SmartPtr<FacebookSourc
 CursorBase::~CursorBase() {
     // The records and mappings of this cursor die with it; other cursors' holds keep theirs.
     if (haveTag_ && cache_) {
-        cache_->clearMapping(tag_);
-        cache_->clearItems(tag_);
+        // A destructor has no one to report to: a failure (the cache's lock could not be taken)
+        // leaves this tag's holds in place, which costs memory but keeps every entry consistent.
+        if (uError err = cache_->clearMapping(tag_); err.failed()) traceError("cursor", "releasing its mappings", err);
+        if (uError err = cache_->clearItems(tag_); err.failed()) traceError("cursor", "releasing its records", err);
     }
 }
 
@@ -32,8 +36,7 @@ uError CursorBase::start() {
     if (constructError_.failed()) return constructError_;
     if (!library_ || !cache_) return TRELM_ERROR_MSG(kNotSet, "cursor without client or mapping cache");
     if (haveTag_) return TRELM_ERROR_MSG(kInvalid, "cursor started twice");
-    uError err = cache_->getTag(tag_);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(cache_->getTag(tag_));
     haveTag_ = true;
     return derivedStart();
 }
@@ -44,12 +47,9 @@ uError CursorBase::addBaseFields(RecordPtr& record) {
     static String const deletedKey("core_object_deleted");
     static String const importKey("core_object_origin_importcomponent");
     static String const serviceKey("core_object_origin_servicename");
-    uError err = record->insert(sourceKey, Variant(sourceId_));
-    if (err.failed()) return err;
-    err = record->insert(deletedKey, Variant(false));
-    if (err.failed()) return err;
-    err = record->insert(importKey, Variant(sourceId_));
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(record->insert(sourceKey, Variant(sourceId_)));
+    TRELM_RETURN_IF_ERROR(record->insert(deletedKey, Variant(false)));
+    TRELM_RETURN_IF_ERROR(record->insert(importKey, Variant(sourceId_)));
     return record->insert(serviceKey, Variant("Facebook"));
 }
 

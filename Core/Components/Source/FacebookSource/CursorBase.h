@@ -84,15 +84,13 @@ uError CursorBase::doFixedComparison(IQueryItems::Constraint::Function function,
         case IQueryItems::Constraint::Equal:
         case IQueryItems::Constraint::NotEqual: {
             T wanted{};
-            uError err = constraintValue.as(wanted);
-            if (err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(constraintValue.as(wanted));
             matches = (wanted == value) == (function == IQueryItems::Constraint::Equal);
             return TRELM_OK();
         }
         case IQueryItems::Constraint::InList: {
             Vector<T> wanted;
-            uError err = constraintValue.as(wanted);
-            if (err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(constraintValue.as(wanted));
             bool found = false;
             for (T const& w : wanted) found = found || w == value;
             matches = found;

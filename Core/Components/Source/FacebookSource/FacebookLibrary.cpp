@@ -21,27 +21,14 @@
 #include "trelm/Trace.h"
 #include "trelm/Variant.h"
 
-// Evaluates an uError expression and returns it from the enclosing function when it failed.
-#define LIB_TRY(expr)                           \
-    do {                                        \
-        ::trelm::uError lib_err_ = (expr);      \
-        if (lib_err_.failed()) return lib_err_; \
-    } while (0)
-
 namespace trelm {
 namespace {
 
 constexpr char const* kHttpFactory = "HttpRequestFactory";
 
-// Reports an error that the caller goes on without. `what` names the step; the formatted chain
-// holds codes and locations only (no request fields end up in error texts).
-void note(char const* what, uError const& err) {
-    String line("FacebookLibrary: ");
-    line += what;
-    line += '\n';
-    err.format(line);
-    trace(line);
-}
+// Reports an error that the caller goes on without, one trace line per level of its chain. The
+// chain holds codes and locations only (no request fields end up in error texts).
+void note(char const* what, uError const& err) { traceError("FacebookLibrary", what, err); }
 
 // The service writes numbers as bare text, but a pretty-printed document may surround them with
 // white space; anything else is not a number.
@@ -82,13 +69,14 @@ uError FacebookLibrary::getUserId(String& out) {
 
 uError FacebookLibrary::getOldUserId(String const& configTag, String& oldUser) {
     Map<String, Variant> values;
-    LIB_TRY(values.insert(ConnectionInfo::kLastUserKey, Variant()));
+    TRELM_RETURN_IF_ERROR(values.insert(ConnectionInfo::kLastUserKey, Variant()));
     GetRuntimeConfigurationMessage msg(configTag, values);
     uError err = msg.send(ConnectionInfo::kStoreComponent);
     if (err.failed()) return TRELM_WRAP(kFailure, err);
     String text;
     if (Variant const* value = values.search(ConnectionInfo::kLastUserKey); value && !value->empty()) {
-        value->as(text);
+        // A stored value that is not text is a broken store, not "no last user".
+        if (uError err = value->as(text); err.failed()) return TRELM_WRAP(kFailure, err);
     }
     oldUser = text;
     return TRELM_OK();
@@ -97,7 +85,7 @@ uError FacebookLibrary::getOldUserId(String const& configTag, String& oldUser) {
 uError FacebookLibrary::connect() {
     if (!info_) return TRELM_ERROR(kNotSet);
     String tag;
-    info_->getConfigTag(tag);
+    info_->getConfigTag(tag).ignore();  // always succeeds
     String oldUser;
     if (uError err = getOldUserId(tag, oldUser); err.failed()) {
         // Without the last user nobody can tell a change of person: go on as on a first sign-in.
@@ -130,12 +118,12 @@ uError FacebookLibrary::connectInternal(String& sessionId, String& sessionSecret
     }
 
     Map<String, String> args;
-    LIB_TRY(makeBaseArgs("facebook.auth.login", args));
-    LIB_TRY(args.insert("email", login));
-    LIB_TRY(args.insert("password", password));
-    LIB_TRY(addAuth(args, false));
+    TRELM_RETURN_IF_ERROR(makeBaseArgs("facebook.auth.login", args));
+    TRELM_RETURN_IF_ERROR(args.insert("email", login));
+    TRELM_RETURN_IF_ERROR(args.insert("password", password));
+    TRELM_RETURN_IF_ERROR(addAuth(args, false));
     String response;
-    LIB_TRY(sendPost(kLoginUrl, args, SmartPtr<InputDataStream>(), response));
+    TRELM_RETURN_IF_ERROR(sendPost(kLoginUrl, args, SmartPtr<InputDataStream>(), response));
 
     Map<String, String> errorFields;
     if (HashParseObj("error_response").parse(response, errorFields).ok()) {
@@ -163,7 +151,7 @@ uError FacebookLibrary::connectInternal(String& sessionId, String& sessionSecret
         // A session without a secret of its own is signed with the application's.
         MutexGuard guard(&mutex_);
         if (!guard.locked()) return TRELM_ERROR(kResource);
-        LIB_TRY(info_->getAppSecret(secret));
+        TRELM_RETURN_IF_ERROR(info_->getAppSecret(secret));
     }
 
     userId = *uid;
@@ -180,7 +168,7 @@ uError FacebookLibrary::connectInternal(String& sessionId, String& sessionSecret
 uError FacebookLibrary::applySession(String const& sessionId, String const& sessionSecret, String const& userId) {
     if (!info_) return TRELM_ERROR(kNotSet);
     String tag;
-    info_->getConfigTag(tag);
+    info_->getConfigTag(tag).ignore();  // always succeeds
     String oldUser;
     if (uError err = getOldUserId(tag, oldUser); err.failed()) {
         note("reading the last user failed; no wipe will be sent", err);
@@ -205,7 +193,7 @@ uError FacebookLibrary::applySession(String const& sessionId, String const& sess
 uError FacebookLibrary::resetAccount(bool store) {
     if (!info_) return TRELM_ERROR(kNotSet);
     String tag;
-    info_->getConfigTag(tag);
+    info_->getConfigTag(tag).ignore();  // always succeeds
     if (uError err = dropSession(true, store); err.failed()) note("forgetting the stored session failed", err);
     if (uError err = sendWipes(false); err.failed()) note("telling the components to wipe failed", err);
     sendLoginStatus(tag, kNotSignedIn, String());
@@ -217,15 +205,16 @@ uError FacebookLibrary::sendWipes(bool alsoWakeup) {
     String tag;
     Vector<String> wipe;
     Vector<String> wakeup;
-    info_->getConfigTag(tag);
+    info_->getConfigTag(tag).ignore();  // always succeeds
     {
         MutexGuard guard(&mutex_);
         if (!guard.locked()) return TRELM_ERROR(kResource);
-        info_->getWipeComponents(wipe);
-        if (alsoWakeup) info_->getWakeupComponents(wakeup);
+        // Copying the lists always succeeds.
+        info_->getWipeComponents(wipe).ignore();
+        if (alsoWakeup) info_->getWakeupComponents(wakeup).ignore();
     }
     Map<String, String> params;
-    LIB_TRY(params.insert(tag, String()));
+    TRELM_RETURN_IF_ERROR(params.insert(tag, String()));
 
     // Every component keeps going on a failed send: each one that holds the previous user's data
     // must hear of the change even if another is missing.
@@ -262,10 +251,10 @@ uError FacebookLibrary::dropSession(bool withUser, bool store) {
 uError FacebookLibrary::runFqlQuery(String const& query, String const& rowElement, Vector<Map<String, String>>& rows,
                                     unsigned int parseArg, unsigned int& count) {
     Map<String, String> args;
-    LIB_TRY(makeBaseArgs("facebook.fql.query", args));
-    LIB_TRY(args.insert("query", query));
+    TRELM_RETURN_IF_ERROR(makeBaseArgs("facebook.fql.query", args));
+    TRELM_RETURN_IF_ERROR(args.insert("query", query));
     String response;
-    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    TRELM_RETURN_IF_ERROR(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
     FqlParseObj parser("fql_query_response", rowElement, parseArg);
     return parser.parse(response, rows, count);
 }
@@ -273,24 +262,24 @@ uError FacebookLibrary::runFqlQuery(String const& query, String const& rowElemen
 uError FacebookLibrary::runFStreamQuery(String const& viewerId, unsigned int startTime, unsigned int endTime,
                                         unsigned int limit, Vector<Map<String, String>>& rows, unsigned int& count) {
     Map<String, String> args;
-    LIB_TRY(makeBaseArgs("facebook.stream.get", args));
-    LIB_TRY(args.insert("viewer_id", viewerId));
-    LIB_TRY(args.insert("start_time", String::from(startTime)));
-    LIB_TRY(args.insert("end_time", String::from(endTime)));
-    LIB_TRY(args.insert("limit", String::from(limit)));
+    TRELM_RETURN_IF_ERROR(makeBaseArgs("facebook.stream.get", args));
+    TRELM_RETURN_IF_ERROR(args.insert("viewer_id", viewerId));
+    TRELM_RETURN_IF_ERROR(args.insert("start_time", String::from(startTime)));
+    TRELM_RETURN_IF_ERROR(args.insert("end_time", String::from(endTime)));
+    TRELM_RETURN_IF_ERROR(args.insert("limit", String::from(limit)));
     String response;
-    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    TRELM_RETURN_IF_ERROR(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
     FStreamParseObj parser;
     return parser.parse(response, rows, count);
 }
 
 uError FacebookLibrary::getInboxThreads(int start, int limit, Vector<ThreadObj>& threads) {
     Map<String, String> args;
-    LIB_TRY(makeBaseArgs("mailbox.getInbox", args));
-    LIB_TRY(args.insert("start", String::from(start)));
-    LIB_TRY(args.insert("limit", String::from(limit)));
+    TRELM_RETURN_IF_ERROR(makeBaseArgs("mailbox.getInbox", args));
+    TRELM_RETURN_IF_ERROR(args.insert("start", String::from(start)));
+    TRELM_RETURN_IF_ERROR(args.insert("limit", String::from(limit)));
     String response;
-    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    TRELM_RETURN_IF_ERROR(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
     ThreadParser parser(threads);
     return parser.parse(response);
 }
@@ -298,25 +287,25 @@ uError FacebookLibrary::getInboxThreads(int start, int limit, Vector<ThreadObj>&
 uError FacebookLibrary::getThreadMessages(String const& threadId, String const& context, int start, int limit,
                                           Vector<MessageObj>& messages) {
     Map<String, String> args;
-    LIB_TRY(makeBaseArgs("mailbox.getThreadMessages", args));
-    LIB_TRY(args.insert("tid", threadId));
-    LIB_TRY(args.insert("start", String::from(start)));
-    LIB_TRY(args.insert("limit", String::from(limit)));
+    TRELM_RETURN_IF_ERROR(makeBaseArgs("mailbox.getThreadMessages", args));
+    TRELM_RETURN_IF_ERROR(args.insert("tid", threadId));
+    TRELM_RETURN_IF_ERROR(args.insert("start", String::from(start)));
+    TRELM_RETURN_IF_ERROR(args.insert("limit", String::from(limit)));
     String response;
-    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    TRELM_RETURN_IF_ERROR(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
     MessageParser parser(messages, context);
     return parser.parse(response);
 }
 
 uError FacebookLibrary::setStatus(String const& status, bool includesVerb) {
     Map<String, String> args;
-    LIB_TRY(makeBaseArgs("users.setStatus", args));
-    LIB_TRY(args.insert("status", status));
-    LIB_TRY(args.insert("status_includes_verb", includesVerb ? "1" : "0"));
+    TRELM_RETURN_IF_ERROR(makeBaseArgs("users.setStatus", args));
+    TRELM_RETURN_IF_ERROR(args.insert("status", status));
+    TRELM_RETURN_IF_ERROR(args.insert("status_includes_verb", includesVerb ? "1" : "0"));
     String response;
-    LIB_TRY(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
+    TRELM_RETURN_IF_ERROR(runFacebookRequest(args, SmartPtr<InputDataStream>(), response));
     String value;
-    LIB_TRY(FlatParseObj("users_setStatus_response").parse(response, value));
+    TRELM_RETURN_IF_ERROR(FlatParseObj("users_setStatus_response").parse(response, value));
     if (std::atoi(value.cStr()) == 0) return TRELM_ERROR(kFailure);
     return TRELM_OK();
 }
@@ -324,11 +313,11 @@ uError FacebookLibrary::setStatus(String const& status, bool includesVerb) {
 uError FacebookLibrary::sendPhoto(SmartPtr<InputDataStream> photo, String const& albumId, String const& caption,
                                   String& photoId) {
     Map<String, String> args;
-    LIB_TRY(makeBaseArgs("photos.upload", args));
-    if (!albumId.empty()) LIB_TRY(args.insert("aid", albumId));
-    if (!caption.empty()) LIB_TRY(args.insert("caption", caption));
+    TRELM_RETURN_IF_ERROR(makeBaseArgs("photos.upload", args));
+    if (!albumId.empty()) TRELM_RETURN_IF_ERROR(args.insert("aid", albumId));
+    if (!caption.empty()) TRELM_RETURN_IF_ERROR(args.insert("caption", caption));
     String response;
-    LIB_TRY(runFacebookRequest(args, photo, response));
+    TRELM_RETURN_IF_ERROR(runFacebookRequest(args, photo, response));
     photoId = String();
     PhotoUploadParser parser(photoId);
     return parser.parse(response);
@@ -337,8 +326,8 @@ uError FacebookLibrary::sendPhoto(SmartPtr<InputDataStream> photo, String const&
 // ---- Request building and transport ----
 
 uError FacebookLibrary::makeBaseArgs(String const& method, Map<String, String>& args) {
-    LIB_TRY(args.insert("method", method));
-    LIB_TRY(args.insert("v", "1.0"));
+    TRELM_RETURN_IF_ERROR(args.insert("method", method));
+    TRELM_RETURN_IF_ERROR(args.insert("v", "1.0"));
     return TRELM_OK();
 }
 
@@ -348,20 +337,20 @@ uError FacebookLibrary::addAuth(Map<String, String>& args, bool withSession) {
     if (!guard.locked()) return TRELM_ERROR(kResource);
 
     String appKey;
-    LIB_TRY(info_->getAppKey(appKey));
-    LIB_TRY(args.insert("api_key", appKey));
+    TRELM_RETURN_IF_ERROR(info_->getAppKey(appKey));
+    TRELM_RETURN_IF_ERROR(args.insert("api_key", appKey));
     if (withSession) {
         String sessionId;
-        LIB_TRY(info_->getSessionId(sessionId));
+        TRELM_RETURN_IF_ERROR(info_->getSessionId(sessionId));
         // An empty session id is no session: the request goes out as an application call.
         if (!sessionId.empty()) {
-            LIB_TRY(args.insert("session_key", sessionId));
+            TRELM_RETURN_IF_ERROR(args.insert("session_key", sessionId));
             ++callCounter_;
-            LIB_TRY(args.insert("call_id", String::from(callCounter_)));
+            TRELM_RETURN_IF_ERROR(args.insert("call_id", String::from(callCounter_)));
         }
     }
     String sig;
-    LIB_TRY(makeSignature(args, sig));
+    TRELM_RETURN_IF_ERROR(makeSignature(args, sig));
     return args.insert("sig", sig);
 }
 
@@ -369,9 +358,9 @@ uError FacebookLibrary::makeSignature(Map<String, String> const& args, String& s
     if (!info_) return TRELM_ERROR(kNotSet);
     String secret;
     if (info_->hasSession() && args.contains("session_key")) {
-        LIB_TRY(info_->getSessionSecret(secret));
+        TRELM_RETURN_IF_ERROR(info_->getSessionSecret(secret));
     } else {
-        LIB_TRY(info_->getAppSecret(secret));
+        TRELM_RETURN_IF_ERROR(info_->getAppSecret(secret));
     }
     String text;
     for (auto const& [key, value] : args) {
@@ -391,26 +380,28 @@ uError FacebookLibrary::sendPost(String const& url, Map<String, String> const& a
     SmartPtr<HttpRequest> request = msg.request;
     if (!request) return TRELM_ERROR(kFailure);
 
-    LIB_TRY(request->setup(url));
-    LIB_TRY(request->setPostData(args));
-    if (data) LIB_TRY(request->setUploadData(data));
-    LIB_TRY(request->sendRequest());
+    TRELM_RETURN_IF_ERROR(request->setup(url));
+    TRELM_RETURN_IF_ERROR(request->setPostData(args));
+    if (data) TRELM_RETURN_IF_ERROR(request->setUploadData(data));
+    TRELM_RETURN_IF_ERROR(request->sendRequest());
     int status = 0;
-    LIB_TRY(request->getResponseCode(status));
+    TRELM_RETURN_IF_ERROR(request->getResponseCode(status));
     if (status < 200 || status > 299) {
-        request->disconnect();
+        // The call has failed already; releasing the connection is best effort.
+        request->disconnect().ignore();
         return TRELM_ERROR_MSG(kFailure, "HTTP status " + String::from(status));
     }
     String body;
-    LIB_TRY(request->getResponseData(body));
-    request->disconnect();
+    TRELM_RETURN_IF_ERROR(request->getResponseData(body));
+    // The answer is complete: a connection that cannot be handed back only costs a reconnect.
+    request->disconnect().ignore();
     response = body;
     return TRELM_OK();
 }
 
 uError FacebookLibrary::sendRequestAndCheckErrors(Map<String, String> const& args, SmartPtr<InputDataStream> data,
                                                   String& response) {
-    LIB_TRY(sendPost(kServiceUrl, args, data, response));
+    TRELM_RETURN_IF_ERROR(sendPost(kServiceUrl, args, data, response));
 
     Map<String, String> fields;
     if (HashParseObj("error_response").parse(response, fields).failed()) return TRELM_OK();

@@ -31,21 +31,7 @@ char const* const kHaveExtendedApi = "haveExtendedApi";
 char const* const kRuntimeConfiguration = "RuntimeConfiguration";
 
 // Reports an error that the source cannot act on, one trace line per level of its chain.
-void traceError(char const* what, uError const& err) {
-    String text;
-    err.format(text);
-    unsigned begin = 0;
-    bool first = true;
-    while (begin <= text.size()) {
-        unsigned end = text.find('\n', begin);
-        if (end == String::npos) end = text.size();
-        String line = first ? String("FacebookSource: ") + what + ": " : String("FacebookSource:   ");
-        line += text.substr(begin, end - begin);
-        trace(line);
-        first = false;
-        begin = end + 1;
-    }
-}
+void traceError(char const* what, uError const& err) { ::trelm::traceError("FacebookSource", what, err); }
 
 // ---- Query dispatch ----
 
@@ -207,7 +193,8 @@ uError FacebookSource::sendConfigImpl(Configuration::Group const& group) {
         if (result.ok()) {
             result = info->setSessionConfig(sessionId, sessionSecret, user, false, false);
         } else {
-            info->invalidateSessionConfigWithoutUser(false);
+            // In memory only: nothing is sent, so nothing can fail.
+            info->invalidateSessionConfigWithoutUser(false).ignore();
             result = info->setUserConfig(user, false, false);
         }
     }
@@ -235,11 +222,9 @@ uError FacebookSource::startupImpl() {
     SmartPtr<FacebookLibrary::ConnectionInfo> info = connectionInfoRef();
     if (!info) return TRELM_ERROR_MSG(kNotSet, "source started before it was configured");
     auto library = makeSmart<FacebookLibrary>();
-    uError err = library->setup(info);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(library->setup(info));
     auto cache = makeSmart<MappingCache>();
-    err = cache->setup();
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(cache->setup());
     // Cursors opened before keep the previous client and cache.
     std::lock_guard<std::mutex> lock(mutex_);
     library_ = std::move(library);
@@ -273,8 +258,7 @@ uError FacebookSource::configurationChangedImpl(ConfigurationChangedMessage& msg
         haveExtendedApi = haveExtendedApi_;
     }
     if (useConfiguredSession) {
-        uError err = applySessionChange(msg, library);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(applySessionChange(msg, library));
     }
     if (!haveExtendedApi) return TRELM_OK();
     return applyLoginChange(msg, info, library);
@@ -353,29 +337,23 @@ uError FacebookSource::insertData(Record& record) {
 
     if (type == kStatus) {
         String text;
-        err = fieldRequiredNotEmpty(record, "core_event_text", text);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(fieldRequiredNotEmpty(record, "core_event_text", text));
         return library->setStatus(text, true);
     }
     if (type != kMedia) return TRELM_ERROR_MSG(kInvalid, "only status posts and photos can be inserted");
 
     String uri;
-    err = fieldRequiredNotEmpty(record, "media_uri", uri);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(fieldRequiredNotEmpty(record, "media_uri", uri));
     // Absent optional fields simply stay empty: no caption, the default album.
     bool present = false;
     String caption;
-    err = fieldOptional(record, "media_notes", present, caption);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(fieldOptional(record, "media_notes", present, caption));
     String albumId;
-    err = fieldOptional(record, "facebook_media_album_service_id", present, albumId);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(fieldOptional(record, "facebook_media_album_service_id", present, albumId));
     auto stream = makeSmart<InputDataStream>();
-    err = stream->setUri(uri);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(stream->setUri(uri));
     String photoId;
-    err = library->sendPhoto(stream, albumId, caption, photoId);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(library->sendPhoto(stream, albumId, caption, photoId));
     return record.insert("core_service_id", Variant(photoId));
 }
 
@@ -396,8 +374,7 @@ uError FacebookSource::retrieveData(GUID const& guid, Record& record, bool flag)
     // The stored record is shared with its cursor, which replaces records but never changes them,
     // so it can be read outside the cache's lock.
     for (auto const& [key, value] : *item) {
-        err = record.insert(key, value);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(record.insert(key, value));
     }
     return TRELM_OK();
 }
@@ -405,8 +382,7 @@ uError FacebookSource::retrieveData(GUID const& guid, Record& record, bool flag)
 uError FacebookSource::manageInputDataImpl(Record const& record, bool flag) {
     if (flag) return TRELM_ERROR(kDataOpNotSupported);
     int type = 0;
-    uError err = fieldRequired(record, "core_object_type", type);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(fieldRequired(record, "core_object_type", type));
     if (type == kStatus) return fieldRequiredStringNotEmpty(record, "core_event_text");
     if (type == kMedia) return fieldRequiredStringNotEmpty(record, "media_uri");
     return TRELM_ERROR(kInvalid);
@@ -418,8 +394,7 @@ uError FacebookSource::selectObjectType(Vector<IQueryItems::Constraint> const& c
                                         bool flag, String const& sourceName, int& type) {
     Set<int> candidates;
     for (CursorKind const& kind : kCursorKinds) {
-        uError err = candidates.insert(kind.type);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(candidates.insert(kind.type));
     }
 
     for (IQueryItems::Constraint const& c : constraints) {
@@ -433,7 +408,7 @@ uError FacebookSource::selectObjectType(Vector<IQueryItems::Constraint> const& c
                 for (int candidate : candidates) {
                     bool listed = false;
                     for (int w : wanted) listed = listed || w == candidate;
-                    if (listed) kept.insert(candidate);
+                    if (listed) TRELM_RETURN_IF_ERROR(kept.insert(candidate));
                 }
                 candidates = std::move(kept);
             } else if (c.function == IQueryItems::Constraint::Equal) {
@@ -444,7 +419,7 @@ uError FacebookSource::selectObjectType(Vector<IQueryItems::Constraint> const& c
                 if (findKind(wanted) != nullptr) {
                     bool const had = candidates.contains(wanted);
                     candidates.clear();
-                    if (had) candidates.insert(wanted);
+                    if (had) TRELM_RETURN_IF_ERROR(candidates.insert(wanted));
                 }
             } else {
                 return TRELM_ERROR_MSG(kNotSupported, "unsupported comparison on core_object_type");

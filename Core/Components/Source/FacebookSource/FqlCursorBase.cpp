@@ -19,8 +19,7 @@ FacebookSource::FqlCursorBase::FqlCursorBase(SmartPtr<FacebookLibrary> library, 
 FacebookSource::FqlCursorBase::~FqlCursorBase() = default;
 
 uError FacebookSource::FqlCursorBase::getRow(RecordPtr& row) {
-    uError err = ensureLoaded();
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(ensureLoaded());
     if (position_ >= window_.size()) {
         if (window_.empty()) {
             row.reset();
@@ -167,8 +166,7 @@ uError FacebookSource::FqlCursorBase::jump(unsigned index) {
 }
 
 uError FacebookSource::FqlCursorBase::curRow(unsigned& index) {
-    uError err = ensureLoaded();
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(ensureLoaded());
     if (position_ >= window_.size()) return TRELM_ERROR(kNoData);
     // The window's own index is the answer when the window is known to start at the first row.
     if (!paged_ || atBeginning_) {
@@ -176,8 +174,7 @@ uError FacebookSource::FqlCursorBase::curRow(unsigned& index) {
         return TRELM_OK();
     }
     unsigned total = 0;
-    err = countRows(window_[position_], kUpTo, total);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(countRows(window_[position_], kUpTo, total));
     if (total == 0) return TRELM_ERROR_MSG(kNoData, "the current record is no longer in the result");
     index = total - 1;
     return TRELM_OK();
@@ -189,8 +186,7 @@ uError FacebookSource::FqlCursorBase::numRows(unsigned& count) {
         return TRELM_OK();
     }
     unsigned total = 0;
-    uError err = countRows(RecordPtr(), kAfter, total);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(countRows(RecordPtr(), kAfter, total));
     rowCount_ = total;
     rowCountKnown_ = true;
     count = total;
@@ -199,11 +195,9 @@ uError FacebookSource::FqlCursorBase::numRows(unsigned& count) {
 
 uError FacebookSource::FqlCursorBase::countRows(RecordPtr const& key, Direction direction, unsigned& total) {
     String query;
-    uError err = generateBaseQuery("''", key, direction, false, query);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(generateBaseQuery("''", key, direction, false, query));
     String type;
-    err = getObjectType(type);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(getObjectType(type));
     Vector<Map<String, String>> rows;
     total = 0;
     return library_->runFqlQuery(query, type, rows, 0, total);
@@ -221,24 +215,20 @@ uError FacebookSource::FqlCursorBase::refreshWindow(RecordPtr const& key, unsign
     if (err.failed()) return err;
     String query;
     if (!paged_) {
-        err = generateBaseQuery(fields, RecordPtr(), kAfter, true, query);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(generateBaseQuery(fields, RecordPtr(), kAfter, true, query));
     } else {
-        err = generateBaseQuery(fields, key, forward ? kAfter : kBefore, true, query);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(generateBaseQuery(fields, key, forward ? kAfter : kBefore, true, query));
         query += " limit ";
         query += String::from(static_cast<unsigned long long>(offset) + count);
     }
     String type;
-    err = getObjectType(type);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(getObjectType(type));
 
     // The answer is read whole and skipped here rather than by the parser, so that a refill that
     // overshoots the result can still keep the rows nearest to the wanted one.
     Vector<Map<String, String>> rows;
     unsigned total = 0;
-    err = library_->runFqlQuery(query, type, rows, 0, total);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(library_->runFqlQuery(query, type, rows, 0, total));
     total = rows.size();
 
     Vector<Map<String, String>> kept;
@@ -255,17 +245,14 @@ uError FacebookSource::FqlCursorBase::refreshWindow(RecordPtr const& key, unsign
     err = kept.reserve(last - first);
     if (err.failed()) return err;
     for (unsigned i = first; i < last; ++i) {
-        err = kept.pushBack(std::move(rows[i]));
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(kept.pushBack(std::move(rows[i])));
     }
 
     if (!kept.empty()) {
-        err = convertItems(kept, paged_ ? forward : true, convertError);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(convertItems(kept, paged_ ? forward : true, convertError));
     } else if (!key) {
         // Nothing at all from the start or the end: the result is empty.
-        err = clearWindow();
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(clearWindow());
     }
     windowLoaded_ = true;
     if (!paged_) {
@@ -296,8 +283,7 @@ uError FacebookSource::FqlCursorBase::convertItems(Vector<Map<String, String>> c
             return err;
         }
         if (err.code() == kNoData) continue;
-        err = fresh.pushBack(std::move(record));
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(fresh.pushBack(std::move(record)));
     }
     if (!forward) std::reverse(fresh.begin(), fresh.end());
 
@@ -307,15 +293,11 @@ uError FacebookSource::FqlCursorBase::convertItems(Vector<Map<String, String>> c
     for (RecordPtr& record : fresh) {
         Metadata::Key key;
         String serviceId;
-        err = getSid(record, key, serviceId);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(getSid(record, key, serviceId));
         GUID guid;
-        err = cache_->getGuid(tag_, MappingCache::SidMapKey(key, serviceId), true, guid);
-        if (err.failed()) return err;
-        err = record->insert(objectIdKey, Variant(guid));
-        if (err.failed()) return err;
-        err = cache_->setItem(tag_, key, record);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(cache_->getGuid(tag_, MappingCache::SidMapKey(key, serviceId), true, guid));
+        TRELM_RETURN_IF_ERROR(record->insert(objectIdKey, Variant(guid)));
+        TRELM_RETURN_IF_ERROR(cache_->setItem(tag_, key, record));
     }
     window_ = std::move(fresh);
     position_ = 0;
@@ -334,7 +316,8 @@ void FacebookSource::FqlCursorBase::setEmptyResult() {
 uError FacebookSource::FqlCursorBase::copyField(Map<String, String> const& row, String const& field,
                                                 String const& recordKey, RecordPtr& record) {
     TRELM_TYPES::TYPES type = TRELM_TYPES::STRING;
-    Metadata::getType(recordKey, type);  // an unregistered key is kept as text
+    // An unregistered key is kept as text.
+    Metadata::getType(recordKey, type).ignore();
     return copyField(row, field, recordKey, type, record);
 }
 

@@ -44,14 +44,11 @@ uError FacebookSource::MappingCache::getGuid(String const& tag, SidMapKey const&
     bool added = true;
     if (tagSet == nullptr) {
         Set<SidMapKey> fresh;
-        uError err = fresh.insert(key);
-        if (err.failed()) return err;
-        err = tagSids_.insert(tag, std::move(fresh));
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(fresh.insert(key));
+        TRELM_RETURN_IF_ERROR(tagSids_.insert(tag, std::move(fresh)));
     } else {
         unsigned const before = tagSet->size();
-        uError err = tagSet->insert(key);
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(tagSet->insert(key));
         added = tagSet->size() != before;
     }
 
@@ -67,8 +64,9 @@ uError FacebookSource::MappingCache::getGuid(String const& tag, SidMapKey const&
     if (err.failed()) {
         // Undo the tag's membership so that no tag holds a key that sidMap_ lacks.
         Set<SidMapKey>* set = tagSids_.search(tag);
-        set->remove(key);
-        if (set->empty()) tagSids_.remove(tag);
+        // Removing what was just inserted cannot fail: nothing is allocated.
+        set->remove(key).ignore();
+        if (set->empty()) tagSids_.remove(tag).ignore();
         return err;
     }
     guid = value.guid;
@@ -100,21 +98,19 @@ uError FacebookSource::MappingCache::setItem(String const& tag, Metadata::Key co
     if (!tagHeld) {
         if (tagSet == nullptr) {
             Set<GUID> fresh;
-            err = fresh.insert(guid);
-            if (err.failed()) return err;
-            err = tagObjs_.insert(tag, std::move(fresh));
-            if (err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(fresh.insert(guid));
+            TRELM_RETURN_IF_ERROR(tagObjs_.insert(tag, std::move(fresh)));
         } else {
-            err = tagSet->insert(guid);
-            if (err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(tagSet->insert(guid));
         }
     }
     err = objMap_.insert(guid, std::move(value));
     if (err.failed()) {
         if (!tagHeld) {
             Set<GUID>* set = tagObjs_.search(tag);
-            set->remove(guid);
-            if (set->empty()) tagObjs_.remove(tag);
+            // Removing what was just inserted cannot fail: nothing is allocated.
+            set->remove(guid).ignore();
+            if (set->empty()) tagObjs_.remove(tag).ignore();
         }
         return err;
     }
@@ -137,8 +133,7 @@ uError FacebookSource::MappingCache::clearMapping(String const& tag) {
         SidMapValue* value = sidMap_.search(key);
         if (value == nullptr) continue;
         if (value->refCount <= 1) {
-            uError err = sidMap_.remove(key);
-            if (err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(sidMap_.remove(key));
         } else {
             --value->refCount;
         }
@@ -154,8 +149,7 @@ uError FacebookSource::MappingCache::clearItems(String const& tag) {
         ObjMapValue* value = objMap_.search(guid);
         if (value == nullptr) continue;
         if (value->refCount <= 1) {
-            uError err = objMap_.remove(guid);
-            if (err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(objMap_.remove(guid));
         } else {
             --value->refCount;
         }
@@ -171,8 +165,7 @@ uError FacebookSource::MappingCache::checkInvariants(Snapshot* snapshot) {
         for (SidMapKey const& key : keys) {
             if (!sidMap_.contains(key)) return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " holds an unmapped key");
             unsigned* n = sidHolders.search(key);
-            uError err = sidHolders.insert(key, n ? *n + 1 : 1u);
-            if (err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(sidHolders.insert(key, n ? *n + 1 : 1u));
         }
     }
     for (auto const& [key, value] : sidMap_) {
@@ -187,8 +180,7 @@ uError FacebookSource::MappingCache::checkInvariants(Snapshot* snapshot) {
         for (GUID const& guid : guids) {
             if (!objMap_.contains(guid)) return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " holds a missing record");
             unsigned* n = objHolders.search(guid);
-            uError err = objHolders.insert(guid, n ? *n + 1 : 1u);
-            if (err.failed()) return err;
+            TRELM_RETURN_IF_ERROR(objHolders.insert(guid, n ? *n + 1 : 1u));
         }
     }
     for (auto const& [guid, value] : objMap_) {

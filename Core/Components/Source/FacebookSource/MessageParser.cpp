@@ -31,8 +31,7 @@ uError MessageParser::answerStart(String const&) {
     if (path() == kMessage) {
         FacebookLibrary::MessageObj message;
         message.context = context_;
-        uError err = messages_->pushBack(std::move(message));
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(messages_->pushBack(std::move(message)));
         ++appended_;
         timeSent_ = String();
     }

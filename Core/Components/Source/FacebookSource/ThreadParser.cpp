@@ -26,8 +26,7 @@ FacebookLibrary::ThreadObj* ThreadParser::current() {
 
 uError ThreadParser::answerStart(String const&) {
     if (path() == kThread) {
-        uError err = threads_->pushBack(FacebookLibrary::ThreadObj());
-        if (err.failed()) return err;
+        TRELM_RETURN_IF_ERROR(threads_->pushBack(FacebookLibrary::ThreadObj()));
         ++appended_;
         lastUpdate_ = String();
     }
