@@ -1,11 +1,9 @@
 // Signing one service call, as the client does for every request:
-//   sign/makeSignature  the signature of a complete FQL call (its text built from the field map,
-//                       then hashed);
 //   sign/addAuth        the authentication fields added to the call and the signature made, under
 //                       the client mutex, as before every request;
-//   md5/bare            the baseline: md5Hex of the very text makeSignature hashes, built once.
+//   md5/bare            the baseline: md5Hex of the very text the client hashes, built once.
 // The call is a contact page statement of 200 characters with a session, so it carries "api_key",
-// "call_id", "method", "query", "session_key" and "v". run.sh prints both sign/ figures as a ratio
+// "call_id", "method", "query", "session_key" and "v". run.sh prints the sign/ figure as a ratio
 // to md5/bare.
 #include <benchmark/benchmark.h>
 
@@ -44,7 +42,7 @@ struct Signer {
     trelm::SmartPtr<FacebookLibrary> library = trelm::makeSmart<FacebookLibrary>();
     Map<String, String> call;  // method, v and query: what addAuth receives
     Map<String, String> signedCall;  // the same with the authentication fields, without "sig"
-    String text;  // what makeSignature hashes for signedCall
+    String text;  // what the client hashes for signedCall
 
     Signer() {
         auto info = trelm::makeSmart<FacebookLibrary::ConnectionInfo>("bench");
@@ -74,17 +72,6 @@ Signer& signer() {
     static Signer s;
     return s;
 }
-
-void BM_MakeSignature(benchmark::State& state) {
-    Signer& s = signer();
-    String sig;
-    for (auto _ : state) {
-        if (s.library->makeSignature(s.signedCall, sig).failed()) state.SkipWithError("makeSignature failed");
-        benchmark::DoNotOptimize(sig.cStr());
-    }
-    state.SetBytesProcessed(static_cast<int64_t>(state.iterations()) * s.text.size());
-}
-BENCHMARK(BM_MakeSignature)->Name("sign/makeSignature");
 
 void BM_AddAuth(benchmark::State& state) {
     Signer& s = signer();

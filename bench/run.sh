@@ -129,7 +129,6 @@ report() {
 
 echo
 printf "%-34s %13s%-10s %6s  %-34s %13s\n" figure value "" ratio baseline value
-report sign/makeSignature md5/bare cpu
 report sign/addAuth md5/bare cpu
 report parse/fql_users_150 expat/fql_users_150 cpu
 report parse/stream_posts_75 expat/stream_posts_75 cpu

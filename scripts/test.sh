@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # Installs the dependencies, builds everything with ASan+UBSan and runs every test; then builds the
-# concurrency tests with TSan and runs them again there.
+# concurrency tests with TSan and runs them again there; then checks the framework and the plug-in
+# with clang's thread-safety analysis.
 set -euo pipefail
 root=$(cd "$(dirname "$0")/.." && pwd)
 "$root/scripts/setup.sh"
@@ -16,3 +17,10 @@ cmake -S "$root" -B "$root/build/tsan" -G Ninja -DTRELM_SANITIZE=thread -DCMAKE_
 cmake --build "$root/build/tsan" -j "$jobs"
 export TSAN_OPTIONS=halt_on_error=1:second_deadlock_stack=1
 (cd "$root/build/tsan" && ctest --output-on-failure -j "$jobs" -L concurrency --timeout 300)
+
+# The lock annotations, checked: a clang build of the framework and the plug-in in which any
+# thread-safety warning is an error.
+cmake -S "$root" -B "$root/build/clang" -G Ninja -DCMAKE_BUILD_TYPE=Debug -DCMAKE_CXX_COMPILER=clang++ \
+  -DCMAKE_C_COMPILER=clang -DTRELM_BUILD_TESTS=OFF "-DCMAKE_CXX_FLAGS=-Wthread-safety -Werror=thread-safety" >/dev/null
+cmake --build "$root/build/clang" -j "$jobs" --target trelm trelmfacebook
+echo "thread-safety analysis: clean"

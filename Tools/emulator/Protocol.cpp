@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <exception>
+#include <iostream>
 #include <thread>
 
 namespace emu {
@@ -160,7 +161,11 @@ HttpReply Protocol::handle(const HttpCall& call) {
     Outcome outcome;
     try {
         outcome = process(call, method, faults);
-    } catch (const std::exception&) {
+    } catch (const std::exception& e) {
+        // An emulator fault, not a service error: said on stderr and in the request log, so that
+        // nobody takes the code-1 answer below for the service's behaviour.
+        std::cerr << "trelm-emulator: internal error in \"" << method << "\": " << e.what() << "\n";
+        if (logging) entry.internalError = e.what();
         outcome.error = serviceError(1);
     }
     HttpReply reply;

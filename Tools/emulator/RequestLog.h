@@ -26,6 +26,7 @@ struct LoggedRequest {
     int errorCode = 0;        // the service error answered; 0 for a success document
     int httpStatus = 200;     // the HTTP status answered; 0 when the connection was dropped
     std::string fault;        // the transport fault applied: "", "drop", "http_status", "truncate", "malformed"
+    std::string internalError;  // an emulator fault (exception text) the request ran into; answered as code 1
 };
 
 // A bounded log: when full, the oldest entry makes room. Thread safety: every member may be called

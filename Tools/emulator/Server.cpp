@@ -10,6 +10,7 @@
 #include <atomic>
 #include <chrono>
 #include <cstdlib>
+#include <iostream>
 
 #include <httplib.h>
 #include <openssl/ssl.h>
@@ -164,7 +165,10 @@ void Server::configure(httplib::Server& server, bool https) {
         HttpReply reply;
         try {
             reply = handler_(readCall(req, https));
-        } catch (const std::exception&) {
+        } catch (const std::exception& e) {
+            // An emulator fault outside the protocol's own handling: said before the bare 500.
+            std::cerr << "trelm-emulator: internal error answering " << req.method << " " << req.path << ": "
+                      << e.what() << "\n";
             reply = HttpReply{500, "internal error\n", "text/plain", HttpReply::Delivery::Whole};
         }
         deliver(req, res, std::move(reply));

@@ -24,6 +24,7 @@ nlohmann::json toJson(const emu::LoggedRequest& r) {
     j["https"] = r.https;
     if (r.hadFile) j["file_bytes"] = r.fileSize;
     if (r.errorCode != 0) j["error_code"] = r.errorCode;
+    if (!r.internalError.empty()) j["internal_error"] = r.internalError;
     j["http_status"] = r.httpStatus;
     if (!r.fault.empty()) j["fault"] = r.fault;
     return j;

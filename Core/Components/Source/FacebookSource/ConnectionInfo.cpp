@@ -76,29 +76,31 @@ uError FacebookLibrary::ConnectionInfo::setSessionConfig(String const& sessionId
                                                          String const& userId, bool storeSession,
                                                          bool storeLastUser) {
     setSessionInMemory(sessionId, sessionSecret, userId);
-    return this->storeSession(sessionId, sessionSecret, userId, storeSession, storeLastUser);
+    return ConnectionInfo::storeSession(configTag_, sessionId, sessionSecret, userId, storeSession, storeLastUser);
 }
 
 uError FacebookLibrary::ConnectionInfo::setUserConfig(String const& userId, bool storeUser, bool storeLastUser) {
     userId_ = userId;
     userSet_ = true;
-    if (storeUser) {
-        TRELM_RETURN_IF_ERROR(sendStore({Configuration::Value(kSessionUserKey, userId)}));
-    }
+    // A failed first store must not keep the last user from being stored: it is what tells a
+    // change of person at the next sign-in.
+    uError first = TRELM_OK();
+    if (storeUser) first = sendStore(configTag_, {Configuration::Value(kSessionUserKey, userId)});
     if (storeLastUser) {
-        TRELM_RETURN_IF_ERROR(sendStore({Configuration::Value(kLastUserKey, userId)}));
+        uError err = sendStore(configTag_, {Configuration::Value(kLastUserKey, userId)});
+        if (first.ok()) first = err;
     }
-    return TRELM_OK();
+    return first;
 }
 
 uError FacebookLibrary::ConnectionInfo::invalidateSessionConfigWithUser(bool store) {
     dropSessionInMemory(true);
-    return store ? storeSessionReset(true) : TRELM_OK();
+    return store ? storeSessionReset(configTag_, true) : TRELM_OK();
 }
 
 uError FacebookLibrary::ConnectionInfo::invalidateSessionConfigWithoutUser(bool store) {
     dropSessionInMemory(false);
-    return store ? storeSessionReset(false) : TRELM_OK();
+    return store ? storeSessionReset(configTag_, false) : TRELM_OK();
 }
 
 uError FacebookLibrary::ConnectionInfo::setWakeupComponents(Vector<String> const& components) {
@@ -130,14 +132,16 @@ void FacebookLibrary::ConnectionInfo::setSessionInMemory(String const& sessionId
     userSet_ = true;
 }
 
-uError FacebookLibrary::ConnectionInfo::storeSession(String const& sessionId, String const& sessionSecret,
-                                                     String const& userId, bool storeSession,
-                                                     bool storeLastUser) const {
+uError FacebookLibrary::ConnectionInfo::storeSession(String const& tag, String const& sessionId,
+                                                     String const& sessionSecret, String const& userId,
+                                                     bool storeSession, bool storeLastUser) {
     if (storeSession) {
-        TRELM_RETURN_IF_ERROR(sendStore({Configuration::Value(kSessionIdKey, sessionId), Configuration::Value(kSessionSecretKey, sessionSecret), Configuration::Value(kSessionUserKey, userId)}));
+        TRELM_RETURN_IF_ERROR(sendStore(tag, {Configuration::Value(kSessionIdKey, sessionId),
+                                              Configuration::Value(kSessionSecretKey, sessionSecret),
+                                              Configuration::Value(kSessionUserKey, userId)}));
     }
     if (storeLastUser) {
-        TRELM_RETURN_IF_ERROR(sendStore({Configuration::Value(kLastUserKey, userId)}));
+        TRELM_RETURN_IF_ERROR(sendStore(tag, {Configuration::Value(kLastUserKey, userId)}));
     }
     return TRELM_OK();
 }
@@ -152,24 +156,24 @@ void FacebookLibrary::ConnectionInfo::dropSessionInMemory(bool withUser) {
     }
 }
 
-uError FacebookLibrary::ConnectionInfo::storeSessionReset(bool withUser) const {
+uError FacebookLibrary::ConnectionInfo::storeSessionReset(String const& tag, bool withUser) {
     // "facebook_source_lastuser" is never reset: it is how a change of user is told later.
     Set<String> keys{kSessionIdKey, kSessionSecretKey};
     if (withUser) {
         TRELM_RETURN_IF_ERROR(keys.insert(kSessionUserKey));
     }
-    return sendReset(std::move(keys));
+    return sendReset(tag, std::move(keys));
 }
 
-uError FacebookLibrary::ConnectionInfo::sendStore(Set<Configuration::Value> values) const {
-    RuntimeConfigurationMessage msg(configTag_, std::move(values));
+uError FacebookLibrary::ConnectionInfo::sendStore(String const& tag, Set<Configuration::Value> values) {
+    RuntimeConfigurationMessage msg(tag, std::move(values));
     uError err = msg.send(kStoreComponent);
     if (err.failed()) return TRELM_WRAP(kFailure, err);
     return TRELM_OK();
 }
 
-uError FacebookLibrary::ConnectionInfo::sendReset(Set<String> keys) const {
-    ResetRuntimeConfigurationMessage msg(configTag_, std::move(keys));
+uError FacebookLibrary::ConnectionInfo::sendReset(String const& tag, Set<String> keys) {
+    ResetRuntimeConfigurationMessage msg(tag, std::move(keys));
     uError err = msg.send(kStoreComponent);
     if (err.failed()) return TRELM_WRAP(kFailure, err);
     return TRELM_OK();

@@ -26,9 +26,10 @@ namespace trelm {
 // missing session or user. Empty strings are legal values.
 //
 // Ownership: shared by SmartPtr between the data source and its FacebookLibrary.
-// Thread safety: no lock of its own. FacebookLibrary holds its client mutex while it reads the
-// credentials or changes the session; whoever else changes the settings (the data source, from
-// its message handling) must not do so while the client's calls run on other threads.
+// Thread safety: no lock of its own. Once FacebookLibrary::setup has taken an instance, it is
+// guarded by that client's mutex: the client holds it while it signs a request or changes the
+// session, and everyone else goes through FacebookLibrary::withSettings. Before that (while the
+// data source fills a fresh instance from its configuration) one thread owns it.
 class FacebookLibrary::ConnectionInfo {
 public:
     static constexpr char const* kSessionIdKey = "facebook_source_session_id";
@@ -65,7 +66,8 @@ public:
                             bool storeSession, bool storeLastUser);
 
     // Stores the user in memory (the session is left as it is); then, if `storeUser`, sends
-    // "facebook_source_session_user"; if `storeLastUser`, sends "facebook_source_lastuser".
+    // "facebook_source_session_user"; if `storeLastUser`, sends "facebook_source_lastuser". Both
+    // are sent even when the first fails; the first failure is returned.
     uError setUserConfig(String const& userId, bool storeUser, bool storeLastUser);
 
     // Drops session and user in memory; if `store`, resets the three session keys in the store.
@@ -85,23 +87,24 @@ public:
 
 private:
     // FacebookLibrary changes the session in memory under its client mutex and sends the store
-    // messages after releasing it, so it uses the two halves of the setters separately.
+    // messages after releasing it, so it uses the two halves of the setters separately. The
+    // sending halves are static: they need only the tag, never the guarded fields.
     friend class FacebookLibrary;
 
     void setSessionInMemory(String const& sessionId, String const& sessionSecret, String const& userId);
-    uError storeSession(String const& sessionId, String const& sessionSecret, String const& userId,
-                        bool storeSession, bool storeLastUser) const;
+    static uError storeSession(String const& tag, String const& sessionId, String const& sessionSecret,
+                               String const& userId, bool storeSession, bool storeLastUser);
     void dropSessionInMemory(bool withUser);
-    uError storeSessionReset(bool withUser) const;
+    static uError storeSessionReset(String const& tag, bool withUser);
 
-    // One "RuntimeConfigurationMessage" / "ResetRuntimeConfigurationMessage" under the tag.
-    uError sendStore(Set<Configuration::Value> values) const;
-    uError sendReset(Set<String> keys) const;
+    // One "RuntimeConfigurationMessage" / "ResetRuntimeConfigurationMessage" under `tag`.
+    static uError sendStore(String const& tag, Set<Configuration::Value> values);
+    static uError sendReset(String const& tag, Set<String> keys);
 
     // Constant after construction.
     String const configTag_;
 
-    // Not guarded here; see the class comment.
+    // Guarded by the client mutex once a FacebookLibrary has the instance; see the class comment.
     bool appSet_ = false;
     bool loginSet_ = false;
     bool userSet_ = false;

@@ -45,24 +45,22 @@ String trimmed(String const& text) {
 
 FacebookLibrary::FacebookLibrary() = default;
 
-FacebookLibrary::~FacebookLibrary() {
-    if (mutexCreated_) destroyMutex(&mutex_);
-}
+FacebookLibrary::~FacebookLibrary() = default;
 
 // ---- Settings, login and session ----
 
 uError FacebookLibrary::setup(SmartPtr<ConnectionInfo> info) {
     if (!info) return TRELM_ERROR(kInvalid);
     if (info_) return TRELM_ERROR(kInvalid);
-    if (initMutex(&mutex_) != 0) return TRELM_ERROR(kResource);
-    mutexCreated_ = true;
+    if (mutex_.init() != 0) return TRELM_ERROR(kResource);
+    info->getConfigTag(configTag_).ignore();  // always succeeds
     info_ = info;
     return TRELM_OK();
 }
 
 uError FacebookLibrary::getUserId(String& out) {
     if (!info_) return TRELM_ERROR(kNotSet);
-    MutexGuard guard(&mutex_);
+    MutexLock guard(mutex_);
     if (!guard.locked()) return TRELM_ERROR(kResource);
     return info_->getUserId(out);
 }
@@ -84,8 +82,7 @@ uError FacebookLibrary::getOldUserId(String const& configTag, String& oldUser) {
 
 uError FacebookLibrary::connect() {
     if (!info_) return TRELM_ERROR(kNotSet);
-    String tag;
-    info_->getConfigTag(tag).ignore();  // always succeeds
+    String const tag = configTag_;
     String oldUser;
     if (uError err = getOldUserId(tag, oldUser); err.failed()) {
         // Without the last user nobody can tell a change of person: go on as on a first sign-in.
@@ -109,7 +106,7 @@ uError FacebookLibrary::connectInternal(String& sessionId, String& sessionSecret
     String login;
     String password;
     {
-        MutexGuard guard(&mutex_);
+        MutexLock guard(mutex_);
         if (!guard.locked()) return TRELM_ERROR(kResource);
         uError err = info_->getLogin(login);
         if (err.ok()) err = info_->getPassword(password);
@@ -149,7 +146,7 @@ uError FacebookLibrary::connectInternal(String& sessionId, String& sessionSecret
         secret = *given;
     } else {
         // A session without a secret of its own is signed with the application's.
-        MutexGuard guard(&mutex_);
+        MutexLock guard(mutex_);
         if (!guard.locked()) return TRELM_ERROR(kResource);
         TRELM_RETURN_IF_ERROR(info_->getAppSecret(secret));
     }
@@ -158,17 +155,16 @@ uError FacebookLibrary::connectInternal(String& sessionId, String& sessionSecret
     sessionId = *key;
     sessionSecret = secret;
     {
-        MutexGuard guard(&mutex_);
+        MutexLock guard(mutex_);
         if (!guard.locked()) return TRELM_ERROR(kResource);
         info_->setSessionInMemory(sessionId, sessionSecret, userId);
     }
-    return info_->storeSession(sessionId, sessionSecret, userId, true, true);
+    return ConnectionInfo::storeSession(configTag_, sessionId, sessionSecret, userId, true, true);
 }
 
 uError FacebookLibrary::applySession(String const& sessionId, String const& sessionSecret, String const& userId) {
     if (!info_) return TRELM_ERROR(kNotSet);
-    String tag;
-    info_->getConfigTag(tag).ignore();  // always succeeds
+    String const tag = configTag_;
     String oldUser;
     if (uError err = getOldUserId(tag, oldUser); err.failed()) {
         note("reading the last user failed; no wipe will be sent", err);
@@ -176,13 +172,13 @@ uError FacebookLibrary::applySession(String const& sessionId, String const& sess
     }
 
     {
-        MutexGuard guard(&mutex_);
+        MutexLock guard(mutex_);
         if (!guard.locked()) return TRELM_ERROR(kResource);
         info_->setSessionInMemory(sessionId, sessionSecret, userId);
     }
     // The session came from elsewhere and stays in memory only; the last user is stored so that
     // a later sign-in can tell a change of person.
-    uError result = info_->storeSession(sessionId, sessionSecret, userId, false, true);
+    uError result = ConnectionInfo::storeSession(configTag_, sessionId, sessionSecret, userId, false, true);
     if (result.ok() && !oldUser.empty() && oldUser != userId) {
         if (uError err = sendWipes(true); err.failed()) note("telling the components of the new user failed", err);
     }
@@ -192,8 +188,7 @@ uError FacebookLibrary::applySession(String const& sessionId, String const& sess
 
 uError FacebookLibrary::resetAccount(bool store) {
     if (!info_) return TRELM_ERROR(kNotSet);
-    String tag;
-    info_->getConfigTag(tag).ignore();  // always succeeds
+    String const tag = configTag_;
     if (uError err = dropSession(true, store); err.failed()) note("forgetting the stored session failed", err);
     if (uError err = sendWipes(false); err.failed()) note("telling the components to wipe failed", err);
     sendLoginStatus(tag, kNotSignedIn, String());
@@ -202,12 +197,11 @@ uError FacebookLibrary::resetAccount(bool store) {
 
 uError FacebookLibrary::sendWipes(bool alsoWakeup) {
     if (!info_) return TRELM_ERROR(kNotSet);
-    String tag;
+    String const tag = configTag_;
     Vector<String> wipe;
     Vector<String> wakeup;
-    info_->getConfigTag(tag).ignore();  // always succeeds
     {
-        MutexGuard guard(&mutex_);
+        MutexLock guard(mutex_);
         if (!guard.locked()) return TRELM_ERROR(kResource);
         // Copying the lists always succeeds.
         info_->getWipeComponents(wipe).ignore();
@@ -239,11 +233,11 @@ void FacebookLibrary::sendLoginStatus(String const& tag, unsigned status, String
 
 uError FacebookLibrary::dropSession(bool withUser, bool store) {
     {
-        MutexGuard guard(&mutex_);
+        MutexLock guard(mutex_);
         if (!guard.locked()) return TRELM_ERROR(kResource);
         info_->dropSessionInMemory(withUser);
     }
-    return store ? info_->storeSessionReset(withUser) : TRELM_OK();
+    return store ? ConnectionInfo::storeSessionReset(configTag_, withUser) : TRELM_OK();
 }
 
 // ---- Service calls ----
@@ -333,7 +327,7 @@ uError FacebookLibrary::makeBaseArgs(String const& method, Map<String, String>& 
 
 uError FacebookLibrary::addAuth(Map<String, String>& args, bool withSession) {
     if (!info_) return TRELM_ERROR(kNotSet);
-    MutexGuard guard(&mutex_);
+    MutexLock guard(mutex_);
     if (!guard.locked()) return TRELM_ERROR(kResource);
 
     String appKey;

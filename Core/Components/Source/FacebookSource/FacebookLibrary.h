@@ -1,9 +1,8 @@
 #pragma once
 
-#include <pthread.h>
-
 #include "trelm/InputDataStream.h"
 #include "trelm/Map.h"
+#include "trelm/Mutex.h"
 #include "trelm/SmartPtr.h"
 #include "trelm/String.h"
 #include "trelm/Vector.h"
@@ -39,11 +38,14 @@ namespace trelm {
 // of them.
 //
 // Thread safety: after setup, the calls (runFqlQuery ... sendPhoto, runFacebookRequest) may run
-// on several threads at once. The client mutex is held only while one request's authentication
-// fields and signature are made (or while the client itself changes the session in memory), never
-// during an HTTP exchange or while a message is sent; so the call counter advances once per signed
-// request and the "call_id" values of concurrent calls are distinct. setup, connect, applySession
-// and resetAccount are called by the data source one at a time.
+// on several threads at once. The client mutex guards the call counter and every read or change
+// of the shared ConnectionInfo once setup has handed it over, by this client or by anyone else
+// (the data source changes settings through withSettings). It is held only while one request's
+// authentication fields and signature are made, or while settings are read or changed in memory;
+// never during an HTTP exchange or while a message is sent. So the call counter advances once per
+// signed request, the "call_id" values of concurrent calls are distinct, and no request is signed
+// with half-changed credentials. setup, connect, applySession and resetAccount are called by the
+// data source one at a time.
 class FacebookLibrary {
 public:
     // The account: application credentials, login, session and user, and the components to notify
@@ -112,6 +114,19 @@ public:
     // is stored. Wipes and wake-ups as for connect; announces the outcome the same way.
     uError applySession(String const& sessionId, String const& sessionSecret, String const& userId);
 
+    // Runs `use(ConnectionInfo&)` on the settings while holding the client mutex and returns its
+    // result; kNotSet before setup, kResource when the mutex can't be taken. This is how anyone
+    // but the client reads or changes the shared settings once cursors may be running. `use` must
+    // not send messages, make requests or call into this client (the mutex is not recursive);
+    // the setters it may call are the in-memory ones (store flags false).
+    template <typename Use>
+    uError withSettings(Use&& use) TRELM_EXCLUDES(mutex_) {
+        if (!info_) return TRELM_ERROR(kNotSet);
+        MutexLock guard(mutex_);
+        if (!guard.locked()) return TRELM_ERROR(kResource);
+        return use(*info_);
+    }
+
     // Forgets the session and the user (`store`: also in the runtime-configuration store), tells
     // the wipe list to wipe, wakes nobody, and announces status kNotSignedIn with an empty user.
     // "facebook_source_lastuser" is kept, so the same user signing in again wipes nothing.
@@ -161,14 +176,7 @@ public:
     // "call_id" (the next value of the client's counter: 1, 2, 3, ...), and "sig" last.
     // kNotSet without settings or application data; kNotSignedIn for a session call without a
     // session. Holds the client mutex throughout.
-    uError addAuth(Map<String, String>& args, bool withSession);
-
-    // The MD5, as 32 lowercase hex digits, of every "key=value" of `args` in the map's order, run
-    // together, followed by the secret: the session secret when a session is set and `args` holds
-    // "session_key", else the application secret. kNotSet without settings or application data.
-    // Reads the ConnectionInfo without locking: callers other than addAuth must not race with
-    // changes of the session.
-    uError makeSignature(Map<String, String> const& args, String& sig);
+    uError addAuth(Map<String, String>& args, bool withSession) TRELM_EXCLUDES(mutex_);
 
     // One HTTP exchange: a request from "HttpRequestFactory", `args` as form fields, `data` (when
     // not empty) as the uploaded file of a multipart body. kFailure when no request can be had or
@@ -192,19 +200,24 @@ public:
     static uError resolveBaseFacebookErrorCode(String const& serviceCode);
 
 private:
+    // The MD5, as 32 lowercase hex digits, of every "key=value" of `args` in the map's order, run
+    // together, followed by the secret: the session secret when a session is set and `args` holds
+    // "session_key", else the application secret. kNotSet without application data.
+    uError makeSignature(Map<String, String> const& args, String& sig) TRELM_REQUIRES(mutex_);
+
     // Drops the session in memory under the client mutex, then (store) resets it in the store.
     uError dropSession(bool withUser, bool store);
     // Announces a login status change to every component; a failed send is traced.
     void sendLoginStatus(String const& tag, unsigned status, String const& userId);
 
-    // Set once by setup, constant afterwards.
-    SmartPtr<ConnectionInfo> info_;
-    bool mutexCreated_ = false;
-
-    // The client mutex: guards callCounter_ and every read or change of info_'s credentials and
-    // session made by this client.
-    pthread_mutex_t mutex_;
-    unsigned callCounter_ = 0;
+    // The client mutex, made by setup: guards callCounter_ and the settings info_ points to.
+    Mutex mutex_;
+    // The pointer is set once by setup and constant afterwards; what it points to is shared with
+    // the data source and read or changed only under mutex_.
+    SmartPtr<ConnectionInfo> info_ TRELM_PT_GUARDED_BY(mutex_);
+    // The settings' configuration tag, copied by setup; constant afterwards.
+    String configTag_;
+    unsigned callCounter_ TRELM_GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace trelm

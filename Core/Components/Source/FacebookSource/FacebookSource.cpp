@@ -118,9 +118,9 @@ using InfoGetter = uError (Info::*)(String&) const;
 
 // Completes a pair of watched values (key and secret, login and password) for a setter: a member
 // not given keeps the value the settings hold, empty when they hold none. False when the pair is
-// to be left alone.
+// to be left alone; `readError` then holds why, when the settings could not be read.
 bool completePair(Info const& info, Watched const& first, Watched const& second, InfoGetter getFirst,
-                  InfoGetter getSecond, String& firstValue, String& secondValue) {
+                  InfoGetter getSecond, String& firstValue, String& secondValue, uError& readError) {
     if (first.state == Watched::Invalid || second.state == Watched::Invalid) return false;
     if (first.state == Watched::NotGiven && second.state == Watched::NotGiven) return false;
     struct Member {
@@ -136,7 +136,7 @@ bool completePair(Info const& info, Watched const& first, Watched const& second,
         String current;
         uError err = (info.*m.get)(current);
         if (err.failed() && err.code() != kNotSet) {
-            traceError("reading the current settings", err);
+            readError = err;
             return false;
         }
         m.out = current;
@@ -149,19 +149,19 @@ bool completePair(Info const& info, Watched const& first, Watched const& second,
 FacebookSource::FacebookSource(String name) : BaseSource(std::move(name), kComponentId) {}
 
 FacebookSource::~FacebookSource() {
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     mappingCache_.reset();
     library_.reset();
     connectionInfo_.reset();
 }
 
 SmartPtr<FacebookLibrary::ConnectionInfo> FacebookSource::connectionInfoRef() const {
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     return connectionInfo_;
 }
 
 void FacebookSource::startedRefs(SmartPtr<FacebookLibrary>& library, SmartPtr<MappingCache>& cache) const {
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     library = library_;
     cache = mappingCache_;
 }
@@ -209,7 +209,7 @@ uError FacebookSource::sendConfigImpl(Configuration::Group const& group) {
     if (result.ok()) result = info->setWakeupComponents(wakeup);
 
     // The settings object is published whole, so no other thread sees it half filled.
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     connectionInfo_ = info;
     bool extended = haveExtendedApi_;
     result = group.get(kHaveExtendedApi, extended, true);
@@ -226,7 +226,7 @@ uError FacebookSource::startupImpl() {
     auto cache = makeSmart<MappingCache>();
     TRELM_RETURN_IF_ERROR(cache->setup());
     // Cursors opened before keep the previous client and cache.
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     library_ = std::move(library);
     mappingCache_ = std::move(cache);
     return TRELM_OK();
@@ -238,6 +238,11 @@ uError FacebookSource::preMessageImpl(IMessage& msg) {
     if (msg.type() != IServiceSource::GetUserSidMessage::kType) return TRELM_OK();
     auto* request = dynamic_cast<IServiceSource::GetUserSidMessage*>(&msg);
     if (request == nullptr) return TRELM_ERROR_MSG(kInvalid, "message of another class");
+    SmartPtr<FacebookLibrary> library;
+    SmartPtr<MappingCache> cache;
+    startedRefs(library, cache);
+    // Once started, the settings are the client's and are read under its mutex.
+    if (library) return library->getUserId(request->result);
     SmartPtr<FacebookLibrary::ConnectionInfo> info = connectionInfoRef();
     if (!info) return TRELM_ERROR_MSG(kNotSet, "user id asked before the source was configured");
     return info->getUserId(request->result);
@@ -251,7 +256,7 @@ uError FacebookSource::configurationChangedImpl(ConfigurationChangedMessage& msg
     bool useConfiguredSession = false;
     bool haveExtendedApi = true;
     {
-        std::lock_guard<std::mutex> lock(mutex_);
+        StdMutexLock lock(mutex_);
         info = connectionInfo_;
         library = library_;
         useConfiguredSession = useConfiguredSession_;
@@ -297,20 +302,38 @@ uError FacebookSource::applyLoginChange(ConfigurationChangedMessage const& msg,
     uError err = readRuntimeConfiguration(name(), {kAppKey, kAppSecret, kLogin, kPassword}, values);
     if (err.failed()) return err;
 
-    String appKey, appSecret;
-    if (completePair(*info, readWatched(values, kAppKey), readWatched(values, kAppSecret), &Info::getAppKey,
-                     &Info::getAppSecret, appKey, appSecret)) {
-        err = info->setAppConfig(appKey, appSecret);
-        if (err.failed()) traceError("changing the application settings", err);
-    }
+    Watched const appKeyGiven = readWatched(values, kAppKey);
+    Watched const appSecretGiven = readWatched(values, kAppSecret);
+    Watched const loginGiven = readWatched(values, kLogin);
+    Watched const passwordGiven = readWatched(values, kPassword);
 
+    // The new account settings are worked out and written in one step, under the client's mutex
+    // once a client shares them: a cursor signing a request on another thread sees the old
+    // account or the new one, never a mix. Nothing in this step sends a message.
     String login, password;
-    if (completePair(*info, readWatched(values, kLogin), readWatched(values, kPassword), &Info::getLogin,
-                     &Info::getPassword, login, password)) {
-        err = info->setLoginConfig(login, password);
-        if (err.failed()) {
-            traceError("changing the login", err);
-        } else if (!library) {
+    bool loginChanged = false;
+    uError readError, appError, loginError;
+    auto change = [&](Info& settings) -> uError {
+        String appKey, appSecret;
+        if (completePair(settings, appKeyGiven, appSecretGiven, &Info::getAppKey, &Info::getAppSecret, appKey,
+                         appSecret, readError)) {
+            appError = settings.setAppConfig(appKey, appSecret);
+        }
+        if (completePair(settings, loginGiven, passwordGiven, &Info::getLogin, &Info::getPassword, login, password,
+                         readError)) {
+            loginError = settings.setLoginConfig(login, password);
+            loginChanged = loginError.ok();
+        }
+        return TRELM_OK();
+    };
+    err = library ? library->withSettings(change) : change(*info);
+    if (err.failed()) traceError("changing the account settings", err);
+    if (readError.failed()) traceError("reading the current settings", readError);
+    if (appError.failed()) traceError("changing the application settings", appError);
+    if (loginError.failed()) traceError("changing the login", loginError);
+
+    if (loginChanged) {
+        if (!library) {
             traceError("signing in", TRELM_ERROR_MSG(kNotSet, "the source is not started"));
         } else if (login.empty() && password.empty()) {
             err = library->resetAccount(true);

@@ -108,13 +108,13 @@ private:
     void startedRefs(SmartPtr<FacebookLibrary>& library, SmartPtr<MappingCache>& cache) const;
 
     // Guards the five fields below (not the objects they point to).
-    mutable std::mutex mutex_;
-    SmartPtr<FacebookLibrary::ConnectionInfo> connectionInfo_;
-    SmartPtr<FacebookLibrary> library_;
-    SmartPtr<MappingCache> mappingCache_;
-    bool haveExtendedApi_ = true;
+    mutable StdMutex mutex_;
+    SmartPtr<FacebookLibrary::ConnectionInfo> connectionInfo_ TRELM_GUARDED_BY(mutex_);
+    SmartPtr<FacebookLibrary> library_ TRELM_GUARDED_BY(mutex_);
+    SmartPtr<MappingCache> mappingCache_ TRELM_GUARDED_BY(mutex_);
+    bool haveExtendedApi_ TRELM_GUARDED_BY(mutex_) = true;
     // Always !haveExtendedApi_: the session comes from the configuration, not from a login.
-    bool useConfiguredSession_ = false;
+    bool useConfiguredSession_ TRELM_GUARDED_BY(mutex_) = false;
 };
 
 }  // namespace trelm

@@ -7,22 +7,19 @@ namespace trelm {
 
 FacebookSource::MappingCache::MappingCache() = default;
 
-FacebookSource::MappingCache::~MappingCache() {
-    if (mutexMade_) destroyMutex(&mutex_);
-}
+FacebookSource::MappingCache::~MappingCache() = default;
 
 uError FacebookSource::MappingCache::setup() {
-    if (mutexMade_) return TRELM_ERROR_MSG(kInvalid, "mapping cache set up twice");
-    if (initMutex(&mutex_) != 0) return TRELM_ERROR(kResource);
-    mutexMade_ = true;
+    if (mutex_.made()) return TRELM_ERROR_MSG(kInvalid, "mapping cache set up twice");
+    if (mutex_.init() != 0) return TRELM_ERROR(kResource);
     return TRELM_OK();
 }
 
-// Each operation below locks with a MutexGuard; a failure to lock is reported, never ignored,
+// Each operation below locks with a MutexLock; a failure to lock is reported, never ignored,
 // because running unlocked would break the invariants for every other user of the cache.
 #define TRELM_CACHE_LOCK(guard)                                                   \
-    if (!mutexMade_) return TRELM_ERROR_MSG(kNotSet, "mapping cache not set up"); \
-    MutexGuard guard(&mutex_);                                                    \
+    if (!mutex_.made()) return TRELM_ERROR_MSG(kNotSet, "mapping cache not set up"); \
+    MutexLock guard(mutex_);                                                         \
     if (!guard.locked()) return TRELM_ERROR(kResource)
 
 uError FacebookSource::MappingCache::getTag(String& tag) {

@@ -1,6 +1,6 @@
 #pragma once
 
-#include <pthread.h>
+#include "trelm/Mutex.h"
 
 #include "FacebookSource.h"
 #include "trelm/GUID.h"
@@ -122,15 +122,13 @@ public:
     uError checkInvariants(Snapshot* snapshot = nullptr);
 
 private:
-    // Constant after setup.
-    bool mutexMade_ = false;
-    // Guards sidMap_, objMap_, tagSids_, tagObjs_ and tagCounter_.
-    pthread_mutex_t mutex_;
-    Map<SidMapKey, SidMapValue> sidMap_;
-    Map<GUID, ObjMapValue> objMap_;
-    Map<String, Set<SidMapKey>> tagSids_;
-    Map<String, Set<GUID>> tagObjs_;
-    unsigned tagCounter_ = 0;
+    // Made by setup (made() is constant afterwards); guards the five members below.
+    Mutex mutex_;
+    Map<SidMapKey, SidMapValue> sidMap_ TRELM_GUARDED_BY(mutex_);
+    Map<GUID, ObjMapValue> objMap_ TRELM_GUARDED_BY(mutex_);
+    Map<String, Set<SidMapKey>> tagSids_ TRELM_GUARDED_BY(mutex_);
+    Map<String, Set<GUID>> tagObjs_ TRELM_GUARDED_BY(mutex_);
+    unsigned tagCounter_ TRELM_GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace trelm
