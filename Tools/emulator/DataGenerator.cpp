@@ -197,7 +197,9 @@ bool DataGenerator::makeUsers(std::string& error) {
     sqlite3_stmt* account = db_.prepareCached("INSERT INTO account(email, password, uid) VALUES (?, ?, ?)", error);
     return app && account &&
            insertRow(db_, app, error, DemoAccount::apiKey, DemoAccount::appSecret, "Trelm Demo", 1) &&
-           insertRow(db_, account, error, DemoAccount::email, DemoAccount::password, DemoAccount::uid);
+           insertRow(db_, account, error, DemoAccount::email, DemoAccount::password, DemoAccount::uid) &&
+           (uids_.size() < 2 ||
+            insertRow(db_, account, error, SecondAccount::email, SecondAccount::password, uids_[1]));
 }
 
 bool DataGenerator::makeFriends(std::string& error) {

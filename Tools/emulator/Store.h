@@ -21,6 +21,13 @@ struct DemoAccount {
     static constexpr std::int64_t uid = 100000001;
 };
 
+// A second account, for trying a change of user: the second generated user (any dataset of two
+// users or more has it), signing in to the same demo application.
+struct SecondAccount {
+    static constexpr const char* email = "second@trelm.example";
+    static constexpr const char* password = "second-password";
+};
+
 // Sizes of a generated dataset. The demo user always exists and has `demoFriends` friends; its
 // friends (and a few other users with content) get about `friendsPerUser` friends each. The same
 // seed and sizes give the same data.

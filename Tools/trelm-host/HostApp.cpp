@@ -3,6 +3,7 @@
 #include <CLI/CLI.hpp>
 
 #include "DemoTour.h"
+#include "ErrorText.h"
 #include "HostSession.h"
 #include "HostShell.h"
 #include "ItemCommands.h"
@@ -30,7 +31,7 @@ HostApp::HostApp(std::istream& in, std::ostream& out, std::ostream& err)
     : in_(in), out_(out), err_(err) {}
 
 void HostApp::report(uError const& error) {
-    err_ << "trelm-host: " << error.toText() << '\n';
+    err_ << "trelm-host: " << describeError(error, verbose_) << '\n';
 }
 
 int HostApp::run(int argc, char const* const* argv) {
@@ -59,6 +60,7 @@ int HostApp::run(int argc, char const* const* argv) {
         ->expected(1)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
     app.add_option("--ca-file", options.caFile, "PEM file of the CAs to trust");
+    app.add_flag("--verbose", verbose_, "errors also name the source file and line that made each level");
 
     CLI::App* state = app.add_subcommand("state", "change values of the runtime-configuration store");
     state->require_subcommand(1);
@@ -106,7 +108,7 @@ int HostApp::run(int argc, char const* const* argv) {
     if (shell->parsed()) {
         return runWithSource(options, [&](SourceClient& client, Printer& printer, HostSession&) {
             TRELM_RETURN_IF_ERROR(client.open());
-            int failures = HostShell(in_, out_, err_).run(client, printer);
+            int failures = HostShell(in_, out_, err_, verbose_).run(client, printer);
             if (failures == 0) return TRELM_OK();
             return TRELM_ERROR_MSG(kFailure, std::to_string(failures) + " shell command(s) failed");
         });

@@ -58,6 +58,7 @@ private:
     std::istream& in_;
     std::ostream& out_;
     std::ostream& err_;
+    bool verbose_ = false;  // --verbose: errors name their source locations
 };
 
 }  // namespace host

@@ -1,5 +1,7 @@
 #include "HostShell.h"
 
+#include "ErrorText.h"
+
 #include <unistd.h>
 
 #include <string>
@@ -11,8 +13,8 @@
 namespace trelm {
 namespace host {
 
-HostShell::HostShell(std::istream& in, std::ostream& out, std::ostream& err)
-    : in_(in), out_(out), err_(err) {}
+HostShell::HostShell(std::istream& in, std::ostream& out, std::ostream& err, bool verbose)
+    : in_(in), out_(out), err_(err), verbose_(verbose) {}
 
 int HostShell::run(SourceClient& client, Printer& printer) {
     bool const prompt = isatty(STDIN_FILENO) == 1 && &in_ == &std::cin;
@@ -45,7 +47,7 @@ int HostShell::run(SourceClient& client, Printer& printer) {
         if (commands.quitParsed()) break;
         uError e = commands.run(client, printer);
         if (e.failed()) {
-            err_ << "trelm-host: " << e.toText() << '\n';
+            err_ << "trelm-host: " << describeError(e, verbose_) << '\n';
             ++failures;
         }
     }

@@ -18,7 +18,8 @@ namespace host {
 // Lifetime: the streams must outlive the object. Thread safety: one thread.
 class HostShell {
 public:
-    HostShell(std::istream& in, std::ostream& out, std::ostream& err);
+    // `verbose`: errors name the source locations that made them.
+    HostShell(std::istream& in, std::ostream& out, std::ostream& err, bool verbose = false);
 
     // Returns the number of lines that failed (malformed or refused).
     // REQUIRES: client.open() succeeded.
@@ -28,6 +29,7 @@ private:
     std::istream& in_;
     std::ostream& out_;
     std::ostream& err_;
+    bool const verbose_;
 };
 
 }  // namespace host

@@ -23,6 +23,42 @@ bool sessionRefused(uError const& e) {
 
 }  // namespace
 
+uError SourceClient::checkPhotoFile(std::string const& path, std::filesystem::path& file) {
+    std::error_code ec;
+    std::filesystem::path const absolute = std::filesystem::absolute(path, ec);
+    std::filesystem::file_status const status = std::filesystem::status(absolute, ec);
+    if (ec || !std::filesystem::exists(status)) {
+        return TRELM_ERROR_MSG(kNotFound, "the photo " + path + " does not exist; give the path of an image file");
+    }
+    if (!std::filesystem::is_regular_file(status)) {
+        return TRELM_ERROR_MSG(kInvalid, "the photo " + path + " is not a regular file (a folder?); give an image file");
+    }
+    std::ifstream in(absolute, std::ios::binary);
+    if (!in) return TRELM_ERROR_MSG(kNotFound, "cannot read the photo " + path + "; check its permissions");
+    unsigned char head[12] = {};
+    in.read(reinterpret_cast<char*>(head), sizeof head);
+    std::streamsize const got = in.gcount();
+    if (got == 0) return TRELM_ERROR_MSG(kInvalid, "the photo " + path + " is empty; give an image file");
+    // The formats the service took: JPEG, PNG, GIF, BMP and TIFF, told by their first bytes.
+    auto starts = [&](std::initializer_list<unsigned char> magic) {
+        if (got < static_cast<std::streamsize>(magic.size())) return false;
+        unsigned i = 0;
+        for (unsigned char byte : magic) {
+            if (head[i++] != byte) return false;
+        }
+        return true;
+    };
+    bool const image = starts({0xff, 0xd8, 0xff}) || starts({0x89, 'P', 'N', 'G', '\r', '\n', 0x1a, '\n'}) ||
+                       starts({'G', 'I', 'F', '8'}) || starts({'B', 'M'}) || starts({'I', 'I', 42, 0}) ||
+                       starts({'M', 'M', 0, 42});
+    if (!image) {
+        return TRELM_ERROR_MSG(kInvalid, "the photo " + path +
+                                             " is not an image the service takes (JPEG, PNG, GIF, BMP or TIFF)");
+    }
+    file = absolute;
+    return TRELM_OK();
+}
+
 SourceClient::SourceClient(HostSession& session, Printer& printer)
     : session_(session), printer_(printer) {}
 
@@ -125,13 +161,10 @@ uError SourceClient::postStatus(String const& text) {
 
 uError SourceClient::uploadPhoto(std::string const& path, String const& caption, String const& albumId,
                                  String& serviceId) {
-    // The source reads the file only when the request goes out; a missing file is better told
-    // here, by its name.
-    std::error_code ec;
-    std::filesystem::path file = std::filesystem::absolute(path, ec);
-    if (ec || !std::ifstream(file, std::ios::binary)) {
-        return TRELM_ERROR_MSG(kNotFound, "cannot read the photo " + path);
-    }
+    // The source reads the file only when the request goes out; a file that cannot be a photo is
+    // better told here, by its name, before anything is sent.
+    std::filesystem::path file;
+    TRELM_RETURN_IF_ERROR(checkPhotoFile(path, file));
     Record record;
     uError e = record.insert("core_object_type", Variant(static_cast<int>(Metadata::Object::TYPE_MEDIA)));
     if (e.ok()) e = record.insert("media_uri", Variant(String(file.string())));

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <filesystem>
 #include <optional>
 #include <string>
 #include <vector>
@@ -47,6 +48,11 @@ public:
     SourceClient(SourceClient const&) = delete;
     SourceClient& operator=(SourceClient const&) = delete;
 
+    // Checks that `path` names a photo the service would take: kNotFound for a missing or
+    // unreadable file; kInvalid for a folder, an empty file or one whose first bytes are not
+    // those of a JPEG, PNG, GIF, BMP or TIFF image. `file` receives the absolute path.
+    static uError checkPhotoFile(std::string const& path, std::filesystem::path& file);
+
     // Takes the first configured component that is a data source and has started. When the
     // runtime store holds no session for it and its configuration allows, signs it in
     // (SourceSignIn); otherwise reports the stored session's user. Prints a login line either
@@ -64,8 +70,8 @@ public:
     uError postStatus(String const& text);
     // Inserts a photo (object type 9) from the local file `path` (made absolute), with an
     // optional caption ("media_notes") and album ("facebook_media_album_service_id"); `serviceId`
-    // receives the "core_service_id" the source writes back. kNotFound when the file cannot be
-    // read; kFailure when the source wrote back no id.
+    // receives the "core_service_id" the source writes back. Fails before any request, naming
+    // the file (checkPhotoFile); kFailure when the source wrote back no id.
     uError uploadPhoto(std::string const& path, String const& caption, String const& albumId,
                        String& serviceId);
     // BaseSource::retrieve of a record a still-open cursor produced; kNotFound from the source

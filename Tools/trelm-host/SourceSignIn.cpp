@@ -8,6 +8,7 @@
 
 #include "ConfigurationChangedMessage.h"
 #include "trelm/Configuration.h"
+#include "trelm/MD5.h"
 #include "trelm/Set.h"
 #include "trelm/Trace.h"
 
@@ -21,6 +22,8 @@ char const* const kHandedOver[] = {"facebook_source_appkey", "facebook_source_ap
 char const* const kLogin = "facebook_source_login";
 char const* const kExtendedApi = "haveExtendedApi";
 char const* const kSessionId = "facebook_source_session_id";
+char const* const kAppKey = "facebook_source_appkey";
+char const* const kSessionAccount = "trelm_host_session_account";
 
 // Collects the trace lines written while it lives (the source traces why a sign-in failed and
 // keeps only the code for its announcement), passing them on to the sink it replaced. The lines
@@ -70,10 +73,23 @@ private:
     std::shared_ptr<State> const state_;
 };
 
-String hex(unsigned code) {
-    char text[16];
-    std::snprintf(text, sizeof text, "0x%08x", code);
-    return String(text);
+// Names the account a session belongs to without keeping the login itself in the store.
+String accountFingerprint(HostConfig::ComponentEntry const& entry) {
+    String appKey, login;
+    if (Variant const* v = entry.config.search(kAppKey)) v->as(appKey).ignore();  // absent: empty
+    if (Variant const* v = entry.config.search(kLogin)) v->as(login).ignore();
+    return md5Hex(appKey + "\n" + login);
+}
+
+// The source traces why a sign-in failed; the part a user can act on is the service's own answer
+// ("service error 100: ..."), which the client puts in its error's message. Empty when the trace
+// holds none (a transport failure, for one).
+String serviceExplanation(String const& traced) {
+    unsigned const at = traced.find("service error ");
+    if (at == String::npos) return String();
+    unsigned end = traced.find('\n', at);
+    if (end == String::npos) end = traced.size();
+    return traced.substr(at, end - at);
 }
 
 }  // namespace
@@ -94,10 +110,14 @@ bool SourceSignIn::possible() const {
 uError SourceSignIn::sessionStored(bool& stored) const {
     Map<String, Variant> values;
     uError e = values.insert(kSessionId, Variant());
+    if (e.ok()) e = values.insert(kSessionAccount, Variant());
     if (e.ok()) e = host_.runtimeConfiguration().get(entry_.name, values);
     if (e.failed()) return TRELM_WRAP_MSG(kFailure, e, "cannot read the stored session of " + entry_.name);
-    String session;
+    String session, account;
     stored = values.search(kSessionId)->as(session).ok() && !session.empty();
+    if (stored && possible()) {
+        stored = values.search(kSessionAccount)->as(account).ok() && account == accountFingerprint(entry_);
+    }
     return TRELM_OK();
 }
 
@@ -112,7 +132,7 @@ uError SourceSignIn::signIn(LoginListener::Status& status) {
         if (e.failed()) return e;
     }
     RuntimeConfiguration& store = host_.runtimeConfiguration();
-    uError e = store.store(entry_.name, values);
+    uError e = store.hold(entry_.name, values);
     if (e.failed()) return TRELM_WRAP_MSG(kFailure, e, "cannot hand the login settings to " + entry_.name);
 
     std::size_t const before = listener_.count();
@@ -123,11 +143,8 @@ uError SourceSignIn::signIn(LoginListener::Status& status) {
         e = changed.send(entry_.name);
         traced = capture.text();
     }
-    uError const removed = store.reset(entry_.name, keys);
+    store.release(entry_.name, keys);
     if (e.failed()) return TRELM_WRAP_MSG(kFailure, e, "the settings change was refused by " + entry_.name);
-    if (removed.failed()) {
-        return TRELM_WRAP_MSG(kFailure, removed, "cannot remove the handed-over settings of " + entry_.name);
-    }
 
     std::vector<LoginListener::Status> announced = listener_.since(before, entry_.name);
     if (announced.empty()) {
@@ -135,9 +152,12 @@ uError SourceSignIn::signIn(LoginListener::Status& status) {
     }
     status = announced.back();
     if ((status.code & 0x80000000u) != 0) {
-        return TRELM_WRAP_MSG(kFailure, TRELM_ERROR_MSG(status.code, "refused" + traced),
-                              "the sign-in of " + entry_.name + " failed with " + hex(status.code));
+        return TRELM_WRAP_MSG(kFailure, TRELM_ERROR_MSG(status.code, serviceExplanation(traced)),
+                              "the sign-in of " + entry_.name + " failed");
     }
+    // The session now stored belongs to this account.
+    e = store.store(entry_.name, {Configuration::Value(kSessionAccount, Variant(accountFingerprint(entry_)))});
+    if (e.failed()) return TRELM_WRAP_MSG(kFailure, e, "cannot note which account the session of " + entry_.name + " belongs to");
     return TRELM_OK();
 }
 

@@ -17,10 +17,12 @@ namespace host {
 // source reads them back, logs in over HTTPS, keeps the session in the store and broadcasts
 // "ILoginStatus::LoginStatusMessage", which the LoginListener records.
 //
-// The handed-over keys are removed from the store again once the source has read them: the
-// configuration file stays the one place for them (a later edit of the file is not overridden
-// by a stale stored copy), and the password does not stay on disk. The session stays stored,
-// so the next start reuses it.
+// The handed-over keys are held by the store in memory only (RuntimeConfiguration::hold) and
+// released once the source has read them: the password and the application secret never reach
+// the state folder, even when the host is killed during the sign-in, and the configuration file
+// stays the one place for them. The session the source obtains is stored, so the next start
+// reuses it, together with a fingerprint of the account it was made for (application key and
+// login, "trelm_host_session_account"): a stored session of another account is never used.
 //
 // Lifetime: `host`, `listener` and `entry` must outlive the object.
 // Thread safety: used by the host's controlling thread.
@@ -33,7 +35,9 @@ public:
     // comes from the configuration, not from a login).
     bool possible() const;
 
-    // Whether the runtime store holds a session ("facebook_source_session_id") for the component.
+    // Whether the runtime store holds a session ("facebook_source_session_id") for the component
+    // that was made for the configured account. A session of another account (or of an unknown
+    // one) counts as none when the host can sign in (possible()).
     uError sessionStored(bool& stored) const;
 
     // Hands the keys over and asks the source to sign in. `status` receives the source's last

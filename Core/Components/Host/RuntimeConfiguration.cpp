@@ -209,10 +209,44 @@ uError RuntimeConfiguration::get(String const& tag, Map<String, Variant>& values
     }
     e = tx.commit();
     if (e.failed()) return e;
+    if (Map<String, String> const* held = held_.search(tag)) {
+        for (auto const& entry : values) {
+            if (String const* value = held->search(entry.first)) {
+                TRELM_RETURN_IF_ERROR(found.insert(entry.first, Variant(*value)));
+            }
+        }
+    }
     for (auto const& [key, value] : found) {
         TRELM_RETURN_IF_ERROR(values.insert(key, value));
     }
     return TRELM_OK();
+}
+
+uError RuntimeConfiguration::hold(String const& tag, Set<Configuration::Value> const& values) {
+    Map<String, String> texts;
+    for (Configuration::Value const& value : values) {
+        String text;
+        uError e = value.value().as(text);
+        if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "value of " + value.key() + " has no text form");
+        TRELM_RETURN_IF_ERROR(texts.insert(value.key(), text));
+    }
+    std::lock_guard<std::mutex> lock(mutex_);
+    Map<String, String>* held = held_.search(tag);
+    if (held == nullptr) {
+        TRELM_RETURN_IF_ERROR(held_.insert(tag, std::move(texts)));
+        return TRELM_OK();
+    }
+    for (auto const& [key, text] : texts) TRELM_RETURN_IF_ERROR(held->insert(key, text));
+    return TRELM_OK();
+}
+
+void RuntimeConfiguration::release(String const& tag, Set<String> const& keys) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    Map<String, String>* held = held_.search(tag);
+    if (held == nullptr) return;
+    // Removing cannot fail: nothing is allocated; an absent key is fine.
+    for (String const& key : keys) held->remove(key).ignore();
+    if (held->empty()) held_.remove(tag).ignore();
 }
 
 uError RuntimeConfiguration::sendConfigImpl(Configuration::Group const& group) {

@@ -57,6 +57,15 @@ public:
     uError reset(String const& tag, Set<String> const& keys);
     uError get(String const& tag, Map<String, Variant>& values);
 
+    // Values held in memory only, for handing settings to a component without persisting them (a
+    // password a settings screen passes on for one sign-in): get and
+    // "GetRuntimeConfigurationMessage" answer them ahead of the store; nothing writes them to the
+    // file, so they are gone when the process ends, however it ends. Replaces held values of the
+    // same keys; kInvalid (nothing held) for a value without a text form.
+    uError hold(String const& tag, Set<Configuration::Value> const& values);
+    // Forgets held values; keys not held are fine.
+    void release(String const& tag, Set<String> const& keys);
+
 protected:
     uError sendConfigImpl(Configuration::Group const& group) override;
     uError handleMessage(IMessage& msg) override;
@@ -66,8 +75,9 @@ private:
     void closeLocked();
     uError ensureOpenLocked();
 
-    // Guards db_, path_ and openFailed_ (and serialises every use of the connection).
+    // Guards db_, path_, openFailed_ and held_ (and serialises every use of the connection).
     std::mutex mutex_;
+    Map<String, Map<String, String>> held_;  // tag -> key -> value, see hold()
     sqlite3* db_ = nullptr;
     String path_;              // of the open store
     bool openFailed_ = false;  // the last open() failed

@@ -1,7 +1,12 @@
 // trelm-host's demo, item commands and shell, run as a user runs them against a service emulator
 // that the test starts itself (--no-emulator --connect-to ... --ca-file ...), so that what the
 // host did can be checked in the emulator's request log and data.
+#include <signal.h>
+#include <string.h>
+
 #include <filesystem>
+#include <fstream>
+#include <iterator>
 #include <map>
 #include <memory>
 #include <ostream>
@@ -23,7 +28,7 @@ using Row = std::map<std::string, std::string>;
 constexpr char const* kDemoUser = "100000001";
 
 // The demo account with only the data source, so that every request in the log is the source's.
-std::string configWithPassword(std::string const& password) {
+std::string configWithPassword(std::string const& password, std::string const& login = emu::DemoAccount::email) {
     json config = {
         {"components",
          json::array({{{"name", "facebook"},
@@ -31,7 +36,7 @@ std::string configWithPassword(std::string const& password) {
                        {"config",
                         {{"facebook_source_appkey", emu::DemoAccount::apiKey},
                          {"facebook_source_appsecret", emu::DemoAccount::appSecret},
-                         {"facebook_source_login", emu::DemoAccount::email},
+                         {"facebook_source_login", login},
                          {"facebook_source_password", password},
                          {"wipeComponents", json::array()},
                          {"wakeupComponents", json::array()},
@@ -54,14 +59,15 @@ protected:
     std::string stateDir() const { return runner_.folder() + "/state"; }
 
     // Runs the host against the test's emulator with JSON-lines output. No password may show.
-    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& input = {}) {
+    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& input = {},
+                               int signal = 0, int afterMs = 0, bool* signalled = nullptr) {
         std::vector<std::string> args{
             "--format", "json", "--state-dir", stateDir(), "--no-emulator",
             "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
             "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
             "--ca-file", emulator_->caFile(), "--config", config_, "--plugin", TRELMFACEBOOK_MODULE};
         args.insert(args.end(), command.begin(), command.end());
-        ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args, input);
+        ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args, input, signal, afterMs, signalled);
         for (std::string const& text : {result.out, result.err}) {
             EXPECT_EQ(text.find(emu::DemoAccount::password), std::string::npos) << text;
         }
@@ -259,6 +265,7 @@ TEST_P(RefusedCommandTest, ExitsNonZeroAndSaysWhy) {
     EXPECT_EQ(result.out.find(c.password), std::string::npos) << result.out;
     EXPECT_TRUE(linesOfType(result, "record").empty());
     EXPECT_TRUE(linesOfType(result, "inserted").empty());
+    EXPECT_TRUE(requests("photos.upload").empty()) << "a refused photo is refused before any request";
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -267,7 +274,7 @@ INSTANTIATE_TEST_SUITE_P(
         RefusedCase{"QueryForAnotherSource",
                     {"query", "contacts", "--where", "core_object_source=elsewhere"},
                     3,
-                    {"facebook cannot list contacts", "caused by 0x80000002"}},
+                    {"facebook cannot list contacts", "caused by: query for another source: this is not supported [0x80000002]"}},
         RefusedCase{"ConditionWithoutOperator",
                     {"query", "contacts", "--where", "core_contact_name"},
                     3,
@@ -276,12 +283,73 @@ INSTANTIATE_TEST_SUITE_P(
         RefusedCase{"MissingPhotoFile",
                     {"insert", "photo", "/nonexistent/photo.png"},
                     3,
-                    {"0x80000006", "cannot read the photo /nonexistent/photo.png"}},
+                    {"the photo /nonexistent/photo.png does not exist", "[0x80000006]"}},
+        RefusedCase{"PhotoIsAFolder", {"insert", "photo", "/"}, 3, {"the photo / is not a regular file", "[0x80000004]"}},
+        RefusedCase{"EmptyPhotoFile",
+                    {"insert", "photo", TRELM_TEST_DATA_DIR "/empty-photo.jpg"},
+                    3,
+                    {"empty-photo.jpg is empty", "[0x80000004]"}},
+        RefusedCase{"PhotoThatIsNoImage",
+                    {"insert", "photo", TRELM_TEST_DATA_DIR "/xml/error_response.xml"},
+                    3,
+                    {"error_response.xml is not an image the service takes (JPEG, PNG, GIF, BMP or TIFF)",
+                     "[0x80000004]"}},
         RefusedCase{"WrongPassword",
                     {"query", "contacts"},
                     3,
-                    {"the sign-in of facebook failed with 0x8000001c"},
+                    {"the sign-in of facebook failed", "service error 100", "not signed in or the session expired; check facebook_source_login and facebook_source_password", "[0x8000001c]"},
                     "not-the-demo-password"}),
     [](auto const& info) { return std::string(info.param.name); });
+
+// A host stopped while it signs in (the service holds the login answer back) leaves no credential
+// in its state folder: the settings it hands to the source are held in memory only.
+class StoppedSignInTest : public HostCommandsTest, public ::testing::WithParamInterface<int> {};
+
+TEST_P(StoppedSignInTest, LeavesNeitherPasswordNorApplicationSecretInTheStateFolder) {
+    emu::FaultRule slowLogin;
+    slowLogin.delayMs = 3000;
+    emulator_->faults().set("auth.login", slowLogin);
+    bool signalled = false;
+    host({"query", "contacts"}, {}, GetParam(), 1500, &signalled);
+    ASSERT_TRUE(signalled) << "the host ended before it could be stopped during its sign-in";
+    int files = 0;
+    for (auto const& entry : std::filesystem::recursive_directory_iterator(stateDir())) {
+        if (!entry.is_regular_file()) continue;
+        ++files;
+        std::ifstream in(entry.path(), std::ios::binary);
+        std::string const bytes((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+        EXPECT_EQ(bytes.find(emu::DemoAccount::password), std::string::npos) << entry.path();
+        EXPECT_EQ(bytes.find(emu::DemoAccount::appSecret), std::string::npos) << entry.path();
+    }
+    EXPECT_GT(files, 0) << "the state folder holds the host's store";
+}
+
+INSTANTIATE_TEST_SUITE_P(Signals, StoppedSignInTest, ::testing::Values(SIGKILL, SIGTERM, SIGINT, SIGHUP),
+                         [](auto const& info) { return std::string(sigabbrev_np(info.param)); });
+
+// A stored session belongs to the account it was made for: after the configured login changes,
+// the next command signs the new account in instead of acting with the old account's session.
+TEST_F(HostCommandsTest, ChangedLoginSignsTheNewAccountInInsteadOfUsingTheStoredSession) {
+    auto first = host({"query", "contacts", "--limit", "1"});
+    ASSERT_EQ(first.exitCode, 0) << first.err;
+    auto again = host({"query", "contacts", "--limit", "1"});
+    ASSERT_EQ(again.exitCode, 0) << again.err;
+    ASSERT_EQ(linesOfType(again, "login").at(0)["session"], "stored") << "the same account reuses its session";
+    ASSERT_EQ(requests("auth.login").size(), 1u);
+
+    useConfig(configWithPassword(emu::SecondAccount::password, emu::SecondAccount::email));
+    emulator_->log().clear();
+    auto other = host({"insert", "status", "posted by the second account"});
+    ASSERT_EQ(other.exitCode, 0) << other.err;
+    auto logins = linesOfType(other, "login");
+    ASSERT_EQ(logins.size(), 1u) << other.out;
+    EXPECT_EQ(logins[0]["session"], "new");
+    EXPECT_NE(logins[0]["user"], kDemoUser);
+    ASSERT_EQ(requests("auth.login").size(), 1u);
+    auto posts = requests("users.setStatus");
+    ASSERT_EQ(posts.size(), 1u);
+    EXPECT_NE(posts[0].args.at("session_key").find(logins[0]["user"].get<std::string>()), std::string::npos)
+        << "the status went out with the new account's session";
+}
 
 }  // namespace

@@ -117,7 +117,7 @@ INSTANTIATE_TEST_SUITE_P(
         BrokenPluginCase{"WithoutGetComponents", NO_ENTRY_PLUGIN,
                          {"0x80000006", "has no entry point getComponents"}},
         BrokenPluginCase{"FailingGetComponents", FAILING_PLUGIN,
-                         {"0x80000001", "getComponents of plug-in", "caused by 0x80000002"}}),
+                         {"0x80000001", "getComponents of plug-in", "caused by: this is not supported [0x80000002]"}}),
     [](auto const& info) { return std::string(info.param.name); });
 
 TEST_F(HostProgramTest, ComponentIdThatNoPluginOffersFailsTheRunButNotTheOthers) {

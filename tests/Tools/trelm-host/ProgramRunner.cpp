@@ -1,6 +1,7 @@
 #include "ProgramRunner.h"
 
 #include <fcntl.h>
+#include <signal.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -47,7 +48,8 @@ std::string ProgramRunner::writeFile(std::string const& name, std::string const&
 
 ProgramRunner::Result ProgramRunner::run(std::string const& program,
                                          std::vector<std::string> const& args,
-                                         std::string const& input) const {
+                                         std::string const& input, int signal, int afterMs,
+                                         bool* signalled) const {
     // A program never waits for a terminal: its input is a file, empty unless given.
     std::string inPath = writeFile("stdin", input);
     std::string outPath = folder_ + "/stdout";
@@ -82,7 +84,24 @@ ProgramRunner::Result ProgramRunner::run(std::string const& program,
     }
     Result result;
     int status = 0;
-    if (pid > 0 && waitpid(pid, &status, 0) == pid && WIFEXITED(status)) {
+    if (signalled != nullptr) *signalled = false;
+    if (pid > 0 && signal > 0) {
+        // Polls, so that a program that ends early is not waited for in full.
+        for (int waited = 0; waited < afterMs; waited += 10) {
+            if (waitpid(pid, &status, WNOHANG) == pid) {
+                pid = -pid;  // reaped
+                break;
+            }
+            usleep(10000);
+        }
+        if (pid > 0) {
+            kill(pid, signal);
+            if (signalled != nullptr) *signalled = true;
+        }
+    }
+    if (pid < 0) {
+        if (WIFEXITED(status)) result.exitCode = WEXITSTATUS(status);
+    } else if (pid > 0 && waitpid(pid, &status, 0) == pid && WIFEXITED(status)) {
         result.exitCode = WEXITSTATUS(status);
     }
     result.out = readAll(outPath);

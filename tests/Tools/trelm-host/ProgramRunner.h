@@ -24,8 +24,10 @@ public:
     std::string writeFile(std::string const& name, std::string const& text) const;
 
     // Runs `program` with `args`, `input` as its standard input, and waits for it to end.
+    // With `signal` > 0, the program is sent that signal `afterMs` milliseconds after it started
+    // (if it is still running then); `signalled` (optional) tells whether it was.
     Result run(std::string const& program, std::vector<std::string> const& args,
-               std::string const& input = {}) const;
+               std::string const& input = {}, int signal = 0, int afterMs = 0, bool* signalled = nullptr) const;
 
 private:
     std::string folder_;

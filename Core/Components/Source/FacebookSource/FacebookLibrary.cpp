@@ -41,6 +41,16 @@ String trimmed(String const& text) {
     return text.substr(begin, end - begin);
 }
 
+// The service's own account of a refusal, kept as the message of the translated error so that a
+// user reads why ("service error 104: Incorrect signature"); callers branch on the code alone.
+String serviceErrorText(Map<String, String> const& fields) {
+    String const* code = fields.search("error_code");
+    String const* message = fields.search("error_msg");
+    String text = "service error " + trimmed(code != nullptr ? *code : String());
+    if (message != nullptr && !message->empty()) text += ": " + *message;
+    return text;
+}
+
 }  // namespace
 
 FacebookLibrary::FacebookLibrary() = default;
@@ -129,8 +139,8 @@ uError FacebookLibrary::connectInternal(String& sessionId, String& sessionSecret
         int number = 0;
         if (trimmed(*code).to(number).failed()) return TRELM_ERROR(kFailure);
         // The service answers wrong credentials with "invalid parameter": a failed sign-in.
-        if (number == 100) return TRELM_ERROR(kNotSignedIn);
-        return resolveBaseFacebookErrorCode(*code);
+        if (number == 100) return TRELM_ERROR_MSG(kNotSignedIn, serviceErrorText(errorFields));
+        return TRELM_ERROR_MSG(resolveBaseFacebookErrorCode(*code).code(), serviceErrorText(errorFields));
     }
 
     Map<String, String> fields;
@@ -399,9 +409,11 @@ uError FacebookLibrary::sendRequestAndCheckErrors(Map<String, String> const& arg
 
     Map<String, String> fields;
     if (HashParseObj("error_response").parse(response, fields).failed()) return TRELM_OK();
-    // "error_msg" is the service's prose; callers branch on the code alone.
+    // "error_msg" is the service's prose, kept in the message for people; callers branch on the
+    // code alone.
     String const* code = fields.search("error_code");
     uError result = resolveBaseFacebookErrorCode(code ? *code : String());
+    if (result.code() != kFailure) result = TRELM_ERROR_MSG(result.code(), serviceErrorText(fields));
     if (result.code() == kNotSignedIn) {
         // The user is kept so that the next sign-in can tell whether the same person comes back.
         if (uError err = dropSession(false, true); err.failed()) note("forgetting the refused session failed", err);
