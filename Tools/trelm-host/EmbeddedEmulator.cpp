@@ -1,5 +1,7 @@
 #include "EmbeddedEmulator.h"
 
+#include <algorithm>
+#include <cstdint>
 #include <string>
 
 #ifdef TRELM_HOST_WITH_EMULATOR
@@ -24,8 +26,13 @@ EmbeddedEmulator::~EmbeddedEmulator() {
 
 bool EmbeddedEmulator::available() { return true; }
 
-uError EmbeddedEmulator::start() {
+uError EmbeddedEmulator::start(long long demoFriends) {
     emu::Emulator::Options options;
+    if (demoFriends > 0) {
+        options.generator.demoFriends = demoFriends;
+        // Room for the friends and for the other users that content and requests come from.
+        options.generator.users = std::max<std::int64_t>(options.generator.users, demoFriends * 2 + 100);
+    }
     options.bindAddress = "127.0.0.1";
     options.httpPort = 0;
     options.httpsPort = 0;
@@ -57,7 +64,7 @@ int EmbeddedEmulator::httpsPort() const { return emulator_->httpsPort(); }
 EmbeddedEmulator::EmbeddedEmulator() = default;
 EmbeddedEmulator::~EmbeddedEmulator() = default;
 bool EmbeddedEmulator::available() { return false; }
-uError EmbeddedEmulator::start() {
+uError EmbeddedEmulator::start(long long /*demoFriends*/) {
     return TRELM_ERROR_MSG(kNotSupported, "this trelm-host was built without the service emulator");
 }
 Vector<String> EmbeddedEmulator::connectTo() const { return {}; }

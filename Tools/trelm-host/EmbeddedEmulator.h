@@ -34,10 +34,11 @@ public:
     // False when the host was built without the emulator.
     static bool available();
 
-    // Fills an in-memory data set (the demo account and generated users) and starts the HTTP and
-    // HTTPS listeners. kFailure with the emulator's reason when it cannot; kNotSupported when the
+    // Fills an in-memory data set (the demo account and generated users; the demo user with
+    // `demoFriends` friends, the generator's default when 0) and starts the HTTP and HTTPS
+    // listeners. kFailure with the emulator's reason when it cannot; kNotSupported when the
     // emulator is not built in.
-    uError start();
+    uError start(long long demoFriends = 0);
 
     // REQUIRES: start() succeeded.
     // "api.facebook.com:80:127.0.0.1:<http port>" and the same for 443 and the HTTPS port.

@@ -60,6 +60,18 @@ int HostApp::run(int argc, char const* const* argv) {
         ->expected(1)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
     app.add_option("--ca-file", options.caFile, "PEM file of the CAs to trust");
+    app.add_option("--emulator-friends", options.emulatorFriends,
+                   "friends of the embedded emulator's demo user (1 to 100000; default 60)")
+        ->check(CLI::Range(1LL, 100000LL));
+    unsigned retries = options.pacing.attempts - 1;
+    app.add_option("--retries", retries,
+                   "times a step is tried again when the service throttles or is unavailable (0 to 20)")
+        ->default_val(retries)
+        ->check(CLI::Range(0u, 20u));
+    app.add_option("--retry-time", options.pacing.maxTotalSeconds,
+                   "seconds a step may wait out a throttled or unavailable service in all (0 to 3600)")
+        ->default_val(options.pacing.maxTotalSeconds)
+        ->check(CLI::Range(0.0, 3600.0));
     app.add_flag("--verbose", verbose_, "errors also name the source file and line that made each level");
 
     CLI::App* state = app.add_subcommand("state", "change values of the runtime-configuration store");
@@ -90,6 +102,7 @@ int HostApp::run(int argc, char const* const* argv) {
         return app.exit(e, out_, err_);
     }
     Printer::parseFormat(format, options.format);
+    options.pacing.attempts = retries + 1;
     if (emulatorFlag->count() > 0) options.emulator = emulator;
 
     if (stateSet->parsed()) return runStateSet(options, tag, key, value);

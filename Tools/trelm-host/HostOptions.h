@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "Pacing.h"
 #include "Printer.h"
 
 namespace trelm {
@@ -18,6 +19,8 @@ struct HostOptions {
     std::optional<bool> emulator;      // unset: on unless an endpoint is named
     std::vector<std::string> connectTo;  // replaces the routing when not empty
     std::string caFile;                // replaces the trusted CA file when not empty
+    long long emulatorFriends = 0;
+    Pacing pacing;                     // waits out a throttled or unavailable service     // friends of the embedded emulator's demo user; 0: its default
 };
 
 }  // namespace host

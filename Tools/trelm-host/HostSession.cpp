@@ -44,7 +44,7 @@ uError HostSession::prepareEndpoint(Printer& printer, Map<String, Variant>& http
         options_.emulator.value_or(!config_.namesEndpoint() && options_.connectTo.empty());
     uError e;
     if (useEmulator) {
-        e = emulator_.start();
+        e = emulator_.start(options_.emulatorFriends);
         if (e.ok()) e = http.insert("connect_to", Variant(emulator_.connectTo()));
         if (e.ok()) e = http.insert("ca_file", Variant(emulator_.caFile()));
         if (e.failed()) return e;

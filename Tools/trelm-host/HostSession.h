@@ -45,6 +45,7 @@ public:
     // The configuration file's entry of the component named `name`, or null.
     HostConfig::ComponentEntry const* entry(String const& name) const;
     HostConfig const& config() const noexcept { return config_; }
+    HostOptions const& options() const noexcept { return options_; }
     std::string const& stateDir() const noexcept { return stateDir_; }
 
 private:

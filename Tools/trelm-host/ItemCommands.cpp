@@ -31,10 +31,11 @@ std::string kindList() {
 ItemCommands::ItemCommands(CLI::App& app, bool shell) {
     query_ = app.add_subcommand("query", "list items of the data source");
     query_->add_option("type", type_, "the kind of items: " + kindList())->required()->check(CLI::IsMember(ItemQuery::kindNames()));
-    CLI::Option* limit = query_->add_option("--limit", limit_, "list at most N items")
+    // A cursor counts rows in 32 bits; a listing of more than a million rows is --all's job.
+    CLI::Option* limit = query_->add_option("--limit", limit_, "list at most N items (0 to 1000000)")
                              ->default_val(kDefaultLimit)
-                             ->check(CLI::NonNegativeNumber);
-    query_->add_option("--skip", skip_, "pass over the first N items")->check(CLI::NonNegativeNumber);
+                             ->check(CLI::Range(0u, 1000000u));
+    query_->add_option("--skip", skip_, "pass over the first N items (0 to 1000000)")->check(CLI::Range(0u, 1000000u));
     query_->add_option("--where", where_, "condition KEY=VALUE (also != < <= > >=; =A,B for a list)")
         ->expected(1)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);

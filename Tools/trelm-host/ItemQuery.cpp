@@ -133,6 +133,12 @@ uError ItemQuery::where(std::string const& text) {
     if (op == nullptr) return bad("needs an operator (= != < <= > >=)");
     String const key(text.substr(0, at));
     if (key.empty()) return bad("needs a key before the operator");
+    // A cursor reads one condition per key: a second one would be dropped without a word.
+    for (Constraint const& earlier : conditions_) {
+        if (earlier.key.name() == key) {
+            return bad(key.str() + " is already constrained by an earlier --where; give each key once");
+        }
+    }
     std::string const valueText = text.substr(at + std::char_traits<char>::length(op->text));
 
     // Keys the plug-ins did not register are compared as text.
@@ -182,23 +188,25 @@ uError ItemQuery::fill(IQueryItems::StartQueryMessage& msg) const {
     return TRELM_OK();
 }
 
-uError ItemQuery::walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows) const {
-    uError e = cursor.jumpBeginning();
+uError ItemQuery::walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows, StepRunner const& run) const {
+    // A failed cursor step leaves the cursor where it was, so a step can be tried again as it is.
+    auto step = [&](char const* what, std::function<uError()> const& op) { return run ? run(what, op) : op(); };
+    uError e = step("moving to the first row", [&] { return cursor.jumpBeginning(); });
     if (e.failed()) return e;
     for (unsigned i = 0; i < skip; ++i) {
         int moved = 0;
-        TRELM_RETURN_IF_ERROR(cursor.seek(1, moved));
+        TRELM_RETURN_IF_ERROR(step("passing over a row", [&] { return cursor.seek(1, moved); }));
         if (moved <= 0) return TRELM_OK();  // fewer rows than were to be passed over
     }
     while (!limit || rows.size() < *limit) {
         SmartPtr<Record> row;
-        e = cursor.getRow(row);
+        e = step("reading a row", [&] { return cursor.getRow(row); });
         if (e.failed()) return e;
         if (e.code() == kNoData || !row) break;
         rows.push_back(*row);
         if (limit && rows.size() >= *limit) break;
         int moved = 0;
-        TRELM_RETURN_IF_ERROR(cursor.seek(1, moved));
+        TRELM_RETURN_IF_ERROR(step("moving to the next row", [&] { return cursor.seek(1, moved); }));
         if (moved <= 0) break;
     }
     return TRELM_OK();

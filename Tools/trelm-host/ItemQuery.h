@@ -1,6 +1,7 @@
 #pragma once
 
 #include <optional>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -67,7 +68,9 @@ public:
     // until `limit` rows are listed or the cursor cannot move on. Moves are seek(1) steps, which
     // every cursor of the source supports. The cursor's failure is returned as it is; `rows`
     // then holds what was read before it.
-    uError walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows) const;
+    // Runs one cursor step (`what` names it for a report); the default runs it once.
+    using StepRunner = std::function<uError(char const* what, std::function<uError()> const& step)>;
+    uError walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows, StepRunner const& run = {}) const;
 
 private:
     Kind const* kind_;

@@ -1,6 +1,8 @@
 #include "SourceClient.h"
 
 #include <filesystem>
+#include <functional>
+#include <iostream>
 #include <fstream>
 #include <system_error>
 #include <utility>
@@ -100,6 +102,10 @@ uError SourceClient::signIn() {
     return e;
 }
 
+uError SourceClient::paced(char const* what, std::function<uError()> const& step) {
+    return session_.options().pacing.run(what, step, std::cerr);
+}
+
 template <class Operation>
 uError SourceClient::retrying(Operation operation) {
     uError e = operation();
@@ -122,16 +128,18 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
         cursor.reset();
         IQueryItems::StartQueryMessage msg;
         TRELM_RETURN_IF_ERROR(query.fill(msg));
-        TRELM_RETURN_IF_ERROR(source_->startQuery(msg, true));
+        TRELM_RETURN_IF_ERROR(paced("starting the query", [&] { return source_->startQuery(msg, true); }));
         if (!msg.cursor) {
             return TRELM_ERROR_MSG(kFailure, name_ + " answered the query without a cursor");
         }
         cursor = msg.cursor;
-        uError step = query.walk(*cursor, result.rows);
+        uError step = query.walk(*cursor, result.rows, [this](char const* what, std::function<uError()> const& op) {
+            return paced(what, op);
+        });
         if (step.failed()) return step;
         if (query.kind().countable) {
             unsigned total = 0;
-            TRELM_RETURN_IF_ERROR(cursor->numRows(total));
+            TRELM_RETURN_IF_ERROR(paced("counting the rows", [&] { return cursor->numRows(total); }));
             result.total = total;
         }
         return TRELM_OK();
@@ -145,9 +153,13 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
 
 uError SourceClient::insert(Record& record) {
     Record const original = record;
+    // The service refused a throttled or unavailable publishing call, so trying it again posts it
+    // once; each try is reported, so the user knows a post was sent again.
     return retrying([&]() -> uError {
-        record = original;
-        return source_->insert(record);
+        return paced("publishing the item", [&] {
+            record = original;
+            return source_->insert(record);
+        });
     });
 }
 

@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <filesystem>
+#include <functional>
 #include <optional>
 #include <string>
 #include <vector>
@@ -87,6 +88,8 @@ public:
 private:
     uError signIn();
     // Runs `operation`; after a refused session, signs in again and runs it once more.
+    // Runs `step` under the session's pacing, waits reported on standard error.
+    uError paced(char const* what, std::function<uError()> const& step);
     template <class Operation>
     uError retrying(Operation operation);
 

@@ -8,6 +8,7 @@
 #include <fstream>
 #include <iterator>
 #include <map>
+#include <set>
 #include <memory>
 #include <ostream>
 #include <string>
@@ -280,6 +281,11 @@ INSTANTIATE_TEST_SUITE_P(
                     3,
                     {"0x80000004", "needs an operator"}},
         RefusedCase{"UnknownItemType", {"query", "friends"}, 105, {"friends"}},
+        RefusedCase{"SameKeyConstrainedTwice",
+                    {"query", "contacts", "--where", "core_contact_name=A", "--where", "core_contact_name=B"},
+                    3,
+                    {"core_contact_name is already constrained by an earlier --where; give each key once"}},
+        RefusedCase{"LimitOutOfRange", {"query", "contacts", "--limit", "2000000"}, 105, {"--limit", "1000000"}},
         RefusedCase{"MissingPhotoFile",
                     {"insert", "photo", "/nonexistent/photo.png"},
                     3,
@@ -350,6 +356,43 @@ TEST_F(HostCommandsTest, ChangedLoginSignsTheNewAccountInInsteadOfUsingTheStored
     ASSERT_EQ(posts.size(), 1u);
     EXPECT_NE(posts[0].args.at("session_key").find(logins[0]["user"].get<std::string>()), std::string::npos)
         << "the status went out with the new account's session";
+}
+
+// A throttled or briefly unavailable service is waited out step by step: the listing completes
+// with every friend exactly once, and each wait is reported on standard error.
+TEST_F(HostCommandsTest, ThrottledOrUnavailableServiceIsWaitedOutAndTheListingCompletes) {
+    struct Case {
+        char const* name;
+        char const* fault;
+    };
+    for (Case const& c : {Case{"unavailable every third call", "fql.query:error=2,every=3"},
+                          Case{"request limit", "*:rate=4,burst=3"}}) {
+        SCOPED_TRACE(c.name);
+        emu::Emulator::Options options;
+        options.threads = 4;
+        options.generator.users = 2500;
+        options.generator.demoFriends = 1000;
+        emulator_ = std::make_unique<emu::Emulator>(options);
+        std::string error;
+        ASSERT_TRUE(emulator_->start(error)) << error;
+        std::string method;
+        emu::FaultRule rule;
+        ASSERT_TRUE(emu::Faults::parse(c.fault, method, rule, error)) << error;
+        emulator_->faults().set(method, rule);
+        std::filesystem::remove_all(stateDir());
+
+        auto result = host({"query", "contacts", "--all", "--retries", "20", "--retry-time", "120"});
+        ASSERT_EQ(result.exitCode, 0) << result.err;
+        std::set<std::string> ids;
+        for (json const& record : linesOfType(result, "record")) {
+            EXPECT_TRUE(ids.insert(record["fields"]["core_contact_service_id"].get<std::string>()).second);
+        }
+        EXPECT_EQ(ids.size(), 1000u);
+        EXPECT_NE(result.err.find("trying again in"), std::string::npos) << result.err;
+        int refused = 0;
+        for (emu::LoggedRequest const& r : emulator_->log().entries()) refused += r.errorCode == 2 || r.errorCode == 4;
+        EXPECT_GT(refused, 0) << "the fault was hit";
+    }
 }
 
 }  // namespace
