@@ -80,6 +80,10 @@ public:
 
 private:
     uError signIn();
+    // Friend requests carry only the requester's id ("core_event_contactid"); this sets
+    // "core_event_contactname" on each of `rows` from one contact query for those ids, so that a
+    // listing says who asked. The query's cursor is released at once; the last listing's is kept.
+    uError addContactNames(std::vector<Record>& rows);
     // Runs `operation`; after a refused session, signs in again and runs it once more.
     template <class Operation>
     uError retrying(Operation operation);
