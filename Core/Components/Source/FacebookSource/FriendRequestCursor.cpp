@@ -42,14 +42,9 @@ uError FriendRequestCursor::derivedStart() {
         {Metadata::Key(kServiceKey, TRELM_TYPES::STRING), true},
         {Metadata::Key(kServiceIdKey, TRELM_TYPES::STRING), true},
     };
-    if (columns_.size() < ordering.size()) {
-        return TRELM_ERROR_MSG(kInvalid, "friend requests are ordered by service and service id, ascending");
-    }
-    for (unsigned i = 0; i < ordering.size(); ++i) {
-        if (!(columns_[i] == ordering[i])) {
-            return TRELM_ERROR_MSG(kInvalid, "friend requests are ordered by service and service id, ascending");
-        }
-    }
+    bool served = columns_.size() >= ordering.size();
+    for (unsigned i = 0; served && i < ordering.size(); ++i) served = columns_[i] == ordering[i];
+    if (!served) return TRELM_ERROR_MSG(kInvalid, "friend requests are ordered by service and service id, ascending");
     for (IQueryItems::Constraint const& c : constraints_) {
         String const& name = c.key.name();
         if (name != "core_object_type" && name != "core_object_source") {

@@ -24,12 +24,6 @@ namespace trelm {
 // Ownership and thread safety: as FqlCursorBase.
 class FriendRequestCursor : public FacebookSource::FqlCursorBase {
 public:
-    // Kept for the requesters' contact details; nothing fills it yet.
-    struct ContactItem {
-        String uid;
-        String name;
-    };
-
     FriendRequestCursor(SmartPtr<FacebookLibrary> library, SmartPtr<FacebookSource::MappingCache> cache,
                         Vector<IQueryItems::Column> const& columns, Vector<IQueryItems::Constraint> const& constraints,
                         String const& sourceId, bool flag, bool paged);
@@ -37,7 +31,7 @@ public:
 
     uError getSchema(Vector<IQueryItems::Column>& columns) override;
 
-    // The requesters of the last converted window, in window order (for tests and tools).
+    // The requesters of the current window, in window order, gathered when it was converted.
     Vector<String> const& requesters() const noexcept { return requesters_; }
 
 protected:
@@ -53,7 +47,6 @@ protected:
 
 private:
     Vector<String> requesters_;
-    Map<String, ContactItem> contacts_;
 };
 
 }  // namespace trelm

@@ -48,14 +48,9 @@ MessageCursor::~MessageCursor() = default;
 
 uError MessageCursor::derivedStart() {
     Vector<IQueryItems::Column> const& ordering = fixedOrdering();
-    if (columns_.size() < ordering.size()) {
-        return TRELM_ERROR_MSG(kInvalid, "messages are ordered by time, service and service id, newest first");
-    }
-    for (unsigned i = 0; i < ordering.size(); ++i) {
-        if (!(columns_[i] == ordering[i])) {
-            return TRELM_ERROR_MSG(kInvalid, "messages are ordered by time, service and service id, newest first");
-        }
-    }
+    bool served = columns_.size() >= ordering.size();
+    for (unsigned i = 0; served && i < ordering.size(); ++i) served = columns_[i] == ordering[i];
+    if (!served) return TRELM_ERROR_MSG(kInvalid, "messages are ordered by time, service and service id, newest first");
 
     bool hasTime = false;
     bool inclusive = true;
