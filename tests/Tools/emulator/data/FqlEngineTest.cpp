@@ -171,11 +171,6 @@ TEST_F(FqlEngineTest, FriendRequestsPageByRequesterInTextOrder) {
                                 " ') order by concat(uid_from, ' ') asc limit 150"),
                      "uid_from"),
               after);
-
-    XmlNode root("fql_query_response");
-    ASSERT_FALSE(data_->store().fqlQuery(DemoAccount::uid, base + " order by concat(uid_from, ' ') asc limit 1", root));
-    ASSERT_EQ(root.children.size(), 1u);
-    EXPECT_EQ(root.children[0].name, "friend_info") << "the service names friend request rows friend_info";
 }
 
 TEST_F(FqlEngineTest, PhotoEventPagesWalkFriendsVisiblePhotosNewestFirst) {
