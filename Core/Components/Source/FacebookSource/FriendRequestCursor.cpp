@@ -66,7 +66,9 @@ uError FriendRequestCursor::generateBaseQuery(String const& fields, RecordPtr co
         String requester;
         TRELM_RETURN_IF_ERROR(value->as(requester));
         // The order key appends a blank to every id, so the key does too.
-        char const* comparison = direction == kAfter ? "uid_from > '" : direction == kUpTo ? "uid_from <= '" : "uid_from < '";
+        char const* comparison = direction == kAfter  ? "uid_from > '"
+                                 : direction == kUpTo ? "uid_from <= '"
+                                                      : "uid_from < '";
         text += " and (" + String(comparison) + requester + " ')";
     }
     if (ordered) {

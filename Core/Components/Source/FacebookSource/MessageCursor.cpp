@@ -144,7 +144,8 @@ uError MessageCursor::addMessageToList(FacebookLibrary::MessageObj const& messag
 
     static Metadata::Key const sidKey(kServiceIdKey, TRELM_TYPES::STRING);
     GUID guid;
-    TRELM_RETURN_IF_ERROR(cache_->getGuid(tag_, FacebookSource::MappingCache::SidMapKey(sidKey, serviceId), true, guid));
+    FacebookSource::MappingCache::SidMapKey const sid(sidKey, serviceId);
+    TRELM_RETURN_IF_ERROR(cache_->getGuid(tag_, sid, true, guid));
     TRELM_RETURN_IF_ERROR(record->insert("core_object_id", Variant(guid)));
     return messages_.insert(MessageOrder{message.timeSent, message.messageId}, std::move(record));
 }

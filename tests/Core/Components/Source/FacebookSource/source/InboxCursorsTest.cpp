@@ -91,7 +91,7 @@ protected:
         }
         for (auto& [id, t] : byId) {
             std::sort(t.messages.begin(), t.messages.end(),
-                      [](Message const& a, Message const& b) { return std::tie(b.time, b.seq) < std::tie(a.time, a.seq); });
+                      [](auto const& a, auto const& b) { return std::tie(b.time, b.seq) < std::tie(a.time, a.seq); });
             threads.push_back(t);
         }
         std::sort(threads.begin(), threads.end(), [](Thread const& a, Thread const& b) {
@@ -304,7 +304,7 @@ TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndTheSourceFieldsAndMoveF
 TEST_F(InboxCursorsTest, FriendRequestsComeOnceAcrossPagesWithKeysetStatements) {
     ASSERT_EQ(requesters.size(), 200u);
     std::vector<std::string> numeric = requesters;
-    std::sort(numeric.begin(), numeric.end(), [](auto const& a, auto const& b) { return std::stoll(a) < std::stoll(b); });
+    std::sort(numeric.begin(), numeric.end(), [](auto& a, auto& b) { return std::stoll(a) < std::stoll(b); });
     ASSERT_NE(numeric, requesters) << "text and numeric order of the requesters should differ";
 
     Cursor cursor;
@@ -346,7 +346,7 @@ TEST_F(InboxCursorsTest, OrderingsAndConstraintsTheCursorsDoNotServeFailBeforeAn
     ascendingTime[0].flag = true;
     Vector<Column> descendingRequests = kRequestOrdering;
     descendingRequests[0].flag = false;
-    Constraint const other{Metadata::Key("core_event_contactid", TRELM_TYPES::STRING), Variant("42"), Constraint::Equal};
+    Constraint const other{Metadata::Key("core_event_contactid", TRELM_TYPES::STRING), Variant("4"), Constraint::Equal};
     struct Case {
         char const* name;
         int type;
