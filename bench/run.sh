@@ -139,6 +139,24 @@ report engine/contact_page sqlite_xml/contact_page cpu
 report engine/count sqlite_xml/count cpu
 report http/contact_page engine/contact_page wall
 
+# The message cursor's peak resident memory over the bytes of its records' keys and values.
+if [ -f "$results/bench_message_memory.json" ]; then
+  awk '
+    function num(line) { sub(/^[^:]*: */, "", line); sub(/,$/, "", line); gsub(/"/, "", line); return line }
+    /"run_name":/       { agg = ""; err = 0; peak = bytes = ratio = "" }
+    /"aggregate_name":/ { agg = num($0) }
+    /"error_occurred":/ { err = 1 }
+    /"peak_rss":/       { peak = num($0) }
+    /"record_bytes":/   { bytes = num($0) }
+    /"rss_ratio":/      { ratio = num($0) }
+    /^    }/ {
+      if (!err && ratio != "" && (agg == "median" || agg == ""))
+        line = sprintf("%-34s %10.1f MB peak RSS %6.2f  %-34s %10.1f MB", "memory/message_cursor", peak / 1e6, ratio,
+                       "record keys and values", bytes / 1e6)
+    }
+    END { if (line != "") print line }' "$results/bench_message_memory.json"
+fi
+
 if [ ${#failed[@]} -gt 0 ]; then
   echo "run.sh: failed: ${failed[*]}" >&2
   exit 1

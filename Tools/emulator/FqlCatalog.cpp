@@ -76,6 +76,15 @@ constexpr FqlType I = FqlType::Integer;
 constexpr FqlType T = FqlType::Text;
 constexpr FqlType R = FqlType::Real;
 
+// "friend_request.uid_from" is stored as a number and answered and compared as text (ours): the
+// client pages through requests with a key condition "uid_from > '<id> '" next to the order
+// concat(uid_from, ' '), which only agree when the comparison is a text one.
+FqlColumn requesterColumn() {
+    FqlColumn c = stored("uid_from", T);
+    c.sql = "CAST($.uid_from AS TEXT)";
+    return c;
+}
+
 }  // namespace
 
 FqlCatalog::FqlCatalog() {
@@ -119,7 +128,7 @@ FqlCatalog::FqlCatalog() {
     });
     tables_.push_back(FqlTable{
         "friend_request",
-        {referencing(stored("uid_to", I, true), "user"), referencing(stored("uid_from", I), "user", "from_key"),
+        {referencing(stored("uid_to", I, true), "user"), referencing(requesterColumn(), "user", "from_key"),
          stored("time", I), stored("message", T), stored("unread", I)},
         {{"uid_to", "uid_from"}},
         {"uid_to", "uid_from"},

@@ -117,7 +117,9 @@ std::string hiddenTemplate(int bit, const std::string& inner) {
 
 FqlPlan FqlTranslator::translate(const FqlSelect& select) {
     FqlPlan plan;
-    plan.rowElement = select.table->name;
+    // Rows are named after their table, except those of "friend_request", which the service
+    // answered as "friend_info".
+    plan.rowElement = select.table->name == "friend_request" ? "friend_info" : select.table->name;
     Fragment out;
     buildSelect(select, &plan, false, out);
     plan.sql = std::move(out.sql);

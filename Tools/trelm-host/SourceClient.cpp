@@ -137,6 +137,9 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
             return paced(what, op);
         });
         if (step.failed()) return step;
+        if (query.kind().type == Metadata::Object::TYPE_FRIEND_REQUEST) {
+            TRELM_RETURN_IF_ERROR(addContactNames(result.rows));
+        }
         if (query.kind().countable) {
             unsigned total = 0;
             TRELM_RETURN_IF_ERROR(paced("counting the rows", [&] { return cursor->numRows(total); }));
@@ -148,6 +151,40 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
     cursor_ = std::move(cursor);
     listed_ = result.rows;
     listing = std::move(result);
+    return TRELM_OK();
+}
+
+uError SourceClient::addContactNames(std::vector<Record>& rows) {
+    static String const idKey("core_event_contactid");
+    static String const nameKey("core_event_contactname");
+    std::string ids;
+    for (Record const& row : rows) {
+        Variant const* id = row.search(idKey);
+        if (id == nullptr || row.contains(nameKey)) continue;
+        ids += (ids.empty() ? "" : ",") + id->asString().str();
+    }
+    if (ids.empty()) return TRELM_OK();
+    ItemQuery::Kind const* contactKind = ItemQuery::findKind(Metadata::Object::TYPE_CONTACT);
+    if (contactKind == nullptr) return TRELM_ERROR_MSG(kFailure, "no contact kind to look names up with");
+    ItemQuery contacts(*contactKind);
+    TRELM_RETURN_IF_ERROR(contacts.where("core_contact_service_id=" + ids));
+    IQueryItems::StartQueryMessage msg;
+    TRELM_RETURN_IF_ERROR(contacts.fill(msg));
+    TRELM_RETURN_IF_ERROR(source_->startQuery(msg, true));
+    if (!msg.cursor) return TRELM_ERROR_MSG(kFailure, name_ + " answered the name lookup without a cursor");
+    std::vector<Record> people;
+    TRELM_RETURN_IF_ERROR(contacts.walk(*msg.cursor, people));
+    Map<String, Variant> names;
+    for (Record const& person : people) {
+        Variant const* id = person.search("core_contact_service_id");
+        Variant const* name = person.search("core_contact_name");
+        if (id != nullptr && name != nullptr) TRELM_RETURN_IF_ERROR(names.insert(id->asString(), *name));
+    }
+    for (Record& row : rows) {
+        Variant const* id = row.search(idKey);
+        Variant const* name = id == nullptr ? nullptr : names.search(id->asString());
+        if (name != nullptr && !row.contains(nameKey)) TRELM_RETURN_IF_ERROR(row.insert(nameKey, *name));
+    }
     return TRELM_OK();
 }
 

@@ -87,6 +87,10 @@ public:
 
 private:
     uError signIn();
+    // Friend requests carry only the requester's id ("core_event_contactid"); this sets
+    // "core_event_contactname" on each of `rows` from one contact query for those ids, so that a
+    // listing says who asked. The query's cursor is released at once; the last listing's is kept.
+    uError addContactNames(std::vector<Record>& rows);
     // Runs `operation`; after a refused session, signs in again and runs it once more.
     // Runs `step` under the session's pacing, waits reported on standard error.
     uError paced(char const* what, std::function<uError()> const& step);

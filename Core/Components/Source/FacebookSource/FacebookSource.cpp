@@ -4,9 +4,11 @@
 
 #include "ContactCursor.h"
 #include "CursorBase.h"
+#include "FriendRequestCursor.h"
 #include "GetRuntimeConfigurationMessage.h"
 #include "GetUserSidMessage.h"
 #include "MappingCache.h"
+#include "MessageCursor.h"
 #include "trelm/InputDataStream.h"
 #include "trelm/Set.h"
 #include "trelm/Trace.h"
@@ -50,6 +52,14 @@ SmartPtr<CursorBase> makeContactCursor(CursorArgs const& a) {
     return makeSmart<ContactCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true, true);
 }
 
+SmartPtr<CursorBase> makeFriendRequestCursor(CursorArgs const& a) {
+    return makeSmart<FriendRequestCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true, true);
+}
+
+SmartPtr<CursorBase> makeMessageCursor(CursorArgs const& a) {
+    return makeSmart<MessageCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true);
+}
+
 // One object kind the source serves and the cursor that answers it.
 struct CursorKind {
     int type;               // "core_object_type"
@@ -66,8 +76,8 @@ constexpr CursorKind kCursorKinds[] = {
     {FacebookSource::kContact, true, false, &makeContactCursor},
     {FacebookSource::kAlbum, false, true, nullptr},
     {FacebookSource::kMedia, false, true, nullptr},
-    {FacebookSource::kFriendRequest, false, false, nullptr},
-    {FacebookSource::kMessage, true, false, nullptr},
+    {FacebookSource::kFriendRequest, false, false, &makeFriendRequestCursor},
+    {FacebookSource::kMessage, true, false, &makeMessageCursor},
     {FacebookSource::kPhotoTag, false, true, nullptr},
 };
 

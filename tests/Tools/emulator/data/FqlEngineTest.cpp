@@ -164,11 +164,9 @@ TEST_F(FqlEngineTest, FriendRequestsPageByRequesterInTextOrder) {
     const std::string base = "select uid_from from friend_request where (uid_to = '" + kMe + "')";
     EXPECT_EQ(uidsOf(data_->fql(base + " order by concat(uid_from, ' ') asc limit 150"), "uid_from"), requesters);
 
-    // The key condition compares a number with a text, so it compares numerically.
+    // uid_from compares as text, so the key condition agrees with the order.
     const std::int64_t key = requesters[2];
-    std::vector<std::int64_t> after;
-    for (std::int64_t r : requesters)
-        if (r > key) after.push_back(r);
+    const std::vector<std::int64_t> after(requesters.begin() + 3, requesters.end());
     EXPECT_EQ(uidsOf(data_->fql(base + " and (uid_from > '" + std::to_string(key) +
                                 " ') order by concat(uid_from, ' ') asc limit 150"),
                      "uid_from"),

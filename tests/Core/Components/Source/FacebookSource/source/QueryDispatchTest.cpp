@@ -126,6 +126,10 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
         } else if (c.type == FacebookSource::kContact) {
             EXPECT_EQ(started.code(), kSuccess) << started;
             EXPECT_NE(dynamic_cast<ContactCursor*>(msg.cursor.get()), nullptr);
+        } else if (c.type == FacebookSource::kFriendRequest) {
+            // The message gives no columns, so the cursor refuses to start without its ordering.
+            EXPECT_EQ(started.code(), kInvalid) << started;
+            EXPECT_FALSE(msg.cursor);
         } else {
             EXPECT_EQ(started.code(), kNotSupported) << started;
             EXPECT_FALSE(msg.cursor);

@@ -1,0 +1,376 @@
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <chrono>
+#include <ctime>
+#include <map>
+#include <set>
+#include <string>
+#include <thread>
+#include <tuple>
+#include <vector>
+
+#include "EmulatorHost.h"
+#include "ErrorAssertions.h"
+#include "IQueryItems.h"
+#include "trelm/GUID.h"
+
+namespace trelm::test {
+namespace {
+
+using Column = IQueryItems::Column;
+using Constraint = IQueryItems::Constraint;
+using Cursor = SmartPtr<IQueryItems::ICursor>;
+using Record = Map<String, Variant>;
+using Row = std::map<std::string, std::string>;
+using Request = std::tuple<std::string, std::string, int>;  // mailbox method, thread id, start
+
+constexpr char const* kSourceName = "facebook";
+std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
+std::string const kRequestBase = "select uid_from from friend_request where (uid_to = '" + kDemoUid + "')";
+std::string const kRequestOrder = " order by concat(uid_from, ' ')";
+
+struct Message {
+    int time;
+    int seq;  // place in its thread: orders equal times in the mailbox answers
+    std::string mid, tid, author, body;
+};
+struct Thread {
+    std::string tid;
+    int updated;
+    std::vector<Message> messages;  // as the service pages them, newest first
+};
+
+Column column(char const* key, TRELM_TYPES::TYPES type, bool flag) { return Column{Metadata::Key(key, type), flag}; }
+Vector<Column> const kMessageOrder{column("core_object_time", TRELM_TYPES::INT32, false),
+                                   column("core_event_service", TRELM_TYPES::STRING, false),
+                                   column("core_event_serviceid", TRELM_TYPES::STRING, false)};
+Vector<Column> const kRequestOrdering{column("core_event_service", TRELM_TYPES::STRING, true),
+                                      column("core_event_serviceid", TRELM_TYPES::STRING, true)};
+
+Constraint timeBound(Variant value, Constraint::Function function) {
+    return Constraint{Metadata::Key("core_object_time", TRELM_TYPES::INT32), std::move(value), function};
+}
+
+std::string text(Record const& record, char const* key) {
+    Variant const* v = record.search(key);
+    return v ? v->asString().str() : "<missing>";
+}
+
+// The demo user's mailbox of 45 threads of 60 messages (three pages of threads, two of messages
+// each) and 200 pending friend requests from users whose ids have 6 to 10 digits. The reference
+// copy is read through the FQL tables "thread" and "message", not the mailbox calls.
+class InboxCursorsTest : public ::testing::Test {
+protected:
+    static void SetUpTestSuite() {
+        emu::GeneratorOptions generator;
+        generator.users = 600;
+        generator.demoFriends = 50;
+        generator.friendsPerUser = 2;
+        generator.albumsPerUser = 0;
+        generator.postsPerUser = 0;
+        generator.friendRequests = 200;
+        generator.threadsPerUser = 45;
+        generator.messagesPerThread = 60;
+        host = new EmulatorHost(generator);
+        std::string error;
+        ASSERT_TRUE(host->start(error)) << error;
+        source = &host->addSource(host->demoGroup(kSourceName, true));
+
+        std::map<std::string, Thread> byId;
+        for (Row& r : fql("select thread_id, updated_time from thread where folder_id = 0", "thread"))
+            byId[r["thread_id"]] = Thread{r["thread_id"], std::stoi(r["updated_time"]), {}};
+        for (Row& r : fql("select message_id, thread_id, author_id, body, created_time from message where "
+                          "thread_id in (select thread_id from thread where folder_id = 0)",
+                          "message")) {
+            std::string const& mid = r["message_id"];
+            byId.at(r["thread_id"]).messages.push_back(Message{std::stoi(r["created_time"]),
+                                                               std::stoi(mid.substr(mid.find('_') + 1)), mid,
+                                                               r["thread_id"], r["author_id"], r["body"]});
+            names[r["author_id"]];
+        }
+        for (auto& [id, t] : byId) {
+            std::sort(t.messages.begin(), t.messages.end(),
+                      [](auto const& a, auto const& b) { return std::tie(b.time, b.seq) < std::tie(a.time, a.seq); });
+            threads.push_back(t);
+        }
+        std::sort(threads.begin(), threads.end(), [](Thread const& a, Thread const& b) {
+            return std::make_tuple(b.updated, std::stoll(b.tid)) < std::make_tuple(a.updated, std::stoll(a.tid));
+        });
+        for (auto& [uid, name] : names) name = fql("select name from user where uid = " + uid, "user").at(0)["name"];
+
+        requesters = host->fqlColumn(kRequestBase, "friend_info", "uid_from");
+        std::sort(requesters.begin(), requesters.end(), [](auto const& a, auto const& b) { return a + " " < b + " "; });
+    }
+
+    static void TearDownTestSuite() {
+        delete host;
+        host = nullptr;
+    }
+
+    void SetUp() override { host->emulator().log().clear(); }
+
+    static std::vector<Row> fql(std::string const& query, std::string const& rowElement) {
+        std::vector<Row> out;
+        Vector<Map<String, String>> rows;
+        unsigned count = 0;
+        EXPECT_OK(host->demoClient()->runFqlQuery(String(query), String(rowElement), rows, 0, count));
+        for (auto const& row : rows) {
+            Row& r = out.emplace_back();
+            for (auto const& [k, v] : row) r[k.str()] = v.str();
+        }
+        return out;
+    }
+
+    // Every message at or after the bound (after it when `exclusive`), newest first, equal times
+    // by descending id: "serviceid time author name body".
+    static std::vector<std::string> expectedMessages(int bound, bool exclusive) {
+        std::vector<Message> kept;
+        for (Thread const& t : threads)
+            for (Message const& m : t.messages)
+                if (m.time > bound || (m.time == bound && !exclusive)) kept.push_back(m);
+        std::sort(kept.begin(), kept.end(),
+                  [](Message const& a, Message const& b) { return std::tie(b.time, b.mid) < std::tie(a.time, a.mid); });
+        std::vector<std::string> out;
+        for (Message const& m : kept)
+            out.push_back(m.tid + "-" + m.mid + " " + std::to_string(m.time) + " " + m.author + " " + names[m.author] +
+                          " " + m.body);
+        return out;
+    }
+
+    // The mailbox requests of a reading that stops at the first thread and the first message older
+    // than the bound: pages of 20 threads and 50 messages, each offset grown by the page before,
+    // each list read until an empty page.
+    static std::vector<Request> expectedRequests(int bound, bool exclusive) {
+        auto older = [&](int t) { return t < bound || (t == bound && exclusive); };
+        std::vector<Request> requests;
+        for (size_t offset = 0;;) {
+            requests.emplace_back("mailbox.getInbox", "", static_cast<int>(offset));
+            size_t const end = std::min(threads.size(), offset + 20);
+            if (offset == end) return requests;
+            for (size_t i = offset; i < end; ++i) {
+                if (older(threads[i].updated)) return requests;
+                std::vector<Message> const& m = threads[i].messages;
+                for (size_t start = 0;;) {
+                    requests.emplace_back("mailbox.getThreadMessages", threads[i].tid, static_cast<int>(start));
+                    size_t const last = std::min(m.size(), start + 50);
+                    if (start == last || std::any_of(m.begin() + long(start), m.begin() + long(last),
+                                                     [&](Message const& x) { return older(x.time); }))
+                        break;
+                    start = last;
+                }
+            }
+            offset = end;
+        }
+    }
+
+    static std::vector<Request> loggedRequests() {
+        std::vector<Request> out;
+        for (emu::LoggedRequest const& r : host->emulator().log().entries()) {
+            std::size_t const at = r.method.find("mailbox.");
+            if (at == std::string::npos) continue;
+            std::string const method = r.method.substr(at);
+            EXPECT_EQ(r.args.at("limit"), method == "mailbox.getInbox" ? "20" : "50");
+            out.emplace_back(method, r.args.count("tid") ? r.args.at("tid") : "", std::stoi(r.args.at("start")));
+        }
+        return out;
+    }
+
+    static uError open(int type, Vector<Column> const& columns, std::vector<Constraint> const& extra, Cursor& cursor) {
+        Vector<Constraint> constraints{
+            Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(type), Constraint::Equal}};
+        for (Constraint const& c : extra) EXPECT_OK(constraints.pushBack(c));
+        IQueryItems::StartQueryMessage msg(columns, constraints);
+        uError err = source->onMessage(msg);
+        cursor = msg.cursor;
+        return err;
+    }
+
+    // Every record from the current row on, by getRow and seek(1).
+    static std::vector<Record> walk(Cursor const& cursor) {
+        std::vector<Record> rows;
+        for (int moved = 1; moved == 1;) {
+            SmartPtr<Record> row;
+            if (cursor->getRow(row).code() == kNoData) break;
+            rows.push_back(*row);
+            EXPECT_TRUE(cursor->seek(1, moved).ok());
+        }
+        return rows;
+    }
+
+    static EmulatorHost* host;
+    static FacebookSource* source;
+    static std::vector<Thread> threads;               // newest update first
+    static std::map<std::string, std::string> names;  // of the authors
+    static std::vector<std::string> requesters;       // in the friend request cursor's order
+};
+
+EmulatorHost* InboxCursorsTest::host = nullptr;
+FacebookSource* InboxCursorsTest::source = nullptr;
+std::vector<Thread> InboxCursorsTest::threads;
+std::map<std::string, std::string> InboxCursorsTest::names;
+std::vector<std::string> InboxCursorsTest::requesters;
+
+TEST_F(InboxCursorsTest, MessagesComeOnceNewestFirstAndATimeBoundStopsReadingAtTheFirstOlderOne) {
+    std::vector<std::string> const all = expectedMessages(0, false);
+    ASSERT_EQ(all.size(), 45u * 60u);
+    auto timeOf = [](std::string const& m) { return std::stoi(m.substr(m.find(' ') + 1)); };
+    ASSERT_NE(std::adjacent_find(all.begin(), all.end(), [&](auto& a, auto& b) { return timeOf(a) == timeOf(b); }),
+              all.end())
+        << "the mailbox should hold messages sent in the same second";
+    int const middle = timeOf(all[all.size() / 3]);
+    struct Case {
+        char const* name;
+        std::vector<Constraint> bound;
+        int time;
+        bool exclusive;
+    };
+    for (Case const& c : {Case{"no bound", {}, 0, false},
+                          Case{"at or after", {timeBound(Variant(middle), Constraint::GreaterOrEqual)}, middle, false},
+                          Case{"after", {timeBound(Variant(middle), Constraint::GreaterThan)}, middle, true},
+                          Case{"after the newest", {timeBound(Variant(threads[0].updated), Constraint::GreaterThan)},
+                               threads[0].updated, true}}) {
+        SCOPED_TRACE(c.name);
+        host->emulator().log().clear();
+        Cursor cursor;
+        ASSERT_OK(open(10, kMessageOrder, c.bound, cursor));
+        std::vector<Record> const rows = walk(cursor);
+        std::vector<std::string> got;
+        std::set<GUID> guids;
+        for (Record const& r : rows) {
+            got.push_back(text(r, "core_event_serviceid") + " " + text(r, "core_object_time") + " " +
+                          text(r, "core_event_contactid") + " " + text(r, "core_event_contactname") + " " +
+                          text(r, "core_event_text"));
+            guids.insert(r.search("core_object_id")->asGUID());
+        }
+        EXPECT_EQ(got, expectedMessages(c.time, c.exclusive));
+        EXPECT_EQ(guids.size(), rows.size()) << "every message has a GUID of its own";
+        unsigned count = 0;
+        EXPECT_OK(cursor->numRows(count));
+        EXPECT_EQ(count, rows.size());
+        EXPECT_EQ(loggedRequests(), expectedRequests(c.time, c.exclusive));
+        // One statement names every author once; no messages, no statement.
+        EXPECT_EQ(host->fqlStatements().size(), rows.empty() ? 0u : 1u);
+    }
+    // A message was sent at the bound: the two bounds differ on it.
+    EXPECT_NE(expectedMessages(middle, false).size(), expectedMessages(middle, true).size());
+}
+
+TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndTheSourceFieldsAndMoveForwardOnly) {
+    Cursor cursor;
+    ASSERT_OK(open(10, kMessageOrder, {}, cursor));
+    host->emulator().log().clear();
+    std::vector<std::string> const all = expectedMessages(0, false);
+    unsigned const n = static_cast<unsigned>(all.size());
+    auto idAt = [&]() {
+        SmartPtr<Record> row;
+        EXPECT_OK(cursor->getRow(row));
+        return row ? text(*row, "core_event_serviceid") : "";
+    };
+    auto idOf = [&](unsigned i) { return all[i].substr(0, all[i].find(' ')); };
+
+    SmartPtr<Record> first;
+    ASSERT_OK(cursor->getRow(first));
+    std::string const tid = idOf(0).substr(0, idOf(0).find('-'));
+    for (auto const& [key, value] : std::map<std::string, std::string>{
+             {"core_event_subject", "Subject " + tid}, {"core_event_service", "Facebook"},
+             {"core_object_type", "10"}, {"core_object_source", kSourceName},
+             {"core_object_origin_importcomponent", kSourceName}, {"core_object_origin_servicename", "Facebook"},
+             {"core_object_deleted", "false"}})
+        EXPECT_EQ(text(*first, key.c_str()), value) << key;
+
+    int moved = 0;
+    unsigned index = 0;
+    EXPECT_CODE(cursor->seek(-1, moved), kNotSupported);
+    ASSERT_OK(cursor->jump(n - 4));
+    EXPECT_OK(cursor->seek(5, moved));
+    EXPECT_EQ(moved, 3);
+    EXPECT_EQ(idAt(), idOf(n - 1));
+    EXPECT_OK(cursor->curRow(index));
+    EXPECT_EQ(index, n - 1);
+    ASSERT_OK(cursor->jump(n + 100));
+    EXPECT_EQ(idAt(), idOf(n - 1)) << "a jump past the end stops on the last row";
+
+    // getRows hands out the records from the current row on and does not move.
+    ASSERT_OK(cursor->jump(10));
+    Vector<SmartPtr<Record>> rows;
+    ASSERT_OK(cursor->getRows(3, rows));
+    ASSERT_EQ(rows.size(), 3u);
+    EXPECT_EQ(text(*rows[2], "core_event_serviceid"), idOf(12));
+    EXPECT_EQ(idAt(), idOf(10));
+    EXPECT_TRUE(host->emulator().log().entries().empty()) << "row operations never call the service";
+}
+
+TEST_F(InboxCursorsTest, FriendRequestsComeOnceAcrossPagesWithKeysetStatements) {
+    ASSERT_EQ(requesters.size(), 200u);
+    std::vector<std::string> numeric = requesters;
+    std::sort(numeric.begin(), numeric.end(), [](auto& a, auto& b) { return std::stoll(a) < std::stoll(b); });
+    ASSERT_NE(numeric, requesters) << "text and numeric order of the requesters should differ";
+
+    Cursor cursor;
+    ASSERT_OK(open(12, kRequestOrdering, {}, cursor));
+    std::time_t const before = std::time(nullptr);
+    std::vector<Record> const rows = walk(cursor);
+    std::vector<std::string> seen;
+    for (Record const& r : rows) {
+        std::string const uid = text(r, "core_event_contactid");
+        seen.push_back(uid);
+        EXPECT_EQ(text(r, "core_event_serviceid"), "FriendRequest: " + uid);
+        EXPECT_EQ(text(r, "core_object_type"), "12");
+    }
+    EXPECT_EQ(seen, requesters);
+    unsigned count = 0;
+    ASSERT_OK(cursor->numRows(count));
+    EXPECT_EQ(count, 200u);
+    EXPECT_EQ(host->fqlStatements(),
+              (std::vector<std::string>{
+                  kRequestBase + kRequestOrder + " asc limit 150",
+                  kRequestBase + " and (uid_from > '" + requesters[149] + " ')" + kRequestOrder + " asc limit 150",
+                  "select '' from friend_request where (uid_to = '" + kDemoUid + "')",
+              }));
+
+    // A request carries no time of its own: it gets the device's time when it is converted.
+    int const first = rows.at(0).search("core_object_time")->asInt32();
+    EXPECT_GE(first, before);
+    std::this_thread::sleep_for(std::chrono::milliseconds(1100));
+    ASSERT_OK(cursor->jumpEnd());
+    ASSERT_OK(cursor->jumpBeginning());
+    SmartPtr<Record> again;
+    ASSERT_OK(cursor->getRow(again));
+    EXPECT_EQ(text(*again, "core_event_serviceid"), text(rows.at(0), "core_event_serviceid"));
+    EXPECT_GT(again->search("core_object_time")->asInt32(), first) << "converted again a second later";
+}
+
+TEST_F(InboxCursorsTest, OrderingsAndConstraintsTheCursorsDoNotServeFailBeforeAnyRequest) {
+    Vector<Column> ascendingTime = kMessageOrder;
+    ascendingTime[0].flag = true;
+    Vector<Column> descendingRequests = kRequestOrdering;
+    descendingRequests[0].flag = false;
+    Constraint const other{Metadata::Key("core_event_contactid", TRELM_TYPES::STRING), Variant("4"), Constraint::Equal};
+    struct Case {
+        char const* name;
+        int type;
+        Vector<Column> columns;
+        std::vector<Constraint> constraints;
+    };
+    std::vector<Case> const cases = {
+        {"messages by ascending time", 10, ascendingTime, {}},
+        {"two time bounds", 10, kMessageOrder,
+         {timeBound(Variant(5), Constraint::GreaterOrEqual), timeBound(Variant(6), Constraint::GreaterThan)}},
+        {"upper time bound", 10, kMessageOrder, {timeBound(Variant(5), Constraint::LessThan)}},
+        {"message constraint on another key", 10, kMessageOrder, {other}},
+        {"requests by descending service", 12, descendingRequests, {}},
+        {"requests ordered by time first", 12, kMessageOrder, {}},
+        {"request constraint on the requester", 12, kRequestOrdering, {other}},
+    };
+    for (Case const& c : cases) {
+        SCOPED_TRACE(c.name);
+        Cursor cursor;
+        EXPECT_CODE(open(c.type, c.columns, c.constraints, cursor), kInvalid);
+        EXPECT_FALSE(cursor);
+    }
+    EXPECT_TRUE(host->emulator().log().entries().empty());
+}
+
+}  // namespace
+}  // namespace trelm::test
