@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "ContactCursor.h"
+#include "PhotoLibraryCursor.h"
 #include "FacebookSource.h"
 #include "IQueryItems.h"
 #include "trelm/Configuration.h"
@@ -126,6 +127,13 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
         } else if (c.type == FacebookSource::kContact) {
             EXPECT_EQ(started.code(), kSuccess) << started;
             EXPECT_NE(dynamic_cast<ContactCursor*>(msg.cursor.get()), nullptr);
+        } else if (c.type == FacebookSource::kAlbum || c.type == FacebookSource::kMedia ||
+                   c.type == FacebookSource::kPhotoTag) {
+            EXPECT_EQ(started.code(), kSuccess) << started;
+            auto* cursor = dynamic_cast<PhotoLibraryCursor*>(msg.cursor.get());
+            ASSERT_NE(cursor, nullptr);
+            EXPECT_EQ(cursor->paged(), c.position == -1);
+            EXPECT_EQ(cursor->since(), c.position);
         } else {
             EXPECT_EQ(started.code(), kNotSupported) << started;
             EXPECT_FALSE(msg.cursor);
