@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -54,8 +55,17 @@ public:
     // condition, when it has no operator, no key, or a value its type cannot hold.
     uError where(std::string const& text);
 
+    // Orders by KEY (ascending) or KEY:desc / KEY:asc instead of the kind's own ordering: the
+    // message's columns become that one column. kInvalid for an empty key or another suffix.
+    uError orderBy(std::string const& text);
+
     // Rows to pass over before the first one listed.
     unsigned skip = 0;
+    // Set: the query's position, which albums, media and photo tags read as a time (seconds since
+    // the epoch): only what changed since then, fetched in one go. Such a query is made as a
+    // background query, the only kind that may carry a position.
+    std::optional<std::int64_t> since;
+    bool interactive() const noexcept { return !since; }
     // At most this many rows; unset: every row.
     std::optional<unsigned> limit;
 
@@ -72,6 +82,7 @@ public:
 private:
     Kind const* kind_;
     Vector<IQueryItems::Constraint> conditions_;
+    std::optional<IQueryItems::Column> order_;
 };
 
 }  // namespace host
