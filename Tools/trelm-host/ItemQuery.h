@@ -23,7 +23,8 @@ namespace host {
 // given with where(), and as its columns the ordering the kind's cursor serves: the event
 // cursors (status posts, photo posts, inbox messages) want "core_object_time",
 // "core_event_service", "core_event_serviceid", all descending; friend requests want
-// "core_event_service", "core_event_serviceid", both ascending; the others take no ordering.
+// "core_event_service", "core_event_serviceid", both ascending; the others take no ordering
+// (albums, media and photo tags then come newest first). orderBy() replaces that ordering.
 //
 // A plain value; not guarded.
 class ItemQuery {
