@@ -251,8 +251,8 @@ uError PhotoLibraryCursor::convertItem(Map<String, String> const& row, RecordPtr
     for (Field const& f : fields_) {
         TRELM_RETURN_IF_ERROR(copyField(row, f.rowField, f.recordKey, f.type, record));
     }
-    // A row without its identity or its ordering value could be told apart from others or
-    // placed in the order: leave it out.
+    // A row without its identity or its ordering value could neither be told apart from others
+    // nor placed in the order: leave it out.
     String ignored;
     if (joinedValues(record, kind_.sidParts, ignored).failed() ||
         joinedValues(record, ordering_->parts, ignored).failed()) {
