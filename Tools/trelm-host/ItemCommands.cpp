@@ -31,15 +31,7 @@ std::string kindList() {
 ItemCommands::ItemCommands(CLI::App& app, bool shell) {
     query_ = app.add_subcommand("query", "list items of the data source");
     query_->add_option("type", type_, "the kind of items: " + kindList())->required()->check(CLI::IsMember(ItemQuery::kindNames()));
-    // A cursor counts rows in 32 bits; a listing of more than a million rows is --all's job.
-    CLI::Option* limit = query_->add_option("--limit", limit_, "list at most N items (0 to 1000000)")
-                             ->default_val(kDefaultLimit)
-                             ->check(CLI::Range(0u, 1000000u));
-    query_->add_option("--skip", skip_, "pass over the first N items (0 to 1000000)")->check(CLI::Range(0u, 1000000u));
-    query_->add_option("--where", where_, "condition KEY=VALUE (also != < <= > >=; =A,B for a list)")
-        ->expected(1)
-        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
-    query_->add_flag("--all", all_, "list every item")->excludes(limit);
+    addListingOptions(*query_);
 
     CLI::App* insert = app.add_subcommand("insert", "publish an item through the data source");
     insert->require_subcommand(1);
@@ -50,11 +42,30 @@ ItemCommands::ItemCommands(CLI::App& app, bool shell) {
     insertPhoto_->add_option("--caption", caption_, "the photo's caption");
     insertPhoto_->add_option("--album", album_, "the album's service id (default: the application's album)");
 
-    if (shell) {
-        retrieve_ = app.add_subcommand("retrieve", "show a record of the last listing again");
-        retrieve_->add_option("record", target_, "its GUID, or #N for the N-th record listed")->required();
-        quit_ = app.add_subcommand("quit", "leave the shell");
-    }
+    retrieve_ = app.add_subcommand("retrieve", "show a record of a listing again, fetched by its GUID");
+    retrieve_->add_option("record", target_, "its GUID, or #N for the N-th record listed")->required();
+    CLI::Option* from = retrieve_->add_option("--from", type_, "list items of this kind first: " + kindList())
+                            ->check(CLI::IsMember(ItemQuery::kindNames()));
+    // Outside the shell no listing came before: the command makes its own.
+    if (!shell) from->required();
+    addListingOptions(*retrieve_);
+    if (shell) quit_ = app.add_subcommand("quit", "leave the shell");
+}
+
+void ItemCommands::addListingOptions(CLI::App& command) {
+    // A cursor counts rows in 32 bits; a listing of more than a million rows is --all's job.
+    CLI::Option* limit = command.add_option("--limit", limit_, "list at most N items (0 to 1000000)")
+                             ->default_val(kDefaultLimit)
+                             ->check(CLI::Range(0u, 1000000u));
+    command.add_option("--skip", skip_, "pass over the first N items (0 to 1000000)")->check(CLI::Range(0u, 1000000u));
+    command.add_option("--where", where_, "condition KEY=VALUE (also != < <= > >=; =A,B for a list)")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    command.add_option("--order", order_, "order by KEY, ascending, or KEY:desc");
+    command.add_option("--since", since_,
+                       "albums, media, photo tags: only those changed at or after TIME (seconds since the "
+                       "epoch), fetched in one go");
+    command.add_flag("--all", all_, "list every item")->excludes(limit);
 }
 
 bool ItemCommands::parsed() const {
@@ -75,8 +86,9 @@ uError ItemCommands::run(SourceClient& client, Printer& printer) {
         if (e.ok()) printer.inserted(Metadata::Object::TYPE_STATUS, std::nullopt);
     } else if (insertPhoto_->parsed()) {
         e = runInsertPhoto(client, printer);
-    } else if (retrieve_ != nullptr && retrieve_->parsed()) {
-        e = runRetrieve(client, printer);
+    } else if (retrieve_->parsed()) {
+        if (!type_.empty()) e = runQuery(client, printer);
+        if (e.ok()) e = runRetrieve(client, printer);
     }
     printer.finish();
     return e;
@@ -89,6 +101,8 @@ uError ItemCommands::runQuery(SourceClient& client, Printer& printer) {
     for (std::string const& condition : where_) {
         TRELM_RETURN_IF_ERROR(query.where(condition));
     }
+    if (!order_.empty()) TRELM_RETURN_IF_ERROR(query.orderBy(order_));
+    query.since = since_;
     query.skip = skip_;
     if (!all_) query.limit = limit_;
 

@@ -171,6 +171,26 @@ uError ItemQuery::where(std::string const& text) {
     return conditions_.pushBack(condition);
 }
 
+uError ItemQuery::orderBy(std::string const& text) {
+    std::string key = text;
+    bool ascending = true;
+    std::size_t const colon = text.rfind(':');
+    if (colon != std::string::npos) {
+        std::string const sense = text.substr(colon + 1);
+        if (sense != "asc" && sense != "desc") {
+            return TRELM_ERROR_MSG(kInvalid, "ordering \"" + text + "\": the sense is asc or desc");
+        }
+        ascending = sense == "asc";
+        key = text.substr(0, colon);
+    }
+    if (key.empty()) return TRELM_ERROR_MSG(kInvalid, "ordering \"" + text + "\" names no key");
+    TRELM_TYPES::TYPES type = TRELM_TYPES::STRING;
+    // Keys the plug-ins did not register are named as text.
+    Metadata::getType(String(key), type).ignore();
+    order_ = Column{Metadata::Key(String(key), type), ascending};
+    return TRELM_OK();
+}
+
 uError ItemQuery::fill(IQueryItems::StartQueryMessage& msg) const {
     Constraint type;
     type.key = Metadata::Key("core_object_type", TRELM_TYPES::INT32);
@@ -182,9 +202,9 @@ uError ItemQuery::fill(IQueryItems::StartQueryMessage& msg) const {
         if (e.ok()) e = constraints.pushBack(c);
     }
     if (e.failed()) return e;
-    msg.columns = orderingOf(kind_->type);
+    msg.columns = order_ ? Vector<Column>{*order_} : orderingOf(kind_->type);
     msg.constraints = std::move(constraints);
-    msg.position = -1;
+    msg.position = since ? *since : -1;
     return TRELM_OK();
 }
 

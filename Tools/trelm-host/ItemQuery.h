@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <functional>
 #include <string>
@@ -23,7 +24,8 @@ namespace host {
 // given with where(), and as its columns the ordering the kind's cursor serves: the event
 // cursors (status posts, photo posts, inbox messages) want "core_object_time",
 // "core_event_service", "core_event_serviceid", all descending; friend requests want
-// "core_event_service", "core_event_serviceid", both ascending; the others take no ordering.
+// "core_event_service", "core_event_serviceid", both ascending; the others take no ordering
+// (albums, media and photo tags then come newest first). orderBy() replaces that ordering.
 //
 // A plain value; not guarded.
 class ItemQuery {
@@ -55,8 +57,17 @@ public:
     // condition, when it has no operator, no key, or a value its type cannot hold.
     uError where(std::string const& text);
 
+    // Orders by KEY (ascending) or KEY:desc / KEY:asc instead of the kind's own ordering: the
+    // message's columns become that one column. kInvalid for an empty key or another suffix.
+    uError orderBy(std::string const& text);
+
     // Rows to pass over before the first one listed.
     unsigned skip = 0;
+    // Set: the query's position, which albums, media and photo tags read as a time (seconds since
+    // the epoch): only what changed since then, fetched in one go. Such a query is made as a
+    // background query, the only kind that may carry a position.
+    std::optional<std::int64_t> since;
+    bool interactive() const noexcept { return !since; }
     // At most this many rows; unset: every row.
     std::optional<unsigned> limit;
 
@@ -75,6 +86,7 @@ public:
 private:
     Kind const* kind_;
     Vector<IQueryItems::Constraint> conditions_;
+    std::optional<IQueryItems::Column> order_;
 };
 
 }  // namespace host

@@ -128,7 +128,7 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
         cursor.reset();
         IQueryItems::StartQueryMessage msg;
         TRELM_RETURN_IF_ERROR(query.fill(msg));
-        TRELM_RETURN_IF_ERROR(paced("starting the query", [&] { return source_->startQuery(msg, true); }));
+        TRELM_RETURN_IF_ERROR(paced("starting the query", [&] { return source_->startQuery(msg, query.interactive()); }));
         if (!msg.cursor) {
             return TRELM_ERROR_MSG(kFailure, name_ + " answered the query without a cursor");
         }

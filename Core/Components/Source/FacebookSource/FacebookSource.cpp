@@ -2,13 +2,16 @@
 
 #include <utility>
 
+#include "AlbumCursor.h"
 #include "ContactCursor.h"
 #include "CursorBase.h"
 #include "FriendRequestCursor.h"
 #include "GetRuntimeConfigurationMessage.h"
 #include "GetUserSidMessage.h"
 #include "MappingCache.h"
+#include "MediaCursor.h"
 #include "MessageCursor.h"
+#include "PhotoTagCursor.h"
 #include "trelm/InputDataStream.h"
 #include "trelm/Set.h"
 #include "trelm/Trace.h"
@@ -60,6 +63,20 @@ SmartPtr<CursorBase> makeMessageCursor(CursorArgs const& a) {
     return makeSmart<MessageCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true);
 }
 
+// Albums, media and photo tags page unless the query gives a position: the cursor then asks once
+// for everything changed since that time (PhotoLibraryCursor).
+SmartPtr<CursorBase> makeAlbumCursor(CursorArgs const& a) {
+    return makeSmart<AlbumCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, false, a.position);
+}
+
+SmartPtr<CursorBase> makeMediaCursor(CursorArgs const& a) {
+    return makeSmart<MediaCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, false, a.position);
+}
+
+SmartPtr<CursorBase> makePhotoTagCursor(CursorArgs const& a) {
+    return makeSmart<PhotoTagCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, false, a.position);
+}
+
 // One object kind the source serves and the cursor that answers it.
 struct CursorKind {
     int type;               // "core_object_type"
@@ -74,11 +91,11 @@ constexpr CursorKind kCursorKinds[] = {
     {FacebookSource::kStatus, true, false, nullptr},
     {FacebookSource::kPhotoEvent, true, false, nullptr},
     {FacebookSource::kContact, true, false, &makeContactCursor},
-    {FacebookSource::kAlbum, false, true, nullptr},
-    {FacebookSource::kMedia, false, true, nullptr},
+    {FacebookSource::kAlbum, false, true, &makeAlbumCursor},
+    {FacebookSource::kMedia, false, true, &makeMediaCursor},
     {FacebookSource::kFriendRequest, false, false, &makeFriendRequestCursor},
     {FacebookSource::kMessage, true, false, &makeMessageCursor},
-    {FacebookSource::kPhotoTag, false, true, nullptr},
+    {FacebookSource::kPhotoTag, false, true, &makePhotoTagCursor},
 };
 
 CursorKind const* findKind(int type) {

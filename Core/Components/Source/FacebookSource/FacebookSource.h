@@ -20,8 +20,8 @@
 namespace trelm {
 
 // The data source of the Facebook plug-in. It answers the host's item queries with cursors over
-// the service (contacts so far; the other object kinds answer kNotSupported until their cursors
-// exist), posts a status or uploads a photo when the host inserts one, and hands back the records
+// the service (contacts, albums, media and photo tags so far; the other object kinds answer
+// kNotSupported until their cursors exist), posts a status or uploads a photo when the host inserts one, and hands back the records
 // its cursors produced when the host asks for one by GUID.
 //
 // Life of a source:

@@ -132,6 +132,12 @@ uError FacebookSource::FqlCursorBase::seekUnpaged(int delta, int& moved) {
 
 uError FacebookSource::FqlCursorBase::jumpBeginning() {
     if (atBeginning_ && windowLoaded_) return TRELM_OK();
+    if (!paged_ && windowLoaded_) {
+        // The window holds the whole result: nothing to ask.
+        atBeginning_ = true;
+        position_ = 0;
+        return TRELM_OK();
+    }
     bool const wasAtBeginning = atBeginning_;
     atBeginning_ = true;
     unsigned got = 0;
@@ -148,6 +154,10 @@ uError FacebookSource::FqlCursorBase::jumpBeginning() {
 
 uError FacebookSource::FqlCursorBase::jumpEnd() {
     atBeginning_ = false;
+    if (!paged_ && windowLoaded_) {
+        position_ = window_.empty() ? 0 : window_.size() - 1;
+        return window_.empty() ? TRELM_ERROR(kNoData) : TRELM_OK();
+    }
     unsigned got = 0;
     int convertError = -1;
     uError err = refreshWindow(RecordPtr(), 0, windowSize_, false, got, convertError);

@@ -17,7 +17,8 @@ namespace trelm {
 //
 // Paged (the usual case): each refill asks for the rows after (or before) the record at the edge
 // of the window, in the cursor's order, with " limit " offset + window size; the first `offset`
-// rows of the answer are skipped. Not paged: the whole result is fetched at once and kept.
+// rows of the answer are skipped. Not paged: the whole result is fetched at once and kept; the
+// jumps then move over the window without asking again.
 //
 // Positions: seek, jumpBeginning, jumpEnd and jump move over the whole result; getRow hands out a
 // copy of the record at the position. The first getRow, seek or curRow on a cursor that has not

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "ContactCursor.h"
+#include "PhotoLibraryCursor.h"
 #include "FacebookSource.h"
 #include "IQueryItems.h"
 #include "trelm/Configuration.h"
@@ -130,6 +131,13 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
             // The message gives no columns, so the cursor refuses to start without its ordering.
             EXPECT_EQ(started.code(), kInvalid) << started;
             EXPECT_FALSE(msg.cursor);
+        } else if (c.type == FacebookSource::kAlbum || c.type == FacebookSource::kMedia ||
+                   c.type == FacebookSource::kPhotoTag) {
+            EXPECT_EQ(started.code(), kSuccess) << started;
+            auto* cursor = dynamic_cast<PhotoLibraryCursor*>(msg.cursor.get());
+            ASSERT_NE(cursor, nullptr);
+            EXPECT_EQ(cursor->paged(), c.position == -1);
+            EXPECT_EQ(cursor->since(), c.position);
         } else {
             EXPECT_EQ(started.code(), kNotSupported) << started;
             EXPECT_FALSE(msg.cursor);
