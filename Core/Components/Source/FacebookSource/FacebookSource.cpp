@@ -4,9 +4,12 @@
 
 #include "ContactCursor.h"
 #include "CursorBase.h"
+#include "FStreamCursor.h"
 #include "GetRuntimeConfigurationMessage.h"
 #include "GetUserSidMessage.h"
 #include "MappingCache.h"
+#include "PhotoEventCursor.h"
+#include "PhotoEventWrappedCursor.h"
 #include "trelm/InputDataStream.h"
 #include "trelm/Set.h"
 #include "trelm/Trace.h"
@@ -50,6 +53,19 @@ SmartPtr<CursorBase> makeContactCursor(CursorArgs const& a) {
     return makeSmart<ContactCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true, true);
 }
 
+// Serves status posts, photo posts or both from the news stream, 75 posts a window.
+SmartPtr<CursorBase> makeStreamCursor(CursorArgs const& a) {
+    auto cursor = makeSmart<FStreamCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true, true);
+    cursor->setWindowSize(75);
+    return cursor;
+}
+
+// Serves photo events: the photo cursor behind the wrapper that sorts photos of one second.
+SmartPtr<CursorBase> makePhotoEventCursor(CursorArgs const& a) {
+    auto inner = makeSmart<PhotoEventCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true, true);
+    return makeSmart<PhotoEventWrappedCursor>(inner, a.library, a.cache, a.columns, a.constraints, a.sourceId, true);
+}
+
 // One object kind the source serves and the cursor that answers it.
 struct CursorKind {
     int type;               // "core_object_type"
@@ -61,8 +77,8 @@ struct CursorKind {
 // In the order in which a cursor is chosen; types 4 and 5 together are served by the stream
 // cursor, which comes first.
 constexpr CursorKind kCursorKinds[] = {
-    {FacebookSource::kStatus, true, false, nullptr},
-    {FacebookSource::kPhotoEvent, true, false, nullptr},
+    {FacebookSource::kStatus, true, false, &makeStreamCursor},
+    {FacebookSource::kPhotoEvent, true, false, &makePhotoEventCursor},
     {FacebookSource::kContact, true, false, &makeContactCursor},
     {FacebookSource::kAlbum, false, true, nullptr},
     {FacebookSource::kMedia, false, true, nullptr},
