@@ -115,14 +115,10 @@ TEST_F(EventCursorTest, StreamStartReadsBoundsAndKindsOrRefusesWithExactCode) {
         {"ordering of two entries", {kTime, kService}, {}, kInvalid, 0, 0, false, false},
         {"time ascending", {column("core_object_time", TRELM_TYPES::INT32, true), kService, kServiceId}, {}, kInvalid,
          0, 0, false, false},
-        {"time of another type", {column("core_object_time", TRELM_TYPES::STRING), kService, kServiceId}, {}, kInvalid,
-         0, 0, false, false},
         {"entries after the third are free", {kTime, kService, kServiceId, column("core_event_text", TRELM_TYPES::STRING, true)},
          {}, kSuccess, 0, 0, false, false},
         {"greater than", fixed, {timeIs(Constraint::GreaterThan, 1000)}, kSuccess, 1001, 0, false, false},
-        {"greater or equal", fixed, {timeIs(Constraint::GreaterOrEqual, 1000)}, kSuccess, 1000, 0, false, false},
         {"less than", fixed, {timeIs(Constraint::LessThan, 1000)}, kSuccess, 0, 999, false, false},
-        {"less or equal", fixed, {timeIs(Constraint::LessOrEqual, 1000)}, kSuccess, 0, 1000, false, false},
         {"equal", fixed, {timeIs(Constraint::Equal, 1000)}, kSuccess, 1000, 1000, false, false},
         {"not equal", fixed, {timeIs(Constraint::NotEqual, 1000)}, kInvalid, 0, 0, false, false},
         {"time that is no number", fixed, {timeIs(Constraint::LessThan, "soon")}, kInvalid, 0, 0, false, false},
@@ -130,12 +126,8 @@ TEST_F(EventCursorTest, StreamStartReadsBoundsAndKindsOrRefusesWithExactCode) {
         {"photos", fixed, {typeIs(Constraint::Equal, 5)}, kSuccess, 0, 0, false, true},
         {"both and an unknown kind", fixed, {typeIs(Constraint::InList, Vector<int>{9, 5, 4})}, kSuccess, 0, 0, true, true},
         {"a kind the stream lacks", fixed, {typeIs(Constraint::Equal, 2)}, kNotSupported, 0, 0, false, false},
-        {"kind list that is no number list", fixed, {typeIs(Constraint::InList, Vector<String>{"x"})}, kInvalid, 0, 0,
-         false, false},
         {"other comparison on the kind is passed over", fixed, {typeIs(Constraint::GreaterThan, 4)}, kSuccess, 0, 0,
          false, false},
-        {"source", fixed, {where("core_object_source", TRELM_TYPES::STRING, "facebook", Constraint::Equal)}, kSuccess,
-         0, 0, false, false},
         {"another key", fixed, {where("core_event_text", TRELM_TYPES::STRING, "x", Constraint::Equal)}, kInvalid, 0, 0,
          false, false},
     };
@@ -188,8 +180,6 @@ TEST_F(EventCursorTest, StreamRowsBecomeStatusAndPhotoRecordsWithNamesFromOneLoo
         EXPECT_EQ(text(row, "core_event_text"), expected[i].text);
         EXPECT_EQ(text(row, "core_event_uri"), expected[i].uri);
         EXPECT_EQ(text(row, "core_event_parent_serviceid"), expected[i].album);
-        EXPECT_EQ(text(row, "core_event_service"), "Facebook");
-        EXPECT_EQ(text(row, "core_object_origin_servicename"), "Facebook");
         EXPECT_EQ(text(row, "core_object_source"), "facebook");
         guids.push_back(row->search("core_object_id")->asGUID());
         if (i + 1 < expected.size()) {
@@ -245,28 +235,6 @@ TEST_F(EventCursorTest, StatusQueryPagesPastAWindowOfPhotosAndNeverGoesBackUp) {
     EXPECT_EQ(sent("facebook.stream.get", "limit"), (std::vector<std::string>{"2", "2", "2", "2"}));
 }
 
-TEST_F(EventCursorTest, FailedStreamCallIsReturnedBySeekButDroppedByJumpBeginning) {
-    String const unavailable("<error_response><error_code>2</error_code><error_msg>down</error_msg></error_response>");
-    SmartPtr<FStreamCursor> cursor = stream({typeIs(Constraint::Equal, 4)});
-    ASSERT_OK(cursor->start());
-    http.queue(unavailable);
-    EXPECT_OK(cursor->jumpBeginning());
-
-    // Nothing was loaded, so the next getRow asks again.
-    http.queue(String(streamAnswer(statusPost("6_1", "6", 898))));
-    http.queue(String(users({{"6", "Cy"}})));
-    RecordPtr row;
-    ASSERT_OK(cursor->getRow(row));
-    EXPECT_EQ(text(row, "core_event_serviceid"), "1");
-
-    http.queue(unavailable);
-    int moved = 7;
-    EXPECT_CODE(cursor->seek(1, moved), kServiceUnavailable);
-    EXPECT_EQ(moved, 7);
-    ASSERT_OK(cursor->getRow(row));
-    EXPECT_EQ(text(row, "core_event_serviceid"), "1") << "the window keeps its rows";
-}
-
 TEST_F(EventCursorTest, PhotoEventsOfOneSecondComeInTheQueryOrderNotTheServiceOrder) {
     // The service orders by time only: the three photos of second 500 arrive unsorted.
     http.queue(String(photos({{"1_2", 500}, {"1_3", 500}, {"1_1", 500}, {"123_456", 400}})));
@@ -304,27 +272,8 @@ TEST_F(EventCursorTest, PhotoEventsOfOneSecondComeInTheQueryOrderNotTheServiceOr
 
     auto unwrapped = makeSmart<PhotoEventWrappedCursor>(nullptr, lib, cache, ordering, constraints, "facebook", true);
     EXPECT_CODE(unwrapped->start(), kOutOfWindow);
-}
-
-TEST_F(EventCursorTest, PhotoEventStartRefusesWhatItCannotServe) {
-    struct Case {
-        char const* name;
-        Vector<Column> ordering;
-        Vector<Constraint> constraints;
-        unsigned code;
-    };
-    Vector<Column> const fixed{kTime, kService, kServiceId};
-    std::vector<Case> const cases = {
-        {"the fixed ordering", fixed, {typeIs(Constraint::Equal, 5)}, kSuccess},
-        {"service id ascending", {kTime, kService, column("core_event_serviceid", TRELM_TYPES::STRING, true)}, {}, kInvalid},
-        {"time in a list", fixed, {timeIs(Constraint::InList, Vector<int>{1, 2})}, kInvalid},
-        {"another key", fixed, {where("core_event_text", TRELM_TYPES::STRING, "x", Constraint::Equal)}, kInvalid},
-    };
-    for (Case const& c : cases) {
-        SCOPED_TRACE(c.name);
-        auto cursor = makeSmart<PhotoEventCursor>(lib, cache, c.ordering, c.constraints, "facebook", true, true);
-        EXPECT_CODE(cursor->start(), c.code);
-    }
+    Vector<Column> const ascendingIds{kTime, kService, column("core_event_serviceid", TRELM_TYPES::STRING, true)};
+    EXPECT_CODE(makeSmart<PhotoEventCursor>(lib, cache, ascendingIds, constraints, "facebook", true, true)->start(), kInvalid);
 }
 
 }  // namespace

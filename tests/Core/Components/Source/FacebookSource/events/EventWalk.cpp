@@ -23,42 +23,25 @@ IQueryItems::Constraint typeIn(std::initializer_list<int> types) {
                                    Variant(Vector<int>(types)), IQueryItems::Constraint::InList};
 }
 
-IQueryItems::Constraint typeIs(int type) {
-    return IQueryItems::Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(type),
-                                   IQueryItems::Constraint::Equal};
-}
-
-IQueryItems::Constraint timeCompared(IQueryItems::Constraint::Function function, int time) {
-    return IQueryItems::Constraint{Metadata::Key("core_object_time", TRELM_TYPES::INT32), Variant(time), function};
-}
-
-EventRow toEventRow(Map<String, Variant> const& record) {
-    auto text = [&](char const* key) {
-        Variant const* v = record.search(key);
-        return v ? v->asString().str() : std::string();
-    };
-    EventRow row;
-    Variant const* type = record.search("core_object_type");
-    Variant const* time = record.search("core_object_time");
-    row.type = type ? type->asInt32() : 0;
-    row.time = time ? time->asInt32() : 0;
-    row.id = text("core_event_serviceid");
-    row.author = text("core_event_contactid");
-    row.authorName = text("core_event_contactname");
-    row.guid = text("core_object_id");
-    return row;
-}
-
 std::vector<EventRow> walkEvents(IQueryItems::ICursor& cursor,
-                                 std::function<void(EventRow const& previous)> const& afterSeek, std::size_t limit) {
+                                 std::function<void(EventRow const& previous)> const& afterSeek) {
     std::vector<EventRow> rows;
     EXPECT_OK(cursor.jumpBeginning());
-    while (rows.size() < limit) {
+    while (true) {
         SmartPtr<Map<String, Variant>> record;
         uError err = cursor.getRow(record);
         EXPECT_OK(err);
         if (err.failed() || err.code() == kNoData || !record) break;
-        rows.push_back(toEventRow(*record));
+        auto text = [&](char const* key) {
+            Variant const* v = record->search(key);
+            return v ? v->asString().str() : std::string();
+        };
+        EventRow row = EventRow::of(record->search("core_object_type")->asInt32(), text("core_event_serviceid"),
+                                    record->search("core_object_time")->asInt32());
+        row.author = text("core_event_contactid");
+        row.authorName = text("core_event_contactname");
+        row.guid = text("core_object_id");
+        rows.push_back(row);
         int moved = 0;
         err = cursor.seek(1, moved);
         EXPECT_OK(err);

@@ -11,8 +11,7 @@
 
 namespace trelm::test {
 
-// One record of the stream or photo-event cursors, as the tests compare them: by kind, service
-// id and time.
+// One record of the stream or photo-event cursors, compared by kind, service id and time.
 struct EventRow {
     int type = 0;
     std::string id;
@@ -28,25 +27,20 @@ struct EventRow {
         row.time = time;
         return row;
     }
-
     friend bool operator==(EventRow const& a, EventRow const& b) {
         return a.type == b.type && a.id == b.id && a.time == b.time;
     }
 };
 std::ostream& operator<<(std::ostream& os, EventRow const& row);
 
-// The ordering the event cursors serve: time, service, service id, all descending.
+// The ordering the event cursors serve (time, service, service id, all descending) and the
+// kinds a query asks for.
 Vector<IQueryItems::Column> eventOrdering();
 IQueryItems::Constraint typeIn(std::initializer_list<int> types);
-IQueryItems::Constraint typeIs(int type);
-IQueryItems::Constraint timeCompared(IQueryItems::Constraint::Function function, int time);
 
-EventRow toEventRow(Map<String, Variant> const& record);
-
-// Reads `cursor` from its beginning with getRow and seek(1) until it stops moving (at most
-// `limit` rows). `afterSeek` is called after every seek with the row read before it.
+// Reads `cursor` from its beginning with getRow and seek(1) until it stops moving. `afterSeek`
+// is called after every seek with the row read before it.
 std::vector<EventRow> walkEvents(IQueryItems::ICursor& cursor,
-                                 std::function<void(EventRow const& previous)> const& afterSeek = {},
-                                 std::size_t limit = 100000);
+                                 std::function<void(EventRow const& previous)> const& afterSeek = {});
 
 }  // namespace trelm::test
