@@ -29,7 +29,9 @@ namespace trelm {
 // Any other constraint is kInvalid.
 //
 // Moves: seek(1) only (anything else is kNotSupported once paging), jumpBeginning; jumpEnd is
-// kNotSupported. numRows, curRow and jump are the base's and cannot count this cursor's rows.
+// kNotSupported. numRows knows the count only when the first window was short; otherwise it,
+// curRow away from the first window, and jump past it are kNotSupported (there is no statement
+// to count with).
 //
 // Ownership and thread safety: as FqlCursorBase.
 class FStreamCursor : public FacebookSource::FqlCursorBase {

@@ -226,6 +226,9 @@ TEST_F(EventCursorTest, StatusQueryPagesPastAWindowOfPhotosAndNeverGoesBackUp) {
         EXPECT_CODE(cursor->seek(offset, moved), kNotSupported);
     }
     EXPECT_CODE(cursor->jumpEnd(), kNotSupported);
+    unsigned count = 0;
+    EXPECT_CODE(cursor->numRows(count), kNotSupported) << "no statement to count with";
+    EXPECT_CODE(cursor->curRow(count), kNotSupported);
 
     // The photo window ends at 899, the status window at 897; going back to the beginning
     // keeps the lowered bound.
