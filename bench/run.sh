@@ -135,6 +135,8 @@ report parse/stream_posts_75 expat/stream_posts_75 cpu
 report cache/window/real_time/threads:2 cache/window/real_time/threads:1 throughput
 report cursor/contacts_walk/real_time curl/contacts_replay/real_time page
 report cursor/contacts_walk/real_time curl/contacts_replay/real_time pagecpu
+report cursor/stream_walk/real_time curl/stream_replay/real_time page
+report cursor/stream_walk/real_time curl/stream_replay/real_time pagecpu
 report engine/contact_page sqlite_xml/contact_page cpu
 report engine/count sqlite_xml/count cpu
 report http/contact_page engine/contact_page wall

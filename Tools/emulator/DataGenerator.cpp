@@ -66,7 +66,8 @@ Status DataGenerator::run() {
     const GeneratorOptions& o = options_;
     if (o.users < 1 || o.demoFriends < 0 || o.friendsPerUser < 0 || o.albumsPerUser < 0 || o.photosPerAlbum < 0 ||
         o.tagsPerPhoto < 0 || o.postsPerUser < 0 || o.threadsPerUser < 0 || o.messagesPerThread < 0 ||
-        o.friendRequests < 0 || o.users > 20000000)
+        o.friendRequests < 0 || o.users > 20000000 || o.photosPerSecond < 1 || o.photosPerSecond > 5 ||
+        o.postsPerSecond < 1 || o.postsPerSecond > 6)
         return ServiceError{100, "Invalid parameter"};
     std::string error;
     if (!db_.exec("BEGIN", error)) return ServiceError{1, error};
@@ -276,8 +277,9 @@ bool DataGenerator::makeAlbums(std::string& error) {
             std::string cover;
             for (std::int64_t p = 0; p < options_.photosPerAlbum; ++p) {
                 const std::string pid = idText(owner, ++photoSeq_);
-                // Every fifth photo shares its creation second with the photo made before it.
-                const std::int64_t time = photoSeq_ % 5 == 0 ? lastPhotoTime : randomTime();
+                // The last photosPerSecond - 1 photos of every five share their creation second
+                // with the photo made before them.
+                const std::int64_t time = (photoSeq_ - 1) % 5 >= 6 - options_.photosPerSecond ? lastPhotoTime : randomTime();
                 lastPhotoTime = time;
                 modified = std::max(modified, time);
                 if (cover.empty()) cover = pid;
@@ -326,8 +328,9 @@ bool DataGenerator::makePosts(std::string& error) {
             const auto& own = photos_[owner];
             if (kind == 247 && own.empty()) kind = 46;
             const std::string postId = idText(owner, ++storySeq_);
-            // Every sixth post shares its second with the post made before it.
-            const std::int64_t time = storySeq_ % 6 == 0 ? lastTime : randomTime();
+            // The last postsPerSecond - 1 posts of every six share their second with the post
+            // made before them.
+            const std::int64_t time = (storySeq_ - 1) % 6 >= 7 - options_.postsPerSecond ? lastTime : randomTime();
             lastTime = time;
             std::int64_t actor = owner;
             std::optional<std::string> message, name, href, caption, description;

@@ -22,8 +22,9 @@ class SqliteDatabase;
 //   fast); each friendship is stored in both directions;
 // - content for the demo user, its friends and a few other users ("content users"): albums
 //   with photos and tags, stream posts of every kind (46 status, 247 photo, 80 link, 56 wall;
-//   the demo user gets at least one of each), some posts and some photos sharing a creation
-//   time; the others have a name and a short profile only;
+//   the demo user gets at least one of each), runs of `postsPerSecond` posts and of
+//   `photosPerSecond` photos sharing a creation second; the others have a name and a short
+//   profile only;
 // - `friendRequests` pending requests to the demo user from non-friends;
 // - `threadsPerUser` inbox threads for the demo user with `messagesPerThread` messages each,
 //   and fewer for a few friends.

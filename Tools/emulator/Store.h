@@ -43,6 +43,11 @@ struct GeneratorOptions {
     std::int64_t threadsPerUser = 5;      // inbox threads of the demo user; others get fewer
     std::int64_t messagesPerThread = 4;
     std::int64_t friendRequests = 5;      // pending requests to the demo user
+    // Photos sharing one creation second: every fifth photo closes a run of this many (1 to 5;
+    // 1 gives every photo its own second).
+    std::int64_t photosPerSecond = 2;
+    // Stream posts sharing one second: every sixth post closes a run of this many (1 to 6).
+    std::int64_t postsPerSecond = 2;
 };
 
 // A service error answer: the code and the text of the service's error table.

@@ -69,6 +69,10 @@ int main(int argc, char** argv) {
     data->add_option("--photos-per-album", g.photosPerAlbum, "Photos per album")->capture_default_str();
     data->add_option("--tags-per-photo", g.tagsPerPhoto, "Tags per photo")->capture_default_str();
     data->add_option("--posts-per-user", g.postsPerUser, "Stream posts per user")->capture_default_str();
+    data->add_option("--photos-per-second", g.photosPerSecond, "Photos sharing a creation second, 1 to 5")
+        ->capture_default_str();
+    data->add_option("--posts-per-second", g.postsPerSecond, "Stream posts sharing a second, 1 to 6")
+        ->capture_default_str();
     data->add_option("--threads-per-user", g.threadsPerUser, "Inbox threads of the demo user")->capture_default_str();
     data->add_option("--messages-per-thread", g.messagesPerThread, "Messages per thread")->capture_default_str();
     data->add_option("--friend-requests", g.friendRequests, "Pending friend requests to the demo user")

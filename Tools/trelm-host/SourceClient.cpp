@@ -126,6 +126,8 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
     uError e = retrying([&]() -> uError {
         result = Listing();
         cursor.reset();
+        bool storedBefore = false;
+        TRELM_RETURN_IF_ERROR(signIn_->sessionStored(storedBefore));
         IQueryItems::StartQueryMessage msg;
         TRELM_RETURN_IF_ERROR(query.fill(msg));
         TRELM_RETURN_IF_ERROR(paced("starting the query", [&] { return source_->startQuery(msg, query.interactive()); }));
@@ -137,6 +139,13 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
             return paced(what, op);
         });
         if (step.failed()) return step;
+        if (result.rows.empty() && storedBefore) {
+            // The stream cursor drops a failure of its first window and answers as if the stream
+            // were empty; a refused session then shows only as the session the source forgot.
+            bool storedAfter = true;
+            TRELM_RETURN_IF_ERROR(signIn_->sessionStored(storedAfter));
+            if (!storedAfter) return TRELM_ERROR_MSG(kNotSignedIn, name_ + " forgot its session while reading");
+        }
         if (query.kind().type == Metadata::Object::TYPE_FRIEND_REQUEST) {
             TRELM_RETURN_IF_ERROR(addContactNames(result.rows));
         }

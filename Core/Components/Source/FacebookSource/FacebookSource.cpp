@@ -5,12 +5,15 @@
 #include "AlbumCursor.h"
 #include "ContactCursor.h"
 #include "CursorBase.h"
+#include "FStreamCursor.h"
 #include "FriendRequestCursor.h"
 #include "GetRuntimeConfigurationMessage.h"
 #include "GetUserSidMessage.h"
 #include "MappingCache.h"
 #include "MediaCursor.h"
 #include "MessageCursor.h"
+#include "PhotoEventCursor.h"
+#include "PhotoEventWrappedCursor.h"
 #include "PhotoTagCursor.h"
 #include "trelm/InputDataStream.h"
 #include "trelm/Set.h"
@@ -77,6 +80,19 @@ SmartPtr<CursorBase> makePhotoTagCursor(CursorArgs const& a) {
     return makeSmart<PhotoTagCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, false, a.position);
 }
 
+// Serves status posts, photo posts or both from the news stream, 75 posts a window.
+SmartPtr<CursorBase> makeStreamCursor(CursorArgs const& a) {
+    auto cursor = makeSmart<FStreamCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true, true);
+    cursor->setWindowSize(75);
+    return cursor;
+}
+
+// Serves photo events: the photo cursor behind the wrapper that sorts photos of one second.
+SmartPtr<CursorBase> makePhotoEventCursor(CursorArgs const& a) {
+    auto inner = makeSmart<PhotoEventCursor>(a.library, a.cache, a.columns, a.constraints, a.sourceId, true, true);
+    return makeSmart<PhotoEventWrappedCursor>(inner, a.library, a.cache, a.columns, a.constraints, a.sourceId, true);
+}
+
 // One object kind the source serves and the cursor that answers it.
 struct CursorKind {
     int type;               // "core_object_type"
@@ -88,8 +104,8 @@ struct CursorKind {
 // In the order in which a cursor is chosen; types 4 and 5 together are served by the stream
 // cursor, which comes first.
 constexpr CursorKind kCursorKinds[] = {
-    {FacebookSource::kStatus, true, false, nullptr},
-    {FacebookSource::kPhotoEvent, true, false, nullptr},
+    {FacebookSource::kStatus, true, false, &makeStreamCursor},
+    {FacebookSource::kPhotoEvent, true, false, &makePhotoEventCursor},
     {FacebookSource::kContact, true, false, &makeContactCursor},
     {FacebookSource::kAlbum, false, true, &makeAlbumCursor},
     {FacebookSource::kMedia, false, true, &makeMediaCursor},

@@ -205,7 +205,10 @@ uError FacebookSource::FqlCursorBase::numRows(unsigned& count) {
 
 uError FacebookSource::FqlCursorBase::countRows(RecordPtr const& key, Direction direction, unsigned& total) {
     String query;
-    TRELM_RETURN_IF_ERROR(generateBaseQuery("''", key, direction, false, query));
+    uError made = generateBaseQuery("''", key, direction, false, query);
+    TRELM_RETURN_IF_ERROR(made);
+    // A cursor filled by other calls than FQL (the stream cursor) has no statement to count with.
+    if (made.code() == kNoData) return TRELM_ERROR_MSG(kNotSupported, "this cursor cannot count its rows");
     String type;
     TRELM_RETURN_IF_ERROR(getObjectType(type));
     Vector<Map<String, String>> rows;

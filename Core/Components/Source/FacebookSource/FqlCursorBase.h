@@ -109,6 +109,23 @@ protected:
     static uError copyField(Map<String, String> const& row, String const& field, String const& recordKey,
                             TRELM_TYPES::TYPES type, RecordPtr& record);
 
+    // The window state, for a cursor that fills its window without a statement (the stream
+    // cursor pages by time) and so runs its own refreshWindow, seek and jumpBeginning.
+    Vector<RecordPtr> const& window() const noexcept { return window_; }
+    unsigned position() const noexcept { return position_; }
+    void setPosition(unsigned position) noexcept { position_ = position; }
+    bool noMoreData() const noexcept { return noMoreData_; }
+    bool windowLoaded() const noexcept { return windowLoaded_; }
+    void setWindowLoaded() noexcept { windowLoaded_ = true; }
+    bool atBeginning() const noexcept { return atBeginning_; }
+    void setAtBeginning(bool atBeginning) noexcept { atBeginning_ = atBeginning; }
+    void clearBackwardWindow() noexcept { backwardWindow_ = false; }
+    // The whole result is known to hold `count` rows.
+    void setRowCount(unsigned count) noexcept {
+        rowCount_ = count;
+        rowCountKnown_ = true;
+    }
+
 private:
     // Loads the first window when nothing has been loaded yet.
     uError ensureLoaded();
