@@ -59,7 +59,16 @@ uError ComponentHost::startBuiltins(Map<String, Variant> const& http,
     if (!runtimeValues.contains("path")) {
         TRELM_RETURN_IF_ERROR(runtimeValues.insert("path", Variant(runtimeStorePath)));
     }
-    return addBuiltin(*runtime_.component, runtimeValues);
+    e = addBuiltin(*runtime_.component, runtimeValues);
+    if (e.failed()) {
+        String path;
+        if (Variant const* value = runtimeValues.search("path")) value->as(path).ignore();  // shown as given
+        return TRELM_WRAP_MSG(kFailure, e,
+                              "the state database " + path +
+                                  " cannot be used; if it is damaged, move it away or delete it to start afresh "
+                                  "(the stored session is then lost and the next command signs in again)");
+    }
+    return TRELM_OK();
 }
 
 uError ComponentHost::restore(HostConfig::ComponentEntry const& entry, Configuration::Group& group,

@@ -1,5 +1,7 @@
 #include "HostConfig.h"
 
+#include "ConfigSchema.h"
+
 #include <cstdint>
 #include <fstream>
 #include <limits>
@@ -103,6 +105,7 @@ uError toComponent(json const& entry, std::string const& origin, std::string con
     if (e.failed()) return e;
     if (auto it = entry.find("config"); it != entry.end()) {
         TRELM_RETURN_IF_ERROR(toValues(*it, origin, where + ".config", out.config));
+        TRELM_RETURN_IF_ERROR(ConfigSchema::check(out.id.str(), out.config, origin, where + ".config"));
     }
     out.runtimeKeys = HostConfig::defaultRuntimeKeys();
     if (auto it = entry.find("runtime_keys"); it != entry.end()) {
@@ -142,8 +145,10 @@ uError HostConfig::parse(std::string const& text, std::string const& origin, Hos
         uError e;
         if (key == "http") {
             e = toValues(value, origin, key, config.http_);
+            if (e.ok()) e = ConfigSchema::check(key, config.http_, origin, key);
         } else if (key == "runtime") {
             e = toValues(value, origin, key, config.runtime_);
+            if (e.ok()) e = ConfigSchema::check(key, config.runtime_, origin, key);
         } else if (key == "components") {
             if (!value.is_array()) return invalid(origin, key, "must be a list");
             std::set<String> names;

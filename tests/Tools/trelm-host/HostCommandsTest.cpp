@@ -395,4 +395,16 @@ TEST_F(HostCommandsTest, ThrottledOrUnavailableServiceIsWaitedOutAndTheListingCo
     }
 }
 
+// A damaged state database is named with what to do about it; nothing is listed.
+TEST_F(HostCommandsTest, DamagedStateDatabaseIsNamedWithHowToStartAfresh) {
+    std::filesystem::create_directories(stateDir());
+    std::string const path = stateDir() + "/runtime-configuration.db";
+    std::ofstream(path, std::ios::binary) << std::string(4096, '\x5a');
+    auto result = host({"query", "contacts"});
+    EXPECT_NE(result.exitCode, 0);
+    EXPECT_NE(result.err.find("the state database " + path + " cannot be used"), std::string::npos) << result.err;
+    EXPECT_NE(result.err.find("move it away or delete it"), std::string::npos) << result.err;
+    EXPECT_TRUE(linesOfType(result, "record").empty());
+}
+
 }  // namespace
