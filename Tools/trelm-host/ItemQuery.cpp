@@ -208,7 +208,8 @@ uError ItemQuery::fill(IQueryItems::StartQueryMessage& msg) const {
     return TRELM_OK();
 }
 
-uError ItemQuery::walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows, StepRunner const& run) const {
+uError ItemQuery::walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows, StepRunner const& run,
+                       RowSink const& arrived) const {
     // A failed cursor step leaves the cursor where it was, so a step can be tried again as it is.
     auto step = [&](char const* what, std::function<uError()> const& op) { return run ? run(what, op) : op(); };
     uError e = step("moving to the first row", [&] { return cursor.jumpBeginning(); });
@@ -224,6 +225,7 @@ uError ItemQuery::walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows, 
         if (e.failed()) return e;
         if (e.code() == kNoData || !row) break;
         rows.push_back(*row);
+        if (arrived) arrived(rows.size(), rows.back());
         if (limit && rows.size() >= *limit) break;
         int moved = 0;
         TRELM_RETURN_IF_ERROR(step("moving to the next row", [&] { return cursor.seek(1, moved); }));

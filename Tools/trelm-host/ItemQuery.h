@@ -81,7 +81,10 @@ public:
     // then holds what was read before it.
     // Runs one cursor step (`what` names it for a report); the default runs it once.
     using StepRunner = std::function<uError(char const* what, std::function<uError()> const& step)>;
-    uError walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows, StepRunner const& run = {}) const;
+    // `arrived` (when given) is called with each row's 1-based index as soon as it is read.
+    using RowSink = std::function<void(std::size_t index, Record const& row)>;
+    uError walk(IQueryItems::ICursor& cursor, std::vector<Record>& rows, StepRunner const& run = {},
+                RowSink const& arrived = {}) const;
 
 private:
     Kind const* kind_;

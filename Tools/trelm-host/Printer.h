@@ -68,6 +68,10 @@ public:
     // Writes whatever is gathered; call once at the end.
     void finish();
 
+    Format format() const noexcept { return format_; }
+    // Hands what is written so far to the output (records shown as they arrive).
+    void flush() { out_.flush(); }
+
 private:
     Format const format_;
     std::ostream& out_;

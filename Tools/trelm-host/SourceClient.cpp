@@ -117,7 +117,19 @@ uError SourceClient::retrying(Operation operation) {
     return operation();
 }
 
-uError SourceClient::query(ItemQuery const& query, Listing& listing) {
+uError SourceClient::query(ItemQuery const& query, Listing& listing, ItemQuery::RowSink const& arrived) {
+    bool const completedLater = query.kind().type == Metadata::Object::TYPE_FRIEND_REQUEST;
+    // A query made again after a new sign-in reads the same rows again: those already told are
+    // not told twice.
+    std::size_t told = 0;
+    ItemQuery::RowSink tell;
+    if (arrived && !completedLater) {
+        tell = [&](std::size_t index, Record const& row) {
+            if (index <= told) return;
+            told = index;
+            arrived(index, row);
+        };
+    }
     // The previous cursor's records leave the source's cache before the new query fills it.
     cursor_.reset();
     listed_.clear();
@@ -135,9 +147,9 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
             return TRELM_ERROR_MSG(kFailure, name_ + " answered the query without a cursor");
         }
         cursor = msg.cursor;
-        uError step = query.walk(*cursor, result.rows, [this](char const* what, std::function<uError()> const& op) {
-            return paced(what, op);
-        });
+        uError step = query.walk(
+            *cursor, result.rows,
+            [this](char const* what, std::function<uError()> const& op) { return paced(what, op); }, tell);
         if (step.failed()) return step;
         if (result.rows.empty() && storedBefore) {
             // The stream cursor drops a failure of its first window and answers as if the stream
@@ -157,6 +169,9 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing) {
         return TRELM_OK();
     });
     if (e.failed()) return e;
+    if (arrived && completedLater) {
+        for (std::size_t i = 0; i < result.rows.size(); ++i) arrived(i + 1, result.rows[i]);
+    }
     cursor_ = std::move(cursor);
     listed_ = result.rows;
     listing = std::move(result);

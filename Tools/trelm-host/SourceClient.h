@@ -64,7 +64,10 @@ public:
     // Starts `query` at the source, walks the cursor and, for kinds that count, asks for the
     // total. The previous cursor is released first; on success the new one is kept. The source's
     // refusal (kNotSupported for a kind it does not serve yet) is returned as it is.
-    uError query(ItemQuery const& query, Listing& listing);
+    // `arrived` (optional) is told of each row as it is read, once per row even when the query is
+    // made again after a new sign-in; kinds whose rows the host completes afterwards (friend
+    // requests get their names) are told at the end instead.
+    uError query(ItemQuery const& query, Listing& listing, ItemQuery::RowSink const& arrived = {});
     // BaseSource::insert; `record` receives what the source writes back ("core_service_id").
     uError insert(Record& record);
     // Inserts a status post (object type 4, "core_event_text" = `text`).

@@ -71,6 +71,7 @@ protected:
         ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args, input, signal, afterMs, signalled);
         for (std::string const& text : {result.out, result.err}) {
             EXPECT_EQ(text.find(emu::DemoAccount::password), std::string::npos) << text;
+            EXPECT_EQ(text.find("rows/s"), std::string::npos) << "no progress line off a terminal";
         }
         return result;
     }
