@@ -28,6 +28,6 @@ export UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1
 (cd "$root/build/asan" && ctest --output-on-failure -j "$jobs" --timeout 300)
 
 cmake -S "$root" -B "$root/build/tsan" -G Ninja -DTRELM_SANITIZE=thread -DCMAKE_BUILD_TYPE=Debug "${launcher[@]}" >/dev/null
-cmake --build "$root/build/tsan" -j "$jobs"
+cmake --build "$root/build/tsan" -j "$jobs" --target concurrency_tests
 export TSAN_OPTIONS=halt_on_error=1:second_deadlock_stack=1
 (cd "$root/build/tsan" && ctest --output-on-failure -j "$jobs" -L concurrency --timeout 300)
