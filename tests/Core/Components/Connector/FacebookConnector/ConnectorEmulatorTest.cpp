@@ -179,6 +179,28 @@ TEST_F(ConnectorEmulatorTest, StatusesOfFiftyFriendsComeInOneRequestWithTextAndT
     EXPECT_EQ(single.statusTime, events[0].statusTime);
 }
 
+// The service shows a status that was never set as an empty message at time 0, not as nil.
+TEST_F(ConnectorEmulatorTest, UsersGetInfoShowsEveryFriendsStatusWithItsTime) {
+    std::string uids;
+    for (std::string const& uid : friendIds()) uids += (uids.empty() ? "" : ",") + uid;
+    emu::XmlNode root("users_getInfo_response");
+    ASSERT_FALSE(emulator->store().usersGetInfo(emu::DemoAccount::uid, uids, "status", root).has_value());
+    unsigned unset = 0;
+    for (emu::XmlNode const& user : root.children) {
+        ASSERT_EQ(user.children.size(), 2u);
+        emu::XmlNode const& status = user.children[1];
+        ASSERT_FALSE(status.nil) << user.children[0].text;
+        ASSERT_EQ(status.children.size(), 3u);
+        std::string const shape = status.children[0].name + "," + status.children[1].name + "," +
+                                  status.children[2].name;
+        EXPECT_EQ(shape, "message,time,status_id");
+        bool const never = status.children[1].text == "0";
+        EXPECT_EQ(status.children[0].text.empty(), never) << user.children[0].text;
+        if (never) ++unset;
+    }
+    EXPECT_EQ(unset, 55u / 4);
+}
+
 // An id the service does not know gets no answer: fewer statuses than ids.
 TEST_F(ConnectorEmulatorTest, ShortStatusAnswerFailsAndLeavesTheEventsAsTheyWere) {
     connect();
