@@ -1,0 +1,233 @@
+// trelm-host's peers, peer-status and set-status, run as a user runs them against a service
+// emulator that the test starts itself, so that what the connector did can be checked in the
+// emulator's request log and data.
+#include <algorithm>
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include "Emulator.h"
+#include "ProgramRunner.h"
+
+using nlohmann::json;
+
+namespace {
+
+using Row = std::map<std::string, std::string>;
+
+constexpr char const* kDemoUser = "100000001";
+
+// The demo account's data source and connector as the demo configuration has them.
+json demoConfig() {
+    return {{"components",
+             json::array({{{"name", "facebook"},
+                           {"id", "@trelm.example:/facebooksource"},
+                           {"config",
+                            {{"facebook_source_appkey", emu::DemoAccount::apiKey},
+                             {"facebook_source_appsecret", emu::DemoAccount::appSecret},
+                             {"facebook_source_login", emu::DemoAccount::email},
+                             {"facebook_source_password", emu::DemoAccount::password},
+                             {"wipeComponents", json::array()},
+                             {"wakeupComponents", json::array()},
+                             {"haveExtendedApi", true}}}},
+                          {{"name", "facebook-connector"},
+                           {"id", "@trelm.example:/facebookconnector"},
+                           {"config",
+                            {{"facebook_polltime", 300},
+                             {"facebook_maxtime", 3600},
+                             {"FacebookAppKey", emu::DemoAccount::apiKey},
+                             {"FacebookAppSecret", emu::DemoAccount::appSecret},
+                             {"FacebookLogin", emu::DemoAccount::email},
+                             {"FacebookPassword", emu::DemoAccount::password}}}}})}};
+}
+
+class PeerCommandsTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        emu::Emulator::Options options;
+        options.threads = 4;
+        emulator_ = std::make_unique<emu::Emulator>(options);
+        std::string error;
+        ASSERT_TRUE(emulator_->start(error)) << error;
+        useConfig(demoConfig());
+    }
+
+    void useConfig(json const& config) { config_ = runner_.writeFile("config.json", config.dump(2)); }
+
+    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& format = "json") {
+        std::vector<std::string> args{
+            "--format", format, "--state-dir", runner_.folder() + "/state", "--no-emulator",
+            "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
+            "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
+            "--ca-file", emulator_->caFile(), "--config", config_, "--plugin", TRELMFACEBOOK_MODULE};
+        args.insert(args.end(), command.begin(), command.end());
+        ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args);
+        for (std::string const& text : {result.out, result.err}) {
+            EXPECT_EQ(text.find(emu::DemoAccount::password), std::string::npos) << text;
+        }
+        return result;
+    }
+
+    static std::vector<json> linesOfType(ProgramRunner::Result const& result, std::string const& type) {
+        std::vector<json> lines;
+        for (std::string const& line : result.outLines()) {
+            json object = json::parse(line);
+            if (object.at("type") == type) lines.push_back(object);
+        }
+        return lines;
+    }
+
+    // What the service holds, read as the demo user; nested columns become "parent.child".
+    std::vector<Row> fql(std::string const& query) {
+        emu::XmlNode root("fql_query_response");
+        emu::Status status = emulator_->store().fqlQuery(emu::DemoAccount::uid, query, root);
+        EXPECT_FALSE(status.has_value()) << query << ": " << status->message;
+        std::vector<Row> rows;
+        for (emu::XmlNode const& element : root.children) {
+            Row row;
+            for (emu::XmlNode const& field : element.children) {
+                row[field.name] = field.text;
+                for (emu::XmlNode const& part : field.children) row[field.name + "." + part.name] = part.text;
+            }
+            rows.push_back(row);
+        }
+        return rows;
+    }
+
+    std::vector<Row> friends() {
+        return fql("SELECT uid, first_name, last_name, name, profile_url, status FROM user "
+                   "WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
+    }
+
+    std::vector<emu::LoggedRequest> requests(std::string const& method) {
+        return emulator_->log().entriesFor(method);
+    }
+
+    ProgramRunner runner_;
+    std::unique_ptr<emu::Emulator> emulator_;
+    std::string config_;
+};
+
+TEST_F(PeerCommandsTest, PeersListsEveryFriendWithProfileFromTwoRequests) {
+    auto result = host({"peers"});
+    ASSERT_EQ(result.exitCode, 0) << result.err;
+    auto connection = linesOfType(result, "connection");
+    ASSERT_EQ(connection.size(), 1u) << result.out;
+    EXPECT_EQ(connection[0]["name"], "facebook-connector");
+    EXPECT_EQ(connection[0]["user"], kDemoUser);
+
+    std::vector<std::string> listed;
+    for (json const& peer : linesOfType(result, "peer")) {
+        listed.push_back(peer["uid"].get<std::string>() + "|" + peer["first_name"].get<std::string>() + "|" +
+                         peer["last_name"].get<std::string>() + "|" + peer["name"].get<std::string>() + "|" +
+                         peer["profile_url"].get<std::string>());
+    }
+    std::vector<std::string> expected;
+    for (Row& row : friends()) {
+        expected.push_back(row["uid"] + "|" + row["first_name"] + "|" + row["last_name"] + "|" + row["name"] + "|" +
+                           row["profile_url"]);
+    }
+    std::sort(listed.begin(), listed.end());
+    std::sort(expected.begin(), expected.end());
+    EXPECT_EQ(listed, expected);
+    auto count = linesOfType(result, "peers");
+    ASSERT_EQ(count.size(), 1u);
+    EXPECT_EQ(count[0]["count"], expected.size());
+
+    EXPECT_EQ(requests("auth.login").size(), 1u);
+    EXPECT_EQ(requests("friends.get").size(), 1u);
+    EXPECT_EQ(requests("users.getInfo").size(), 1u);
+    EXPECT_EQ(emulator_->log().total(), 3u) << "the data source sent nothing";
+}
+
+// One friend with a status, one who never set one, asked for in one request; the table shows the
+// time in UTC, or "-" for none.
+TEST_F(PeerCommandsTest, PeerStatusAsksOnceForAllIdsInBothFormats) {
+    std::vector<Row> all = friends();
+    auto with = std::find_if(all.begin(), all.end(), [](Row& r) { return r.count("status.time") != 0; });
+    auto without = std::find_if(all.begin(), all.end(), [](Row& r) { return r.count("status.time") == 0; });
+    ASSERT_TRUE(with != all.end() && without != all.end());
+    std::string const a = (*with)["uid"];
+    std::string const b = (*without)["uid"];
+
+    auto result = host({"peer-status", a, b});
+    ASSERT_EQ(result.exitCode, 0) << result.err;
+    auto statuses = linesOfType(result, "peer_status");
+    ASSERT_EQ(statuses.size(), 2u) << result.out;
+    EXPECT_EQ(statuses[0]["uid"], a);
+    EXPECT_EQ(statuses[0]["status"], (*with)["status.message"]);
+    EXPECT_EQ(std::to_string(statuses[0]["time"].get<long long>()), (*with)["status.time"]);
+    EXPECT_EQ(statuses[1]["uid"], b);
+    EXPECT_EQ(statuses[1]["status"], "");
+    EXPECT_EQ(statuses[1]["time"], 0);
+    auto calls = requests("users.getInfo");
+    ASSERT_EQ(calls.size(), 1u);
+    EXPECT_EQ(calls[0].args["uids"], a + "," + b);
+
+    auto table = host({"peer-status", b}, "table");
+    ASSERT_EQ(table.exitCode, 0) << table.err;
+    auto lines = table.outLines();
+    ASSERT_GE(lines.size(), 2u);
+    EXPECT_EQ(lines[lines.size() - 2].rfind("UID", 0), 0u) << table.out;
+    EXPECT_EQ(lines.back().rfind(b + "  -", 0), 0u) << table.out;
+}
+
+// The service's data holds what the connector set; the data source reads the status post back.
+TEST_F(PeerCommandsTest, StatusSetThroughTheConnectorIsTheUsersStatusAndAStatusPost) {
+    std::string const text = "is testing the connector from the host";
+    auto result = host({"set-status", "is", "testing", "the", "connector", "from", "the", "host"});
+    ASSERT_EQ(result.exitCode, 0) << result.err;
+    auto set = linesOfType(result, "status_set");
+    ASSERT_EQ(set.size(), 1u) << result.out;
+    EXPECT_EQ(set[0]["text"], text);
+    auto calls = requests("users.setStatus");
+    ASSERT_EQ(calls.size(), 1u);
+    EXPECT_EQ(calls[0].args["status"], text);
+
+    EXPECT_EQ(fql("SELECT status FROM user WHERE uid = me()").at(0)["status.message"], text);
+    auto posts = fql("SELECT message, type FROM stream WHERE source_id = me() ORDER BY created_time DESC LIMIT 1");
+    ASSERT_EQ(posts.size(), 1u);
+    EXPECT_EQ(posts[0]["message"] + "|" + posts[0]["type"], text + "|46");
+}
+
+struct FailureCase {
+    char const* name;
+    char const* key;    // the connector's configuration key changed ...
+    char const* value;  // ... to this; null removes it
+    std::vector<std::string> command;
+    char const* says;   // in the error output
+};
+
+void PrintTo(FailureCase const& c, std::ostream* os) { *os << c.name; }
+
+class PeerCommandsFailureTest : public PeerCommandsTest, public ::testing::WithParamInterface<FailureCase> {};
+
+TEST_P(PeerCommandsFailureTest, CommandFailsWithTheReason) {
+    FailureCase const& c = GetParam();
+    json config = demoConfig();
+    json& connector = config["components"][1]["config"];
+    if (c.value) {
+        connector[c.key] = c.value;
+    } else {
+        connector.erase(c.key);
+    }
+    useConfig(config);
+    auto result = host(c.command);
+    EXPECT_EQ(result.exitCode, 3) << result.out << result.err;
+    EXPECT_NE(result.err.find(c.says), std::string::npos) << result.err;
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Cases, PeerCommandsFailureTest,
+    ::testing::Values(
+        FailureCase{"wrong_password", "FacebookPassword", "not the password", {"peers"}, "0x8000001c"},
+        FailureCase{"no_login", "FacebookLogin", nullptr, {"set-status", "hi"}, "has no FacebookLogin"},
+        FailureCase{"unknown_friend", "FacebookLogin", emu::DemoAccount::email, {"peer-status", "1"},
+                    "cannot read the peers' status"}),
+    [](auto const& info) { return std::string(info.param.name); });
+
+}  // namespace
