@@ -2,6 +2,7 @@
 // emulator that the test starts itself, so that what the connector did can be checked in the
 // emulator's request log and data.
 #include <algorithm>
+#include <fstream>
 #include <map>
 #include <memory>
 #include <string>
@@ -22,28 +23,10 @@ using Row = emu::test::Row;
 
 constexpr char const* kDemoUser = "100000001";
 
-// The demo account's data source and connector as the demo configuration has them.
+// The demo configuration, as scripts/demo.sh runs it.
 json demoConfig() {
-    return {{"components",
-             json::array({{{"name", "facebook"},
-                           {"id", "@trelm.example:/facebooksource"},
-                           {"config",
-                            {{"facebook_source_appkey", emu::DemoAccount::apiKey},
-                             {"facebook_source_appsecret", emu::DemoAccount::appSecret},
-                             {"facebook_source_login", emu::DemoAccount::email},
-                             {"facebook_source_password", emu::DemoAccount::password},
-                             {"wipeComponents", json::array()},
-                             {"wakeupComponents", json::array()},
-                             {"haveExtendedApi", true}}}},
-                          {{"name", "facebook-connector"},
-                           {"id", "@trelm.example:/facebookconnector"},
-                           {"config",
-                            {{"facebook_polltime", 300},
-                             {"facebook_maxtime", 3600},
-                             {"FacebookAppKey", emu::DemoAccount::apiKey},
-                             {"FacebookAppSecret", emu::DemoAccount::appSecret},
-                             {"FacebookLogin", emu::DemoAccount::email},
-                             {"FacebookPassword", emu::DemoAccount::password}}}}})}};
+    std::ifstream file(TRELM_TEST_DATA_DIR "/../../Tools/trelm-host/demo.json");
+    return json::parse(file);
 }
 
 class PeerCommandsTest : public ::testing::Test {
@@ -180,7 +163,7 @@ class PeerCommandsFailureTest : public PeerCommandsTest, public ::testing::WithP
 TEST_P(PeerCommandsFailureTest, CommandFailsWithTheReason) {
     FailureCase const& c = GetParam();
     json config = demoConfig();
-    json& connector = config["components"][1]["config"];
+    json& connector = config.at("components").at(1).at("config");
     c.value ? void(connector[c.key] = c.value) : void(connector.erase(c.key));
     useConfig(config);
     auto result = host(c.command);
