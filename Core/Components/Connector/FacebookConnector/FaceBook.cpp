@@ -44,19 +44,19 @@ uError FaceBook::connect(String const& login, String const& password) {
 }
 
 void FaceBook::useSession(String const& sessionKey, String const& sessionSecret, String const& userId) {
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     sessionKey_ = sessionKey;
     sessionSecret_ = sessionSecret;
     userId_ = userId;
 }
 
 bool FaceBook::connected() const {
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     return !sessionKey_.empty();
 }
 
 String FaceBook::userId() const {
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     return userId_;
 }
 
@@ -123,7 +123,7 @@ uError FaceBook::sessionCall(Map<String, String>& args, String& response) {
     if (appKey_.empty() || appSecret_.empty()) return TRELM_ERROR_MSG(kNotSet, "no application key or secret");
     String sessionKey;
     {
-        std::lock_guard<std::mutex> lock(mutex_);
+        StdMutexLock lock(mutex_);
         if (sessionKey_.empty()) return TRELM_ERROR(kNotSignedIn);
         sessionKey = sessionKey_;
         TRELM_RETURN_IF_ERROR(args.insert("api_key", appKey_));
@@ -138,7 +138,7 @@ uError FaceBook::sessionCall(Map<String, String>& args, String& response) {
     if (result.code() == kNotSignedIn) {
         // The session that was refused is forgotten, unless a new one has replaced it meanwhile;
         // the user id stays, so the host can tell whether the same person comes back.
-        std::lock_guard<std::mutex> lock(mutex_);
+        StdMutexLock lock(mutex_);
         if (sessionKey_ == sessionKey) {
             sessionKey_ = String();
             sessionSecret_ = String();

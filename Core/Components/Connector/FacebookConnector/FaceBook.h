@@ -1,8 +1,7 @@
 #pragma once
 
-#include <mutex>
-
 #include "trelm/Map.h"
+#include "trelm/Mutex.h"
 #include "trelm/String.h"
 #include "trelm/Vector.h"
 #include "trelm/uError.h"
@@ -85,12 +84,12 @@ private:
     String const appKey_;
     String const appSecret_;
 
-    // The client mutex: guards the session fields, the user id and the call counter.
-    mutable std::mutex mutex_;
-    String sessionKey_;
-    String sessionSecret_;
-    String userId_;
-    unsigned callCounter_ = 0;
+    // The client mutex: guards the four below.
+    mutable StdMutex mutex_;
+    String sessionKey_ TRELM_GUARDED_BY(mutex_);
+    String sessionSecret_ TRELM_GUARDED_BY(mutex_);
+    String userId_ TRELM_GUARDED_BY(mutex_);
+    unsigned callCounter_ TRELM_GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace trelm

@@ -66,17 +66,17 @@ FacebookConnector::~FacebookConnector() = default;
 String FacebookConnector::id() { return String("@trelm.example:/facebookconnector"); }
 
 FaceBook* FacebookConnector::client() const {
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     return client_.get();
 }
 
 int FacebookConnector::pollTime() const {
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     return pollTime_;
 }
 
 int FacebookConnector::maxTime() const {
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     return maxTime_;
 }
 
@@ -89,23 +89,26 @@ uError FacebookConnector::sendConfigImpl(Configuration::Group const& group) {
     if (uError err = group.get("facebook_maxtime").as(maxTime); err.failed()) {
         return TRELM_WRAP_MSG(kFailure, err, "facebook_maxtime is not an integer");
     }
-    std::lock_guard<std::mutex> lock(mutex_);
+    StdMutexLock lock(mutex_);
     pollTime_ = pollTime;
     maxTime_ = maxTime;
     return TRELM_OK();
 }
 
 uError FacebookConnector::makeConnection(Map<String, String>& params, bool /*flag*/) {
-    std::lock_guard<std::mutex> lock(mutex_);
-    if (client_) return TRELM_OK();
-    String const login = valueOf(params, "FacebookLogin");
-    String const password = valueOf(params, "FacebookPassword");
-    client_ = std::make_unique<FaceBook>(valueOf(params, "FacebookAppKey"), valueOf(params, "FacebookAppSecret"),
-                                         valueOf(params, "FacebookID"));
-    TRELM_RETURN_IF_ERROR(params.insert("FacebookID", client_->userId()));
-    if (uError err = client_->connect(login, password); err.failed()) return TRELM_WRAP(err.code(), err);
+    FaceBook* facebook = nullptr;
+    {
+        StdMutexLock lock(mutex_);
+        if (client_) return TRELM_OK();
+        client_ = std::make_unique<FaceBook>(valueOf(params, "FacebookAppKey"), valueOf(params, "FacebookAppSecret"),
+                                             valueOf(params, "FacebookID"));
+        facebook = client_.get();
+    }
+    TRELM_RETURN_IF_ERROR(params.insert("FacebookID", facebook->userId()));
+    uError err = facebook->connect(valueOf(params, "FacebookLogin"), valueOf(params, "FacebookPassword"));
+    if (err.failed()) return TRELM_WRAP(err.code(), err);
     // The login names the user the client now acts for.
-    return params.insert("FacebookID", client_->userId());
+    return params.insert("FacebookID", facebook->userId());
 }
 
 uError FacebookConnector::closeConnection() { return TRELM_OK(); }

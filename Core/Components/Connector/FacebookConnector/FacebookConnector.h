@@ -1,10 +1,10 @@
 #pragma once
 
 #include <memory>
-#include <mutex>
 
 #include "BaseConnector.h"
 #include "FaceBook.h"
+#include "trelm/Mutex.h"
 #include "trelm/String.h"
 
 namespace trelm {
@@ -40,8 +40,10 @@ namespace trelm {
 //
 // Lifetime: made by the plug-in's component factory and owned by the host; owns its client.
 // Thread safety: every operation may be called from several threads. The connector mutex guards
-// the client pointer and the configured times; makeConnection holds it through the login, so
-// concurrent first connections make one client. The client does its own locking.
+// the client pointer and the configured times and is never held during an exchange with the
+// service: the first makeConnection publishes its client before logging in, so a concurrent
+// makeConnection is the no-op of a second call, and a query meanwhile finds a client not yet
+// signed in (kNotSignedIn). The client does its own locking.
 class FacebookConnector : public BaseConnector {
 public:
     explicit FacebookConnector(String name);
@@ -87,11 +89,11 @@ private:
     // the connector, so the pointer stays valid after the lock is released.
     FaceBook* client() const;
 
-    // The connector mutex: guards client_, pollTime_ and maxTime_.
-    mutable std::mutex mutex_;
-    std::unique_ptr<FaceBook> client_;
-    int pollTime_ = 0;
-    int maxTime_ = 0;
+    // The connector mutex: guards the three below.
+    mutable StdMutex mutex_;
+    std::unique_ptr<FaceBook> client_ TRELM_GUARDED_BY(mutex_);
+    int pollTime_ TRELM_GUARDED_BY(mutex_) = 0;
+    int maxTime_ TRELM_GUARDED_BY(mutex_) = 0;
 };
 
 // The profile fields asked for a peer, and the status fields (none beyond the defaults). Set when
