@@ -21,6 +21,16 @@ String trimmed(String const& text) {
     return text.substr(begin, end - begin);
 }
 
+// The service's own account of a refusal, kept as the message of the translated error so that a
+// user reads why ("service error 104: Incorrect signature"); callers branch on the code alone.
+String serviceErrorText(Map<String, String> const& fields) {
+    String const* code = fields.search("error_code");
+    String const* message = fields.search("error_msg");
+    String text = "service error " + trimmed(code != nullptr ? *code : String());
+    if (message != nullptr && !message->empty()) text += ": " + *message;
+    return text;
+}
+
 }  // namespace
 
 uError ServiceTransport::makeBaseArgs(String const& method, Map<String, String>& args) {
@@ -69,13 +79,15 @@ uError ServiceTransport::post(String const& url, Map<String, String> const& args
 uError ServiceTransport::errorOf(String const& response, bool login) {
     Map<String, String> fields;
     if (HashParseObj("error_response").parse(response, fields).failed()) return TRELM_OK();
-    // "error_msg" is the service's prose; callers branch on the code alone.
     String const* code = fields.search("error_code");
     String const text = code ? *code : String();
     int number = 0;
     // The service answers a wrong e-mail or password with "invalid parameter": a failed sign-in.
-    if (login && trimmed(text).to(number).ok() && number == 100) return TRELM_ERROR(kNotSignedIn);
-    return resolveErrorCode(text);
+    unsigned result = login && trimmed(text).to(number).ok() && number == 100 ? unsigned(kNotSignedIn)
+                                                                              : resolveErrorCode(text).code();
+    // A document without a numeric code says nothing a user could act on.
+    if (result == kFailure) return TRELM_ERROR(kFailure);
+    return TRELM_ERROR_MSG(result, serviceErrorText(fields));
 }
 
 uError ServiceTransport::resolveErrorCode(String const& serviceCode) {

@@ -52,8 +52,9 @@ public:
                        String& response);
 
     // Success when `response` is not an "error_response" document; otherwise the failure its
-    // "error_code" stands for (resolveErrorCode). For the answer of a login (`login`), code 100
-    // (the service's answer to a wrong e-mail or password) is kNotSignedIn.
+    // "error_code" stands for (resolveErrorCode), with the service's code and text as its message
+    // ("service error 104: Incorrect signature"; none for kFailure). For the answer of a login
+    // (`login`), code 100 (the service's answer to a wrong e-mail or password) is kNotSignedIn.
     static uError errorOf(String const& response, bool login);
 
     // The service's error code (decimal text, surrounding white space allowed) to this system's
