@@ -51,9 +51,9 @@ void PeerPrinter::peer(unsigned index, NetworkMetadata::tRELMNetworkPeer const& 
                          {"profile_url", peer.profileUrl.str()}});
         return;
     }
-    gather({"UID", "FIRST NAME", "LAST NAME", "NAME", "PROFILE"},
-           {peer.serviceId.str(), peer.firstName.str(), peer.lastName.str(), peer.fullName.str(),
-            peer.profileUrl.str()});
+    gather(
+        {"UID", "FIRST NAME", "LAST NAME", "NAME", "PROFILE"},
+        {peer.serviceId.str(), peer.firstName.str(), peer.lastName.str(), peer.fullName.str(), peer.profileUrl.str()});
 }
 
 void PeerPrinter::peersListed(std::size_t count) {

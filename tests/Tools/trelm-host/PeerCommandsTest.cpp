@@ -43,11 +43,21 @@ protected:
     void useConfig(json const& config) { config_ = runner_.writeFile("config.json", config.dump(2)); }
 
     ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& format = "json") {
-        std::vector<std::string> args{
-            "--format", format, "--state-dir", runner_.folder() + "/state", "--no-emulator",
-            "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
-            "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
-            "--ca-file", emulator_->caFile(), "--config", config_, "--plugin", TRELMFACEBOOK_MODULE};
+        std::vector<std::string> args{"--format",
+                                      format,
+                                      "--state-dir",
+                                      runner_.folder() + "/state",
+                                      "--no-emulator",
+                                      "--connect-to",
+                                      "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
+                                      "--connect-to",
+                                      "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
+                                      "--ca-file",
+                                      emulator_->caFile(),
+                                      "--config",
+                                      config_,
+                                      "--plugin",
+                                      TRELMFACEBOOK_MODULE};
         args.insert(args.end(), command.begin(), command.end());
         ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args);
         for (std::string const& text : {result.out, result.err}) {
@@ -69,9 +79,7 @@ protected:
         return emu::test::fqlRows(emulator_->store(), emu::DemoAccount::uid, query);
     }
 
-    std::vector<emu::LoggedRequest> requests(std::string const& method) {
-        return emulator_->log().entriesFor(method);
-    }
+    std::vector<emu::LoggedRequest> requests(std::string const& method) { return emulator_->log().entriesFor(method); }
 
     ProgramRunner runner_;
     std::unique_ptr<emu::Emulator> emulator_;
@@ -91,8 +99,9 @@ TEST_F(PeerCommandsTest, PeersListsEveryFriendWithProfileFromTwoRequests) {
         peer.erase("index");
         listed.push_back(peer.get<Row>());
     }
-    std::vector<Row> expected = fql("SELECT uid, first_name, last_name, name, profile_url FROM user "
-                                    "WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
+    std::vector<Row> expected =
+        fql("SELECT uid, first_name, last_name, name, profile_url FROM user "
+            "WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
     std::sort(listed.begin(), listed.end());
     std::sort(expected.begin(), expected.end());
     EXPECT_EQ(listed, expected);
@@ -115,7 +124,9 @@ TEST_F(PeerCommandsTest, PeerStatusAsksOnceForAllIdsInBothFormats) {
     ASSERT_EQ(result.exitCode, 0) << result.err;
     auto statuses = linesOfType(result, "peer_status");
     ASSERT_EQ(statuses.size(), 2u) << result.out;
-    EXPECT_EQ(statuses[0], json({{"type", "peer_status"}, {"uid", a}, {"status", (*with)["status.message"]},
+    EXPECT_EQ(statuses[0], json({{"type", "peer_status"},
+                                 {"uid", a},
+                                 {"status", (*with)["status.message"]},
                                  {"time", std::stoll((*with)["status.time"])}}));
     EXPECT_EQ(statuses[1], json({{"type", "peer_status"}, {"uid", b}, {"status", ""}, {"time", 0}}));
     auto calls = requests("users.getInfo");
@@ -153,7 +164,7 @@ struct FailureCase {
     char const* key;    // the connector's configuration key changed ...
     char const* value;  // ... to this; null removes it
     std::vector<std::string> command;
-    char const* says;   // in the error output
+    char const* says;  // in the error output
 };
 
 void PrintTo(FailureCase const& c, std::ostream* os) { *os << c.name; }
@@ -173,9 +184,8 @@ TEST_P(PeerCommandsFailureTest, CommandFailsWithTheReason) {
 
 INSTANTIATE_TEST_SUITE_P(
     Cases, PeerCommandsFailureTest,
-    ::testing::Values(
-        FailureCase{"wrong_password", "FacebookPassword", "not the password", {"peers"}, "0x8000001c"},
-        FailureCase{"no_login", "FacebookLogin", nullptr, {"set-status", "hi"}, "has no FacebookLogin"}),
+    ::testing::Values(FailureCase{"wrong_password", "FacebookPassword", "not the password", {"peers"}, "0x8000001c"},
+                      FailureCase{"no_login", "FacebookLogin", nullptr, {"set-status", "hi"}, "has no FacebookLogin"}),
     [](auto const& info) { return std::string(info.param.name); });
 
 }  // namespace

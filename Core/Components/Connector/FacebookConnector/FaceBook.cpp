@@ -26,8 +26,8 @@ uError FaceBook::connect(String const& login, String const& password) {
     // The login is an application call: signed with the application secret, no session fields.
     TRELM_RETURN_IF_ERROR(args.insert("sig", ServiceTransport::signature(args, appSecret_)));
     String response;
-    TRELM_RETURN_IF_ERROR(ServiceTransport::post(ServiceTransport::kLoginUrl, args, SmartPtr<InputDataStream>(),
-                                                 response));
+    TRELM_RETURN_IF_ERROR(
+        ServiceTransport::post(ServiceTransport::kLoginUrl, args, SmartPtr<InputDataStream>(), response));
     TRELM_RETURN_IF_ERROR(ServiceTransport::errorOf(response, true));
 
     Map<String, String> fields;

@@ -182,8 +182,7 @@ uError FacebookConnector::getPhotoAlbums(Vector<String>& /*albums*/) { return TR
 
 uError FacebookConnector::publishPhoto(String const& /*uri*/, String const& /*caption*/) { return TRELM_OK(); }
 
-uError FacebookConnector::publishPhotoTo(String const& /*albumId*/, String const& /*uri*/,
-                                         String const& /*caption*/) {
+uError FacebookConnector::publishPhotoTo(String const& /*albumId*/, String const& /*uri*/, String const& /*caption*/) {
     return TRELM_OK();
 }
 

@@ -56,7 +56,8 @@ protected:
 
     emu::test::Row user(std::string const& uid, std::string const& fields) {
         return emu::test::fqlRows(emulator->store(), emu::DemoAccount::uid,
-                                  "SELECT " + fields + " FROM user WHERE uid = " + uid).at(0);
+                                  "SELECT " + fields + " FROM user WHERE uid = " + uid)
+            .at(0);
     }
 
     Vector<String> friendIds() {
@@ -145,7 +146,8 @@ TEST_F(ConnectorEmulatorTest, StatusesOfFiftyFriendsComeInOneRequestWithTextAndT
         auto row = user(ids[i].str(), "status");
         std::string const time = row.count("status.time") ? row["status.time"] : "0";
         EXPECT_EQ(events[i].statusText.str() + "@" + std::to_string(events[i].statusTime),
-                  row["status.message"] + "@" + time) << ids[i];
+                  row["status.message"] + "@" + time)
+            << ids[i];
         never += events[i].statusTime == 0;
     }
     EXPECT_GT(never, 0u);
