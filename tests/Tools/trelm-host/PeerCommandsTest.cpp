@@ -141,8 +141,9 @@ TEST_F(PeerCommandsTest, PeerStatusAsksOnceForAllIdsInBothFormats) {
     EXPECT_EQ(lines.back().rfind(b + "  -", 0), 0u) << table.out;
 }
 
-// The service's data holds what the connector set; the data source reads the status post back.
-TEST_F(PeerCommandsTest, StatusSetThroughTheConnectorIsTheUsersStatusAndAStatusPost) {
+// What the connector set is the user's status, and the data source's stream query lists it as
+// the newest status post.
+TEST_F(PeerCommandsTest, StatusSetThroughTheConnectorIsReadBackByTheSourcesStatusQuery) {
     std::string const text = "is testing the connector from the host";
     auto result = host({"set-status", "is", "testing", "the", "connector", "from", "the", "host"});
     ASSERT_EQ(result.exitCode, 0) << result.err;
@@ -152,11 +153,15 @@ TEST_F(PeerCommandsTest, StatusSetThroughTheConnectorIsTheUsersStatusAndAStatusP
     auto calls = requests("users.setStatus");
     ASSERT_EQ(calls.size(), 1u);
     EXPECT_EQ(calls[0].args["status"], text);
-
     EXPECT_EQ(fql("SELECT status FROM user WHERE uid = me()").at(0)["status.message"], text);
-    auto posts = fql("SELECT message, type FROM stream WHERE source_id = me() ORDER BY created_time DESC LIMIT 1");
-    ASSERT_EQ(posts.size(), 1u);
-    EXPECT_EQ(posts[0]["message"] + "|" + posts[0]["type"], text + "|46");
+
+    auto listed = host({"query", "status", "--limit", "1"});
+    ASSERT_EQ(listed.exitCode, 0) << listed.err;
+    auto records = linesOfType(listed, "record");
+    ASSERT_EQ(records.size(), 1u) << listed.out;
+    json const& fields = records[0]["fields"];
+    EXPECT_EQ(fields["core_event_text"], text);
+    EXPECT_EQ(fields["core_event_contactid"], kDemoUser);
 }
 
 // A failed connection or command ends the run with status 3 and says why.
