@@ -45,6 +45,10 @@ void bindOne(SqliteStatement& s, int i, const std::optional<std::string>& v) {
     if (v) s.bind(i, *v);
     else s.bindNull(i);
 }
+void bindOne(SqliteStatement& s, int i, const std::optional<std::int64_t>& v) {
+    if (v) s.bind(i, *v);
+    else s.bindNull(i);
+}
 
 template <typename... Args>
 bool insertRow(SqliteDatabase& db, sqlite3_stmt* raw, std::string& error, const Args&... args) {
@@ -103,6 +107,8 @@ bool DataGenerator::makeUsers(std::string& error) {
     // The demo user's friends are a random sample of everyone else; a few other users get
     // content too, so that what the viewer may not see can be tested.
     isFriend_.assign(uids_.size(), 0);
+    // Every fourth friend has never set a status, so that both kinds of friend are always there.
+    std::vector<char> noStatus(uids_.size(), 0);
     const std::int64_t others = count - 1;
     const std::int64_t friends = std::min(options_.demoFriends, others);
     std::vector<std::int64_t> order(static_cast<std::size_t>(others));
@@ -111,6 +117,7 @@ bool DataGenerator::makeUsers(std::string& error) {
         const std::int64_t j = i + static_cast<std::int64_t>(below(static_cast<std::uint64_t>(others - i)));
         std::swap(order[static_cast<std::size_t>(i)], order[static_cast<std::size_t>(j)]);
         isFriend_[static_cast<std::size_t>(order[static_cast<std::size_t>(i)])] = 1;
+        if (i % 4 == 3) noStatus[static_cast<std::size_t>(order[static_cast<std::size_t>(i)])] = 1;
         demoFriends_.push_back(uids_[static_cast<std::size_t>(order[static_cast<std::size_t>(i)])]);
     }
     demoFriendSet_.insert(demoFriends_.begin(), demoFriends_.end());
@@ -169,7 +176,7 @@ bool DataGenerator::makeUsers(std::string& error) {
     if (!insert || !plain) return false;
     std::unordered_map<std::int64_t, std::int64_t> statusIds;
     for (std::size_t i = 0; i < uids_.size(); ++i)
-        if (isContent[i]) statusIds[uids_[i]] = ++statusSeq_;
+        if (isContent[i] && !noStatus[i]) statusIds[uids_[i]] = ++statusSeq_;
     for (std::size_t index : byUid) {
         const std::int64_t uid = uids_[index];
         const Profile& p = profiles[index];
@@ -188,8 +195,15 @@ bool DataGenerator::makeUsers(std::string& error) {
         const std::string birthday =
             std::string(kMonths[p.month]) + " " + std::to_string(p.day) + ", " + std::to_string(p.year);
         const std::string about = std::string("Hello, I am ") + first + " from " + city[0] + ".";
+        std::optional<std::string> statusText;
+        std::optional<std::int64_t> statusTime, statusId;
+        if (!noStatus[index]) {
+            statusText = kStatuses[p.status];
+            statusTime = p.statusTime;
+            statusId = statusIds[uid];
+        }
         if (!insertRow(db_, insert, error, uid, name, first, last, birthday, sex, city[0], city[1], city[2], city[3],
-                       kStatuses[p.status], p.statusTime, statusIds[uid], kLocales[p.locale], about, p.hidden))
+                       statusText, statusTime, statusId, kLocales[p.locale], about, p.hidden))
             return false;
     }
 

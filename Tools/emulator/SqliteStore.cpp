@@ -546,7 +546,42 @@ Status SqliteStore::usersGetInfo(std::int64_t viewer, const std::string& uids, c
         if (seen.insert(column->name).second) columns += "," + column->name;
     }
     std::lock_guard<std::mutex> lock(mutex_);
-    return engine_->run(viewer, now(), "select " + columns + " from user where uid in (" + idList + ")", root);
+    if (Status s = engine_->run(viewer, now(), "select " + columns + " from user where uid in (" + idList + ")", root))
+        return s;
+    return seen.count("status") ? showUnsetStatuses(viewer, root) : Status();
+}
+
+Status SqliteStore::showUnsetStatuses(std::int64_t viewer, XmlNode& root) {
+    // The service showed a status that was never set as an empty message at time 0; only a
+    // status the viewer may not see stays nil.
+    std::string error;
+    sqlite3_stmt* raw = db_->prepareCached(
+        "SELECT 1 FROM user u WHERE u.uid = ? AND ((u.hidden & 8) = 0 OR u.uid = ? OR "
+        "EXISTS (SELECT 1 FROM friend v WHERE v.uid1 = ? AND v.uid2 = u.uid))",
+        error);
+    if (!raw) return unknownError();
+    for (XmlNode& user : root.children) {
+        std::int64_t uid = 0;
+        XmlNode* status = nullptr;
+        for (XmlNode& field : user.children) {
+            if (field.name == "uid" && !parseNumber(field.text, 0, uid)) return unknownError();
+            if (field.name == "status" && field.nil) status = &field;
+        }
+        if (!status) continue;
+        SqliteStatement visible(raw);
+        visible.bind(1, uid);
+        visible.bind(2, viewer);
+        visible.bind(3, viewer);
+        if (!visible.step()) {
+            if (!visible.ok()) return unknownError();
+            continue;
+        }
+        status->nil = false;
+        status->add("message");
+        status->add("time", "0");
+        status->add("status_id", "0");
+    }
+    return std::nullopt;
 }
 
 Status SqliteStore::friendsGet(std::int64_t viewer, const std::string& uid, XmlNode& root) {

@@ -69,6 +69,9 @@ private:
     Status nextId(const char* sequence, std::int64_t& id);
     Status defaultAlbum(std::int64_t viewer, std::string& aid);
     Status writePosts(std::int64_t viewer, std::int64_t start, std::int64_t end, std::int64_t limit, XmlNode& root);
+    // Turns the nil "status" of each answered user whose status the viewer may see (one never set)
+    // into an empty status at time 0. REQUIRES: mutex_ held.
+    Status showUnsetStatuses(std::int64_t viewer, XmlNode& root);
 
     mutable std::mutex mutex_;  // guards db_, engine_ and clock_, and every statement of db_
     std::unique_ptr<SqliteDatabase> db_;

@@ -7,6 +7,7 @@
 #include "HostSession.h"
 #include "HostShell.h"
 #include "ItemCommands.h"
+#include "PeerCommands.h"
 #include "RuntimeConfiguration.h"
 #include "StateDirectory.h"
 #include "trelm/Configuration.h"
@@ -94,6 +95,7 @@ int HostApp::run(int argc, char const* const* argv) {
     demo->add_option("--status", tour.status, "the status to post (default: a greeting with the time)");
     demo->add_option("--photo", tour.photo, "the image to upload (default: a small built-in PNG)");
     ItemCommands items(app, false);
+    PeerCommands peerCommands(app);
     CLI::App* shell = app.add_subcommand("shell", "read query, insert and retrieve commands from standard input");
 
     try {
@@ -116,6 +118,13 @@ int HostApp::run(int argc, char const* const* argv) {
         return runWithSource(options, [&](SourceClient& client, Printer& printer, HostSession&) {
             uError e = client.open();
             return e.failed() ? e : items.run(client, printer);
+        });
+    }
+    if (peerCommands.parsed()) {
+        return runWithSource(options, [&](SourceClient&, Printer&, HostSession& session) {
+            ConnectorClient connector(session);
+            PeerPrinter peerPrinter(options.format, out_);
+            return peerCommands.run(connector, peerPrinter);
         });
     }
     if (shell->parsed()) {

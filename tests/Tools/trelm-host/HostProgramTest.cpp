@@ -123,7 +123,8 @@ INSTANTIATE_TEST_SUITE_P(
 TEST_F(HostProgramTest, ComponentIdThatNoPluginOffersFailsTheRunButNotTheOthers) {
     std::string config = runner_.writeFile("config.json", R"({"components": [
         {"name": "ghost", "id": "@trelm.example:/nothing"},
-        {"name": "presence", "id": "@trelm.example:/facebookconnector"}]})");
+        {"name": "presence", "id": "@trelm.example:/facebookconnector",
+         "config": {"facebook_polltime": 300, "facebook_maxtime": 3600}}]})");
     auto result = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
     EXPECT_EQ(result.exitCode, 2);
     auto components = linesOfType(result, "component");

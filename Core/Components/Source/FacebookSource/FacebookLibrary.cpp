@@ -4,10 +4,10 @@
 
 #include "ConnectionInfo.h"
 #include "GetRuntimeConfigurationMessage.h"
-#include "HttpObjectRequestMessage.h"
 #include "LoginStatusMessage.h"
 #include "MessageParser.h"
 #include "PhotoUploadParser.h"
+#include "ServiceTransport.h"
 #include "ThreadParser.h"
 #include "WakeupMessage.h"
 #include "WipeMessage.h"
@@ -15,8 +15,6 @@
 #include "trelm/FlatParseObj.h"
 #include "trelm/FqlParseObj.h"
 #include "trelm/HashParseObj.h"
-#include "trelm/HttpRequest.h"
-#include "trelm/MD5.h"
 #include "trelm/Mutex.h"
 #include "trelm/Trace.h"
 #include "trelm/Variant.h"
@@ -24,32 +22,9 @@
 namespace trelm {
 namespace {
 
-constexpr char const* kHttpFactory = "HttpRequestFactory";
-
 // Reports an error that the caller goes on without, one trace line per level of its chain. The
 // chain holds codes and locations only (no request fields end up in error texts).
 void note(char const* what, uError const& err) { traceError("FacebookLibrary", what, err); }
-
-// The service writes numbers as bare text, but a pretty-printed document may surround them with
-// white space; anything else is not a number.
-String trimmed(String const& text) {
-    unsigned begin = 0;
-    unsigned end = text.size();
-    auto space = [](char c) { return c == ' ' || c == '\t' || c == '\n' || c == '\r'; };
-    while (begin < end && space(text[begin])) ++begin;
-    while (end > begin && space(text[end - 1])) --end;
-    return text.substr(begin, end - begin);
-}
-
-// The service's own account of a refusal, kept as the message of the translated error so that a
-// user reads why ("service error 104: Incorrect signature"); callers branch on the code alone.
-String serviceErrorText(Map<String, String> const& fields) {
-    String const* code = fields.search("error_code");
-    String const* message = fields.search("error_msg");
-    String text = "service error " + trimmed(code != nullptr ? *code : String());
-    if (message != nullptr && !message->empty()) text += ": " + *message;
-    return text;
-}
 
 }  // namespace
 
@@ -132,16 +107,7 @@ uError FacebookLibrary::connectInternal(String& sessionId, String& sessionSecret
     String response;
     TRELM_RETURN_IF_ERROR(sendPost(kLoginUrl, args, SmartPtr<InputDataStream>(), response));
 
-    Map<String, String> errorFields;
-    if (HashParseObj("error_response").parse(response, errorFields).ok()) {
-        String const* code = errorFields.search("error_code");
-        if (code == nullptr) return TRELM_ERROR(kFailure);
-        int number = 0;
-        if (trimmed(*code).to(number).failed()) return TRELM_ERROR(kFailure);
-        // The service answers wrong credentials with "invalid parameter": a failed sign-in.
-        if (number == 100) return TRELM_ERROR_MSG(kNotSignedIn, serviceErrorText(errorFields));
-        return TRELM_ERROR_MSG(resolveBaseFacebookErrorCode(*code).code(), serviceErrorText(errorFields));
-    }
+    TRELM_RETURN_IF_ERROR(ServiceTransport::errorOf(response, true));
 
     Map<String, String> fields;
     if (uError err = HashParseObj("auth_login_response").parse(response, fields); err.failed()) {
@@ -330,9 +296,7 @@ uError FacebookLibrary::sendPhoto(SmartPtr<InputDataStream> photo, String const&
 // ---- Request building and transport ----
 
 uError FacebookLibrary::makeBaseArgs(String const& method, Map<String, String>& args) {
-    TRELM_RETURN_IF_ERROR(args.insert("method", method));
-    TRELM_RETURN_IF_ERROR(args.insert("v", "1.0"));
-    return TRELM_OK();
+    return ServiceTransport::makeBaseArgs(method, args);
 }
 
 uError FacebookLibrary::addAuth(Map<String, String>& args, bool withSession) {
@@ -366,54 +330,20 @@ uError FacebookLibrary::makeSignature(Map<String, String> const& args, String& s
     } else {
         TRELM_RETURN_IF_ERROR(info_->getAppSecret(secret));
     }
-    String text;
-    for (auto const& [key, value] : args) {
-        text += key;
-        text += '=';
-        text += value;
-    }
-    text += secret;
-    sig = md5Hex(text);
+    sig = ServiceTransport::signature(args, secret);
     return TRELM_OK();
 }
 
 uError FacebookLibrary::sendPost(String const& url, Map<String, String> const& args, SmartPtr<InputDataStream> data,
                                  String& response) {
-    IHttpRequestFactory::HttpObjectRequestMessage msg;
-    if (uError err = msg.send(kHttpFactory); err.failed()) return TRELM_WRAP(kFailure, err);
-    SmartPtr<HttpRequest> request = msg.request;
-    if (!request) return TRELM_ERROR(kFailure);
-
-    TRELM_RETURN_IF_ERROR(request->setup(url));
-    TRELM_RETURN_IF_ERROR(request->setPostData(args));
-    if (data) TRELM_RETURN_IF_ERROR(request->setUploadData(data));
-    TRELM_RETURN_IF_ERROR(request->sendRequest());
-    int status = 0;
-    TRELM_RETURN_IF_ERROR(request->getResponseCode(status));
-    if (status < 200 || status > 299) {
-        // The call has failed already; releasing the connection is best effort.
-        request->disconnect().ignore();
-        return TRELM_ERROR_MSG(kFailure, "HTTP status " + String::from(status));
-    }
-    String body;
-    TRELM_RETURN_IF_ERROR(request->getResponseData(body));
-    // The answer is complete: a connection that cannot be handed back only costs a reconnect.
-    request->disconnect().ignore();
-    response = body;
-    return TRELM_OK();
+    return ServiceTransport::post(url, args, data, response);
 }
 
 uError FacebookLibrary::sendRequestAndCheckErrors(Map<String, String> const& args, SmartPtr<InputDataStream> data,
                                                   String& response) {
     TRELM_RETURN_IF_ERROR(sendPost(kServiceUrl, args, data, response));
 
-    Map<String, String> fields;
-    if (HashParseObj("error_response").parse(response, fields).failed()) return TRELM_OK();
-    // "error_msg" is the service's prose, kept in the message for people; callers branch on the
-    // code alone.
-    String const* code = fields.search("error_code");
-    uError result = resolveBaseFacebookErrorCode(code ? *code : String());
-    if (result.code() != kFailure) result = TRELM_ERROR_MSG(result.code(), serviceErrorText(fields));
+    uError result = ServiceTransport::errorOf(response, false);
     if (result.code() == kNotSignedIn) {
         // The user is kept so that the next sign-in can tell whether the same person comes back.
         if (uError err = dropSession(false, true); err.failed()) note("forgetting the refused session failed", err);
@@ -431,20 +361,7 @@ uError FacebookLibrary::runFacebookRequest(Map<String, String>& args, SmartPtr<I
 }
 
 uError FacebookLibrary::resolveBaseFacebookErrorCode(String const& serviceCode) {
-    int code = 0;
-    if (trimmed(serviceCode).to(code).failed()) return TRELM_ERROR(kFailure);
-    switch (code) {
-        case 2:
-            return TRELM_ERROR(kServiceUnavailable);
-        case 4:
-            return TRELM_ERROR(kRequestLimit);
-        case 102:
-        case 400:
-        case 401:
-            return TRELM_ERROR(kNotSignedIn);
-        default:
-            return TRELM_ERROR(kServiceError);
-    }
+    return ServiceTransport::resolveErrorCode(serviceCode);
 }
 
 }  // namespace trelm

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "ServiceTransport.h"
 #include "trelm/InputDataStream.h"
 #include "trelm/Map.h"
 #include "trelm/Mutex.h"
@@ -71,8 +72,8 @@ public:
     };
 
     // Where requests go. Fixed; see the class comment.
-    static constexpr char const* kServiceUrl = "http://api.facebook.com/restserver.php";
-    static constexpr char const* kLoginUrl = "https://api.facebook.com/restserver.php";
+    static constexpr char const* kServiceUrl = ServiceTransport::kServiceUrl;
+    static constexpr char const* kLoginUrl = ServiceTransport::kLoginUrl;
 
     // An empty client without settings: every call fails until setup.
     FacebookLibrary();
@@ -168,6 +169,9 @@ public:
                      String& photoId);
 
     // ---- Request building and transport (used by the calls above; public for tests and tools) ----
+    // The request format, the signature, the exchange and the error codes are ServiceTransport's,
+    // the one path this module's service clients share; the client adds its credentials, its
+    // session and its call counter.
 
     // Inserts "method" and "v" = "1.0".
     uError makeBaseArgs(String const& method, Map<String, String>& args);

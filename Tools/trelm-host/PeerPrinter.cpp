@@ -1,0 +1,111 @@
+#include "PeerPrinter.h"
+
+#include <algorithm>
+#include <ctime>
+#include <utility>
+
+#include <nlohmann/json.hpp>
+
+namespace trelm {
+namespace host {
+
+namespace {
+
+using json = nlohmann::ordered_json;
+
+// Texts from the service are byte strings; replacing invalid UTF-8 keeps every line valid JSON.
+void writeLine(std::ostream& out, json const& object) {
+    out << object.dump(-1, ' ', false, json::error_handler_t::replace) << '\n';
+}
+
+std::string utc(std::int64_t seconds) {
+    if (seconds == 0) return "-";
+    std::time_t const time = static_cast<std::time_t>(seconds);
+    std::tm parts{};
+    if (gmtime_r(&time, &parts) == nullptr) return std::to_string(seconds);
+    char text[32];
+    std::strftime(text, sizeof text, "%Y-%m-%d %H:%M:%S", &parts);
+    return text;
+}
+
+}  // namespace
+
+PeerPrinter::PeerPrinter(Printer::Format format, std::ostream& out) : format_(format), out_(out) {}
+
+void PeerPrinter::connection(String const& name, String const& userId) {
+    if (format_ == Printer::Format::JsonLines) {
+        writeLine(out_, {{"type", "connection"}, {"name", name.str()}, {"user", userId.str()}});
+        return;
+    }
+    out_ << "connected " << name << " as " << (userId.empty() ? "?" : userId.str()) << '\n';
+}
+
+void PeerPrinter::peer(unsigned index, NetworkMetadata::tRELMNetworkPeer const& peer) {
+    if (format_ == Printer::Format::JsonLines) {
+        writeLine(out_, {{"type", "peer"},
+                         {"index", index},
+                         {"uid", peer.serviceId.str()},
+                         {"first_name", peer.firstName.str()},
+                         {"last_name", peer.lastName.str()},
+                         {"name", peer.fullName.str()},
+                         {"profile_url", peer.profileUrl.str()}});
+        return;
+    }
+    gather(
+        {"UID", "FIRST NAME", "LAST NAME", "NAME", "PROFILE"},
+        {peer.serviceId.str(), peer.firstName.str(), peer.lastName.str(), peer.fullName.str(), peer.profileUrl.str()});
+}
+
+void PeerPrinter::peersListed(std::size_t count) {
+    if (format_ == Printer::Format::JsonLines) {
+        writeLine(out_, {{"type", "peers"}, {"count", count}});
+        return;
+    }
+    finish();
+    out_ << "listed    " << count << (count == 1 ? " peer" : " peers") << '\n';
+}
+
+void PeerPrinter::status(String const& uid, NetworkMetadata::tRELMNetworkEvent const& event) {
+    if (format_ == Printer::Format::JsonLines) {
+        writeLine(out_, {{"type", "peer_status"},
+                         {"uid", uid.str()},
+                         {"status", event.statusText.str()},
+                         {"time", event.statusTime}});
+        return;
+    }
+    gather({"UID", "TIME (UTC)", "STATUS"}, {uid.str(), utc(event.statusTime), event.statusText.str()});
+}
+
+void PeerPrinter::statusSet(String const& name, String const& text) {
+    if (format_ == Printer::Format::JsonLines) {
+        writeLine(out_, {{"type", "status_set"}, {"name", name.str()}, {"text", text.str()}});
+        return;
+    }
+    out_ << "status    set through " << name << ": " << text << '\n';
+}
+
+void PeerPrinter::gather(std::vector<std::string> header, std::vector<std::string> row) {
+    if (rows_.empty()) rows_.push_back(std::move(header));
+    rows_.push_back(std::move(row));
+}
+
+void PeerPrinter::finish() {
+    std::vector<std::size_t> width;
+    for (auto const& row : rows_) {
+        width.resize(std::max(width.size(), row.size()), 0);
+        for (std::size_t c = 0; c < row.size(); ++c) width[c] = std::max(width[c], row[c].size());
+    }
+    for (auto const& row : rows_) {
+        std::string line;
+        for (std::size_t c = 0; c < row.size(); ++c) {
+            line += row[c];
+            if (c + 1 < row.size()) line += std::string(width[c] - row[c].size() + 2, ' ');
+        }
+        out_ << line << '\n';
+    }
+    rows_.clear();
+    out_.flush();
+}
+
+}  // namespace host
+}  // namespace trelm

@@ -1,0 +1,258 @@
+// The connector as a host drives it, against the in-process emulator through the host's own
+// "HttpRequestFactory": what it asks the service, how many requests it takes, and what it does
+// when the service's answer does not fit.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "ComponentRegistry.h"
+#include "Emulator.h"
+#include "EmulatorRows.h"
+#include "ErrorAssertions.h"
+#include "FacebookConnector.h"
+#include "HttpRequestFactory.h"
+
+namespace trelm::test {
+namespace {
+
+using Peer = NetworkMetadata::tRELMNetworkPeer;
+using Event = NetworkMetadata::tRELMNetworkEvent;
+
+std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
+
+Map<String, String> demoParams(char const* password = emu::DemoAccount::password) {
+    return Map<String, String>{{"FacebookAppKey", emu::DemoAccount::apiKey},
+                               {"FacebookAppSecret", emu::DemoAccount::appSecret},
+                               {"FacebookLogin", emu::DemoAccount::email},
+                               {"FacebookPassword", password}};
+}
+
+// The demo user has 55 friends; every fourth has never set a status.
+class ConnectorEmulatorTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        emu::Emulator::Options options;
+        options.generator.users = 90;
+        options.generator.demoFriends = 55;
+        options.generator.friendsPerUser = 2;
+        options.threads = 4;
+        emulator = std::make_unique<emu::Emulator>(options);
+        std::string error;
+        ASSERT_TRUE(emulator->start(error)) << error;
+        factory.setCaFile(emulator->caFile());
+        factory.setConnectTo({"api.facebook.com:80:127.0.0.1:" + std::to_string(emulator->httpPort()),
+                              "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator->httpsPort())});
+        ASSERT_OK(registry.add(HttpRequestFactory::kName, &factory));
+        registry.activate();
+    }
+
+    void connect() {
+        Map<String, String> params = demoParams();
+        ASSERT_OK(connector.makeConnection(params, false));
+    }
+
+    emu::test::Row user(std::string const& uid, std::string const& fields) {
+        return emu::test::fqlRows(emulator->store(), emu::DemoAccount::uid,
+                                  "SELECT " + fields + " FROM user WHERE uid = " + uid)
+            .at(0);
+    }
+
+    Vector<String> friendIds() {
+        std::vector<std::string> ids;
+        for (auto& row : emu::test::fqlRows(emulator->store(), emu::DemoAccount::uid,
+                                            "SELECT uid2 FROM friend WHERE uid1 = me()")) {
+            ids.push_back(row["uid2"]);
+        }
+        std::sort(ids.begin(), ids.end());
+        Vector<String> out;
+        for (std::string const& id : ids) EXPECT_OK(out.pushBack(String(id)));
+        return out;
+    }
+
+    ComponentRegistry registry;
+    HttpRequestFactory factory;
+    std::unique_ptr<emu::Emulator> emulator;
+    FacebookConnector connector{"facebook-connector"};
+};
+
+TEST_F(ConnectorEmulatorTest, MakeConnectionLogsInOnceOverHttpsAndWritesTheUserBack) {
+    Map<String, String> params = demoParams();
+    ASSERT_OK(connector.makeConnection(params, false));
+    EXPECT_EQ(params.search("FacebookID") ? params.search("FacebookID")->str() : "none", kDemoUid);
+    auto logins = emulator->log().entriesFor("auth.login");
+    ASSERT_EQ(logins.size(), 1u);
+    EXPECT_TRUE(logins[0].https);
+
+    Map<String, String> again = demoParams("another password");
+    EXPECT_OK(connector.makeConnection(again, false));
+    EXPECT_EQ(emulator->log().total(), 1u) << "a second connection sends nothing";
+}
+
+TEST_F(ConnectorEmulatorTest, WrongPasswordKeepsTheServiceCodeAndLaterCallsSendNothing) {
+    Map<String, String> params = demoParams("not the password");
+    EXPECT_CODE(connector.makeConnection(params, false), kNotSignedIn);
+    Vector<String> ids{"untouched"};
+    EXPECT_CODE(connector.getPeers(ids), kNotSignedIn);
+    EXPECT_EQ(ids, (Vector<String>{"untouched"}));
+    EXPECT_EQ(emulator->log().total(), 1u);
+}
+
+TEST_F(ConnectorEmulatorTest, GetPeersListsExactlyTheDemoUsersFriends) {
+    connect();
+    Vector<String> peers;
+    ASSERT_OK(connector.getPeers(peers));
+    std::sort(peers.begin(), peers.end());
+    EXPECT_EQ(peers, friendIds());
+}
+
+TEST_F(ConnectorEmulatorTest, PeerInfoComesInTheOrderOfTheIdsFromOneRequestPerCall) {
+    connect();
+    Vector<String> const friends = friendIds();
+    Vector<String> ids{friends[9], friends[1], friends[5]};  // not the service's order
+    Vector<Peer> peers;
+    ASSERT_OK(connector.getPeerInfoBatch(ids, peers));
+    Peer one;
+    ASSERT_OK(connector.getPeerInfo(friends[5], one));
+    ASSERT_OK(peers.pushBack(one));
+    ASSERT_EQ(peers.size(), 4u);
+    for (unsigned i = 0; i < 4; ++i) {
+        auto row = user(ids[i < 3 ? i : 2].str(), "uid, first_name, last_name, name, profile_url");
+        Peer const& p = peers[i];
+        EXPECT_EQ((p.serviceId + "|" + p.firstName + "|" + p.lastName + "|" + p.fullName + "|" + p.profileUrl).str(),
+                  row["uid"] + "|" + row["first_name"] + "|" + row["last_name"] + "|" + row["name"] + "|" +
+                      row["profile_url"]);
+    }
+    auto calls = emulator->log().entriesFor("users.getInfo");
+    ASSERT_EQ(calls.size(), 2u);
+    EXPECT_EQ(calls[0].args["uids"], (ids[0] + "," + ids[1] + "," + ids[2]).str());
+    EXPECT_EQ(calls[0].args["fields"], "uid,first_name,last_name,name,profile_url");
+}
+
+TEST_F(ConnectorEmulatorTest, StatusesOfFiftyFriendsComeInOneRequestWithTextAndTime) {
+    connect();
+    Vector<String> ids = friendIds();
+    ASSERT_OK(ids.resize(50));
+    Vector<Event> events;
+    ASSERT_OK(connector.getPeerStatusBatch(ids, events));
+    auto calls = emulator->log().entriesFor("users.getInfo");
+    ASSERT_EQ(calls.size(), 1u);
+    EXPECT_EQ(calls[0].args["fields"], "uid,name,status");
+    ASSERT_EQ(events.size(), 50u);
+    unsigned never = 0;
+    for (unsigned i = 0; i < 50; ++i) {
+        auto row = user(ids[i].str(), "status");
+        std::string const time = row.count("status.time") ? row["status.time"] : "0";
+        EXPECT_EQ(events[i].statusText.str() + "@" + std::to_string(events[i].statusTime),
+                  row["status.message"] + "@" + time)
+            << ids[i];
+        never += events[i].statusTime == 0;
+    }
+    EXPECT_GT(never, 0u);
+    EXPECT_LT(never, 50u);
+}
+
+// The service shows a status that was never set as an empty message at time 0, not as nil.
+TEST_F(ConnectorEmulatorTest, UsersGetInfoShowsANeverSetStatusAsEmptyAtTimeZero) {
+    std::string uids;
+    for (String const& uid : friendIds()) uids += (uids.empty() ? "" : ",") + uid.str();
+    emu::XmlNode root("users_getInfo_response");
+    ASSERT_FALSE(emulator->store().usersGetInfo(emu::DemoAccount::uid, uids, "status", root).has_value());
+    unsigned never = 0;
+    for (emu::XmlNode const& u : root.children) {
+        emu::XmlNode const& status = u.children.at(1);
+        ASSERT_FALSE(status.nil) << u.children[0].text;
+        ASSERT_EQ(status.children.size(), 3u);
+        never += status.children[0].text.empty() && status.children[1].text == "0";
+    }
+    EXPECT_EQ(never, 55u / 4);
+}
+
+// An id the service does not know gets no answer: fewer statuses than ids.
+TEST_F(ConnectorEmulatorTest, ShortStatusAnswerFailsAndLeavesTheEventsAsTheyWere) {
+    connect();
+    Vector<String> const friends = friendIds();
+    Vector<String> ids{friends[0], "1", friends[1]};
+    Vector<Event> events{Event{"before", 42}};
+    EXPECT_CODE(connector.getPeerStatusBatch(ids, events), kFailure);
+    ASSERT_EQ(events.size(), 1u);
+    EXPECT_EQ(events[0].statusText + String::from(events[0].statusTime), "before42");
+    EXPECT_CODE(connector.getPeerStatus("1", events[0]), kFailure);
+    EXPECT_EQ(events[0].statusText, "before");
+}
+
+// Status queries turn every failure into a general one with the cause kept; a refused session is
+// forgotten, so nothing more is sent with it.
+TEST_F(ConnectorEmulatorTest, ServiceErrorsReachTheHostWithTheirCodes) {
+    connect();
+    emu::FaultRule unavailable;
+    unavailable.errorCode = 2;
+    emulator->faults().set("users.getInfo", unavailable);
+    Vector<String> ids{friendIds()[0]};
+    Vector<Event> events;
+    uError err = connector.getPeerStatusBatch(ids, events);
+    EXPECT_CODE(err, kFailure);
+    EXPECT_EQ(err.cause() ? err.cause()->code() : 0u, unsigned(kServiceUnavailable));
+    Peer peer;
+    EXPECT_CODE(connector.getPeerInfo(ids[0], peer), kServiceUnavailable);
+
+    emu::FaultRule expired;
+    expired.expireAfter = 1;  // the session has made two calls already
+    emulator->faults().set("friends.get", expired);
+    EXPECT_CODE(connector.getPeers(ids), kNotSignedIn);
+    std::uint64_t const sent = emulator->log().total();
+    EXPECT_CODE(connector.setStatus("after the end"), kNotSignedIn);
+    EXPECT_EQ(emulator->log().total(), sent);
+}
+
+TEST_F(ConnectorEmulatorTest, SetStatusIsWhatTheServiceThenShows) {
+    connect();
+    ASSERT_OK(connector.setStatus("is testing the connector"));
+    auto calls = emulator->log().entriesFor("users.setStatus");
+    ASSERT_EQ(calls.size(), 1u);
+    EXPECT_EQ(calls[0].args["call_id"], "1");
+    EXPECT_EQ(user(kDemoUid, "status")["status.message"], "is testing the connector");
+}
+
+// Before a connection the queries answer nothing and touch nothing; nothing is sent.
+TEST_F(ConnectorEmulatorTest, BeforeConnectionQueriesSucceedWithTheirOutputsUntouched) {
+    Vector<String> ids{"untouched"};
+    EXPECT_OK(connector.getPeers(ids));
+    EXPECT_EQ(ids, (Vector<String>{"untouched"}));
+    Peer peer{"u", "f", "l", "n", "p"};
+    EXPECT_OK(connector.getPeerInfo("1", peer));
+    Vector<Peer> peers{peer};
+    EXPECT_OK(connector.getPeerInfoBatch(ids, peers));
+    EXPECT_EQ(peers.size() + peer.serviceId.size(), 2u);
+    Event event{"before", 42};
+    EXPECT_OK(connector.getPeerStatus("1", event));
+    Vector<Event> events{event};
+    EXPECT_OK(connector.getPeerStatusBatch(ids, events));
+    EXPECT_EQ(events.size() == 1 ? events[0].statusText : String(), "before");
+    EXPECT_CODE(connector.setStatus("nobody to set it for"), kNotSignedIn);
+    EXPECT_OK(connector.publishPhoto("file:///tmp/x.png", "c"));
+    EXPECT_EQ(emulator->log().total(), 0u);
+}
+
+TEST(ConnectorConfigTest, BothTimesMustReadAsIntegers) {
+    struct Case {
+        Variant pollTime, maxTime;
+        unsigned code;
+    } const cases[] = {{300, 3600, kSuccess},
+                       {"300", "3600", kSuccess},
+                       {"soon", 3600, kFailure},
+                       {300, Variant(), kFailure},
+                       {true, 3600, kFailure}};
+    for (Case const& c : cases) {
+        FacebookConnector connector("facebook-connector");
+        Map<String, Variant> values{{"facebook_polltime", c.pollTime}, {"facebook_maxtime", c.maxTime}};
+        EXPECT_CODE(connector.sendConfig(Configuration::Group("facebook-connector", values)), c.code)
+            << c.pollTime << " " << c.maxTime;
+        EXPECT_EQ(connector.pollTime() + connector.maxTime(), c.code == kSuccess ? 3900 : 0);
+    }
+}
+
+}  // namespace
+}  // namespace trelm::test

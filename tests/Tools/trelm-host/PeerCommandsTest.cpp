@@ -1,0 +1,188 @@
+// trelm-host's peers, peer-status and set-status, run as a user runs them against a service
+// emulator that the test starts itself, so that what the connector did can be checked in the
+// emulator's request log and data.
+#include <algorithm>
+#include <fstream>
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include "Emulator.h"
+#include "EmulatorRows.h"
+#include "ProgramRunner.h"
+
+using nlohmann::json;
+
+namespace {
+
+using Row = emu::test::Row;
+
+constexpr char const* kDemoUser = "100000001";
+
+// The demo configuration, as scripts/demo.sh runs it.
+json demoConfig() {
+    std::ifstream file(TRELM_TEST_DATA_DIR "/../../Tools/trelm-host/demo.json");
+    return json::parse(file);
+}
+
+class PeerCommandsTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        emu::Emulator::Options options;
+        options.threads = 4;
+        emulator_ = std::make_unique<emu::Emulator>(options);
+        std::string error;
+        ASSERT_TRUE(emulator_->start(error)) << error;
+        useConfig(demoConfig());
+    }
+
+    void useConfig(json const& config) { config_ = runner_.writeFile("config.json", config.dump(2)); }
+
+    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& format = "json") {
+        std::vector<std::string> args{"--format",
+                                      format,
+                                      "--state-dir",
+                                      runner_.folder() + "/state",
+                                      "--no-emulator",
+                                      "--connect-to",
+                                      "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
+                                      "--connect-to",
+                                      "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
+                                      "--ca-file",
+                                      emulator_->caFile(),
+                                      "--config",
+                                      config_,
+                                      "--plugin",
+                                      TRELMFACEBOOK_MODULE};
+        args.insert(args.end(), command.begin(), command.end());
+        ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args);
+        for (std::string const& text : {result.out, result.err}) {
+            EXPECT_EQ(text.find(emu::DemoAccount::password), std::string::npos) << text;
+        }
+        return result;
+    }
+
+    static std::vector<json> linesOfType(ProgramRunner::Result const& result, std::string const& type) {
+        std::vector<json> lines;
+        for (std::string const& line : result.outLines()) {
+            json object = json::parse(line);
+            if (object.at("type") == type) lines.push_back(object);
+        }
+        return lines;
+    }
+
+    std::vector<Row> fql(std::string const& query) {
+        return emu::test::fqlRows(emulator_->store(), emu::DemoAccount::uid, query);
+    }
+
+    std::vector<emu::LoggedRequest> requests(std::string const& method) { return emulator_->log().entriesFor(method); }
+
+    ProgramRunner runner_;
+    std::unique_ptr<emu::Emulator> emulator_;
+    std::string config_;
+};
+
+TEST_F(PeerCommandsTest, PeersListsEveryFriendWithProfileFromTwoRequests) {
+    auto result = host({"peers"});
+    ASSERT_EQ(result.exitCode, 0) << result.err;
+    auto connection = linesOfType(result, "connection");
+    ASSERT_EQ(connection.size(), 1u) << result.out;
+    EXPECT_EQ(connection[0]["name"].get<std::string>() + " " + connection[0]["user"].get<std::string>(),
+              std::string("facebook-connector ") + kDemoUser);
+    std::vector<Row> listed;
+    for (json peer : linesOfType(result, "peer")) {
+        peer.erase("type");
+        peer.erase("index");
+        listed.push_back(peer.get<Row>());
+    }
+    std::vector<Row> expected =
+        fql("SELECT uid, first_name, last_name, name, profile_url FROM user "
+            "WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
+    std::sort(listed.begin(), listed.end());
+    std::sort(expected.begin(), expected.end());
+    EXPECT_EQ(listed, expected);
+    EXPECT_EQ(linesOfType(result, "peers").at(0)["count"], expected.size());
+    EXPECT_EQ(requests("friends.get").size() + requests("users.getInfo").size(), 2u);
+    EXPECT_EQ(emulator_->log().total(), 3u) << "one login, and the data source sent nothing";
+}
+
+// One friend with a status, one who never set one, asked for in one request; the table shows the
+// time in UTC, or "-" for none.
+TEST_F(PeerCommandsTest, PeerStatusAsksOnceForAllIdsInBothFormats) {
+    std::vector<Row> all = fql("SELECT uid, status FROM user WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
+    auto with = std::find_if(all.begin(), all.end(), [](Row& r) { return r.count("status.time") != 0; });
+    auto without = std::find_if(all.begin(), all.end(), [](Row& r) { return r.count("status.time") == 0; });
+    ASSERT_TRUE(with != all.end() && without != all.end());
+    std::string const a = (*with)["uid"];
+    std::string const b = (*without)["uid"];
+
+    auto result = host({"peer-status", a, b});
+    ASSERT_EQ(result.exitCode, 0) << result.err;
+    auto statuses = linesOfType(result, "peer_status");
+    ASSERT_EQ(statuses.size(), 2u) << result.out;
+    EXPECT_EQ(statuses[0], json({{"type", "peer_status"},
+                                 {"uid", a},
+                                 {"status", (*with)["status.message"]},
+                                 {"time", std::stoll((*with)["status.time"])}}));
+    EXPECT_EQ(statuses[1], json({{"type", "peer_status"}, {"uid", b}, {"status", ""}, {"time", 0}}));
+    auto calls = requests("users.getInfo");
+    ASSERT_EQ(calls.size(), 1u);
+    EXPECT_EQ(calls[0].args["uids"], a + "," + b);
+
+    auto table = host({"peer-status", b}, "table");
+    ASSERT_EQ(table.exitCode, 0) << table.err;
+    auto lines = table.outLines();
+    ASSERT_GE(lines.size(), 2u);
+    EXPECT_EQ(lines[lines.size() - 2].rfind("UID", 0), 0u) << table.out;
+    EXPECT_EQ(lines.back().rfind(b + "  -", 0), 0u) << table.out;
+}
+
+// What the connector set is the user's status, and the data source's stream query lists it as
+// the newest status post.
+TEST_F(PeerCommandsTest, StatusSetThroughTheConnectorIsReadBackByTheSourcesStatusQuery) {
+    std::string const text = "is testing the connector from the host";
+    auto result = host({"set-status", "is", "testing", "the", "connector", "from", "the", "host"});
+    ASSERT_EQ(result.exitCode, 0) << result.err;
+    auto set = linesOfType(result, "status_set");
+    ASSERT_EQ(set.size(), 1u) << result.out;
+    EXPECT_EQ(set[0]["text"], text);
+    auto calls = requests("users.setStatus");
+    ASSERT_EQ(calls.size(), 1u);
+    EXPECT_EQ(calls[0].args["status"], text);
+    EXPECT_EQ(fql("SELECT status FROM user WHERE uid = me()").at(0)["status.message"], text);
+
+    auto listed = host({"query", "status", "--limit", "1"});
+    ASSERT_EQ(listed.exitCode, 0) << listed.err;
+    auto records = linesOfType(listed, "record");
+    ASSERT_EQ(records.size(), 1u) << listed.out;
+    json const& fields = records[0]["fields"];
+    EXPECT_EQ(fields["core_event_text"], text);
+    EXPECT_EQ(fields["core_event_contactid"], kDemoUser);
+}
+
+// A failed connection or command ends the run with status 3 and says why.
+TEST_F(PeerCommandsTest, ConnectionFailuresEndTheCommandWithTheReason) {
+    struct Case {
+        char const* key;    // the connector's configuration key changed ...
+        char const* value;  // ... to this; null removes it
+        std::vector<std::string> command;
+        char const* says;  // in the error output
+    } const cases[] = {{"FacebookPassword", "not the password", {"peers"}, "service error 100"},
+                       {"FacebookLogin", nullptr, {"set-status", "hi"}, "has no FacebookLogin"}};
+    for (Case const& c : cases) {
+        json config = demoConfig();
+        json& connector = config.at("components").at(1).at("config");
+        c.value ? void(connector[c.key] = c.value) : void(connector.erase(c.key));
+        useConfig(config);
+        auto result = host(c.command);
+        EXPECT_EQ(result.exitCode, 3) << result.out << result.err;
+        EXPECT_NE(result.err.find(c.says), std::string::npos) << result.err;
+    }
+    EXPECT_EQ(requests("users.setStatus").size(), 0u);
+}
+
+}  // namespace
