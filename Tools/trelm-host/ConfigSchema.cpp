@@ -43,7 +43,12 @@ std::vector<Section> const& sections() {
           {"haveExtendedApi", Kind::Flag}}},
         {"@trelm.example:/facebookconnector",
          {{"facebook_polltime", Kind::Integer, 1, 86400},
-          {"facebook_maxtime", Kind::Integer, 1, 7 * 86400}}},
+          {"facebook_maxtime", Kind::Integer, 1, 7 * 86400},
+          {"FacebookAppKey", Kind::Text},
+          {"FacebookAppSecret", Kind::Text},
+          {"FacebookLogin", Kind::Text},
+          {"FacebookPassword", Kind::Text},
+          {"FacebookID", Kind::Text}}},
     };
     return known;
 }
