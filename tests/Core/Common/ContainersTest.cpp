@@ -2,6 +2,8 @@
 
 #include <vector>
 
+#include "ErrorAssertions.h"
+
 #include "trelm/Map.h"
 #include "trelm/Set.h"
 #include "trelm/SmartPtr.h"
@@ -29,7 +31,7 @@ TEST(MapTest, InsertReplacesAnEqualKeyAndAbsentKeysAreNullOrRemovedQuietly) {
 TEST(MapTest, IterationRunsInAscendingByteOrder) {
     Map<String, int> m;
     for (char const* k : {"session_key", "api_key", "call_id", "Zeta", "v", "format"}) {
-        m.insert(k, 0);
+        ASSERT_OK(m.insert(k, 0));
     }
     std::vector<std::string> keys;
     for (auto const& entry : m) keys.push_back(entry.first.str());
@@ -39,14 +41,14 @@ TEST(MapTest, IterationRunsInAscendingByteOrder) {
 
 TEST(SetTest, KeepsOneCopyOfEqualValuesInOrder) {
     Set<String> s;
-    s.insert("b");
-    s.insert("a");
-    s.insert("b");
+    ASSERT_OK(s.insert("b"));
+    ASSERT_OK(s.insert("a"));
+    ASSERT_OK(s.insert("b"));
     EXPECT_EQ(s.size(), 2u);
     EXPECT_TRUE(s.contains("a"));
     EXPECT_EQ(*s.begin(), "a");
     EXPECT_EQ(s.remove("zzz").code(), kSuccess);
-    s.remove("a");
+    EXPECT_OK(s.remove("a"));
     EXPECT_FALSE(s.contains("a"));
 }
 

@@ -6,17 +6,11 @@ namespace trelm {
 namespace {
 
 BaseSource::Record record() {
-    BaseSource::Record r;
-    r.insert("type_int", 9);
-    r.insert("type_text", "4");
-    r.insert("type_junk", "four");
-    r.insert("type_big", 1LL << 40);
-    r.insert("text", "hello");
-    r.insert("text_empty", "");
-    r.insert("number", 12);
-    r.insert("list", Vector<String>{"a"});
-    r.insert("empty_variant", Variant());
-    return r;
+    return BaseSource::Record{
+        {"type_int", 9},  {"type_text", "4"},      {"type_junk", "four"},      {"type_big", 1LL << 40},
+        {"text", "hello"}, {"text_empty", ""},     {"number", 12},             {"list", Vector<String>{"a"}},
+        {"empty_variant", Variant()},
+    };
 }
 
 struct FieldCase {

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <functional>
 #include <map>
 #include <string>
@@ -102,9 +104,7 @@ TEST_P(SourceSequenceTest, FirstFailingHookStopsTheSequenceAndIsReturned) {
 }
 
 BaseSource::Record someRecord() {
-    BaseSource::Record r;
-    r.insert("core_object_type", 4);
-    return r;
+    return BaseSource::Record{{"core_object_type", 4}};
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -196,18 +196,18 @@ TEST(ComponentTest, StateFollowsTheEntryPointsThatSucceeded) {
     RecordingSource source;
     EXPECT_EQ(source.state(), Component::State::Created);
     source.answers["sendConfigImpl"] = TRELM_ERROR(kInvalid);
-    source.sendConfig(Configuration::Group("g"));
+    EXPECT_CODE(source.sendConfig(Configuration::Group("g")), kInvalid);
     EXPECT_EQ(source.state(), Component::State::Created);
     source.answers.clear();
-    source.sendConfig(Configuration::Group("g"));
+    EXPECT_OK(source.sendConfig(Configuration::Group("g")));
     EXPECT_EQ(source.state(), Component::State::Configured);
-    source.startup();
+    EXPECT_OK(source.startup());
     EXPECT_EQ(source.state(), Component::State::Started);
-    source.sendConfig(Configuration::Group("g"));
+    EXPECT_OK(source.sendConfig(Configuration::Group("g")));
     EXPECT_EQ(source.state(), Component::State::Started);
-    source.stop();
+    EXPECT_OK(source.stop());
     EXPECT_EQ(source.state(), Component::State::Stopped);
-    source.shutdown();
+    EXPECT_OK(source.shutdown());
     EXPECT_EQ(source.state(), Component::State::ShutDown);
     EXPECT_EQ(source.name(), "source");
     EXPECT_EQ(source.componentId(), "@test:/source");
@@ -241,9 +241,7 @@ protected:
 
 TEST(BaseConnectorTest, WakeupMessageReachesWakeupImplBetweenTheMessageHooks) {
     RecordingConnector connector;
-    Map<String, String> params;
-    params.insert("source", "");
-    WakeupMessage msg(params);
+    WakeupMessage msg(Map<String, String>{{"source", ""}});
     EXPECT_EQ(connector.onMessage(msg).code(), kNoData);
     EXPECT_EQ(connector.walk().code(), kSuccess);
     EXPECT_EQ(connector.log, (Log{"preMessageImpl", "wakeupImpl", "postMessageImpl(1)", "walkImpl"}));

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <string>
 #include <vector>
 
@@ -48,7 +50,7 @@ TEST_F(MessagingTest, TargetedMessageReachesOnlyThatComponentAndReturnsItsResult
 
 TEST_F(MessagingTest, UnknownTargetOrNoActiveRegistryIsNotFound) {
     Recorder a("a", log_);
-    registry_.add("a", &a);
+    ASSERT_OK(registry_.add("a", &a));
     WipeMessage msg;
     EXPECT_EQ(msg.send("RuntimeConfiguration").code(), kNotFound);
     registry_.deactivate();
@@ -81,10 +83,8 @@ TEST_F(MessagingTest, ReceiverAnswersThroughTheCallersMap) {
             return TRELM_OK();
         }
     } store;
-    registry_.add(store.name(), &store);
-    Map<String, Variant> values;
-    values.insert("facebook_source_lastuser", Variant());
-    values.insert("other", Variant());
+    ASSERT_OK(registry_.add(store.name(), &store));
+    Map<String, Variant> values{{"facebook_source_lastuser", Variant()}, {"other", Variant()}};
     GetRuntimeConfigurationMessage msg("source", values);
     ASSERT_EQ(msg.send("RuntimeConfiguration").code(), kSuccess);
     EXPECT_EQ(*values.search("facebook_source_lastuser"), Variant("1234"));
@@ -107,10 +107,9 @@ protected:
     uError handleMessage(IMessage& msg) override {
         log_.push_back(name().str() + ":" + msg.type().str());
         if (msg.type() != "WipeMessage") return TRELM_OK();
-        registry_.add(late_->name(), late_);
+        TRELM_RETURN_IF_ERROR(registry_.add(late_->name(), late_));
         IMessage inner("Inner");
-        uError e = inner.send(next_);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(inner.send(next_));
         IMessage everyone("Everyone");
         return everyone.send("");
     }
@@ -126,8 +125,8 @@ TEST_F(MessagingTest, HandlerMaySendAndRegisterReentrantly) {
     Recorder late("late", log_);
     Recorder b("b", log_);
     Forwarder a("a", "b", log_, registry_, &late);
-    registry_.add("a", &a);
-    registry_.add("b", &b);
+    ASSERT_OK(registry_.add("a", &a));
+    ASSERT_OK(registry_.add("b", &b));
     WipeMessage msg;
     ASSERT_EQ(msg.send("a").code(), kSuccess);
     EXPECT_EQ(log_, (std::vector<std::string>{"a:WipeMessage", "b:Inner", "a:Everyone",

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <memory>
 
 #include "BaseSource.h"
@@ -34,8 +36,8 @@ TEST(ModuleBoundaryTest, MessagesAreRecognisedAcrossAHiddenVisibilityModule) {
     registry.activate();
     std::unique_ptr<Component> module(hiddenModuleComponent("module"));
     SidAnswerer host;
-    registry.add("module", module.get());
-    registry.add("host", &host);
+    ASSERT_OK(registry.add("module", module.get()));
+    ASSERT_OK(registry.add("host", &host));
 
     WakeupMessage wakeup;
     ASSERT_EQ(wakeup.send("module").code(), kSuccess);

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <fstream>
 #include <functional>
 #include <map>
@@ -177,8 +179,7 @@ INSTANTIATE_TEST_SUITE_P(Skips, FqlParseObjSkipTest,
                                            SkipCase{3, {}}, SkipCase{7, {}}));
 
 TEST(FqlParseObjTest, EmptyAnswerIsSuccessWithNoRows) {
-    Rows rows;
-    rows.pushBack(Map<String, String>{{"earlier", "row"}});
+    Rows rows{Map<String, String>{{"earlier", "row"}}};
     unsigned count = 99;
     FqlParseObj p("fql_query_response", "user", 0);
     ASSERT_EQ(p.parse(loadXml("fql_query_response_empty.xml"), rows, count).code(), kSuccess);
@@ -301,8 +302,7 @@ std::vector<ParseObject> allParseObjects() {
     Row const earlier{{"earlier", "row"}};
     auto rows = [earlier](auto&& parse) {
         return [earlier, parse](String const& x, bool& kept) {
-            Rows v;
-            v.pushBack(Map<String, String>{{"earlier", "row"}});
+            Rows v{Map<String, String>{{"earlier", "row"}}};
             unsigned c = 99;
             uError e = parse(x, v, c);
             kept = plain(v) == std::vector<Row>{earlier} && c == 0;
@@ -333,8 +333,7 @@ std::vector<ParseObject> allParseObjects() {
          }},
         {"listhash",
          [earlier](String const& x, bool& kept) {
-             Rows v;
-             v.pushBack(Map<String, String>{{"earlier", "row"}});
+             Rows v{Map<String, String>{{"earlier", "row"}}};
              uError e = ListHashParseObj("r").parse(x, v);
              kept = plain(v) == std::vector<Row>{earlier};
              return e;

@@ -1,6 +1,8 @@
 #include "RuntimeConfiguration.h"
 
 #include <gtest/gtest.h>
+
+#include "ErrorAssertions.h"
 #include <sys/stat.h>
 
 #include <fstream>
@@ -28,7 +30,7 @@ protected:
 
     uError put(String const& tag, std::initializer_list<std::pair<char const*, Variant>> values) {
         Set<Configuration::Value> set;
-        for (auto const& [k, v] : values) set.insert(Configuration::Value(k, v));
+        for (auto const& [k, v] : values) EXPECT_OK(set.insert(Configuration::Value(k, v)));
         RuntimeConfigurationMessage msg(tag, set);
         return msg.send("RuntimeConfiguration");
     }
@@ -39,7 +41,7 @@ protected:
     // The values under tag for keys; "-" marks a key that stayed empty.
     std::vector<std::string> get(String const& tag, std::vector<char const*> const& keys) {
         Map<String, Variant> values;
-        for (char const* k : keys) values.insert(k, Variant());
+        for (char const* k : keys) EXPECT_OK(values.insert(k, Variant()));
         GetRuntimeConfigurationMessage msg(tag, values);
         uError e = msg.send("RuntimeConfiguration");
         EXPECT_EQ(e.code(), kSuccess) << e;
@@ -160,9 +162,8 @@ TEST_F(RuntimeConfigurationTest, ConcurrentWritersAndReadersSeeWholeValues) {
         threads.emplace_back([&, t] {
             String tag = String::from(t);
             for (int i = 0; i < kRounds; ++i) {
-                Set<Configuration::Value> set;
-                set.insert(Configuration::Value("a", Variant(String::from(i))));
-                set.insert(Configuration::Value("b", Variant(String::from(i))));
+                Set<Configuration::Value> const set{Configuration::Value("a", Variant(String::from(i))),
+                                                    Configuration::Value("b", Variant(String::from(i)))};
                 if (store_.store(tag, set).failed()) ++failures;
                 Map<String, Variant> values{{"a", Variant()}, {"b", Variant()}};
                 if (store_.get(tag, values).failed() || values.search("a")->asString() != String::from(i) ||

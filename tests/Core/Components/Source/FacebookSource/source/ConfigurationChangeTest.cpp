@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <cstdio>
 #include <mutex>
 #include <string>
@@ -146,12 +148,12 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
         SCOPED_TRACE(c.name);
         String const name("change" + std::to_string(n++));
         Configuration::Group group = host->demoGroup(name, c.configuredSession);
-        group.set("haveExtendedApi", Variant(c.extendedApi));
-        group.set("wipeComponents", Variant(Vector<String>{"observer"}));
-        group.set("wakeupComponents", Variant(Vector<String>{"observer"}));
+        ASSERT_OK(group.set("haveExtendedApi", Variant(c.extendedApi)));
+        ASSERT_OK(group.set("wipeComponents", Variant(Vector<String>{"observer"})));
+        ASSERT_OK(group.set("wakeupComponents", Variant(Vector<String>{"observer"})));
         if (c.configuredLogin) {
-            group.set(kLogin, Variant(emu::DemoAccount::email));
-            group.set(kPassword, Variant(emu::DemoAccount::password));
+            ASSERT_OK(group.set(kLogin, Variant(emu::DemoAccount::email)));
+            ASSERT_OK(group.set(kPassword, Variant(emu::DemoAccount::password)));
         }
         FacebookSource& source = host->addSource(group);
 
@@ -159,14 +161,14 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
         Set<Configuration::Value> values;
         for (auto const& [key, value] : c.stored) {
             std::string const text = value == "$session" ? fresh.key : value == "$secret" ? fresh.secret : value;
-            values.insert(Configuration::Value(key, Variant(String(text))));
+            ASSERT_OK(values.insert(Configuration::Value(key, Variant(String(text)))));
         }
         ASSERT_EQ(host->runtime().store(name, values).code(), kSuccess);
         observer->clear();
         host->emulator().log().clear();
 
         Set<String> changed;
-        for (char const* key : c.changed) changed.insert(key);
+        for (char const* key : c.changed) ASSERT_OK(changed.insert(key));
         ConfigurationChangedMessage msg(changed);
         uError err = source.onMessage(msg);
         EXPECT_EQ(err.code(), kSuccess) << err;
@@ -198,7 +200,7 @@ TEST_F(ConfigurationChangeTest, ChangesBeforeStartupFailClearlyWhenTheyNeedTheCl
     EXPECT_EQ(source.onMessage(login).code(), kNotSet) << "no settings yet";
 
     Configuration::Group group = host->demoGroup("unstarted", false);
-    group.set("haveExtendedApi", Variant(false));
+    ASSERT_OK(group.set("haveExtendedApi", Variant(false)));
     ASSERT_EQ(source.sendConfig(group).code(), kSuccess);
     ConfigurationChangedMessage session(Set<String>{kSessionId});
     EXPECT_EQ(source.onMessage(session).code(), kNotSet) << "no client yet";

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <algorithm>
 #include <memory>
 #include <set>
@@ -78,7 +80,7 @@ protected:
     static Cursor open(std::vector<Constraint> extra = {}) {
         Vector<Constraint> constraints{
             Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), Constraint::Equal}};
-        for (Constraint const& c : extra) constraints.pushBack(c);
+        for (Constraint const& c : extra) EXPECT_OK(constraints.pushBack(c));
         IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints);
         uError err = source->onMessage(msg);
         EXPECT_EQ(err.code(), kSuccess) << err;
@@ -289,7 +291,7 @@ TEST_F(ContactCursorTest, RecordsCarryContactFieldsAndTheSourcesIdentityAsACopy)
     EXPECT_EQ(*row->search("core_contact_name"), *row->search("core_contact_display_name"));
     EXPECT_EQ(row->search("core_contact_profile_url"), nullptr) << "not in the field list";
 
-    row->insert("core_contact_name", Variant("changed"));
+    ASSERT_OK(row->insert("core_contact_name", Variant("changed")));
     SmartPtr<Map<String, Variant>> again;
     ASSERT_EQ(cursor->getRow(again).code(), kSuccess);
     EXPECT_NE(again->search("core_contact_name")->asString(), "changed");

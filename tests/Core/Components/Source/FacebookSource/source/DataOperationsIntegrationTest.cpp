@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <algorithm>
 #include <cstdlib>
 #include <filesystem>
@@ -66,9 +68,7 @@ std::string* DataOperationsIntegrationTest::photo = nullptr;
 
 TEST_F(DataOperationsIntegrationTest, InsertedStatusIsPostedAndAppearsInTheStream) {
     std::string const text = "reading about keyset paging";
-    Record status;
-    status.insert("core_object_type", Variant(4));
-    status.insert("core_event_text", Variant(text.c_str()));
+    Record status{{"core_object_type", Variant(4)}, {"core_event_text", Variant(text.c_str())}};
     uError err = source->insert(status);
     ASSERT_EQ(err.code(), kSuccess) << err;
 
@@ -103,11 +103,13 @@ TEST_F(DataOperationsIntegrationTest, InsertedPhotoIsUploadedAndItsIdWrittenBack
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
         host->emulator().log().clear();
-        Record media;
-        media.insert("core_object_type", Variant(9));
-        media.insert("media_uri", Variant(String("file://" + *photo)));
-        if (c.caption != nullptr) media.insert("media_notes", Variant(c.caption));
-        if (c.intoAlbum) media.insert("facebook_media_album_service_id", Variant(String(albums[0])));
+        Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String("file://" + *photo))}};
+        if (c.caption != nullptr) {
+            ASSERT_OK(media.insert("media_notes", Variant(c.caption)));
+        }
+        if (c.intoAlbum) {
+            ASSERT_OK(media.insert("facebook_media_album_service_id", Variant(String(albums[0]))));
+        }
         uError err = source->insert(media);
         ASSERT_EQ(err.code(), kSuccess) << err;
 
@@ -135,9 +137,7 @@ TEST_F(DataOperationsIntegrationTest, FailedUploadLeavesTheRecordWithoutServiceI
     emu::FaultRule unavailable;
     unavailable.errorCode = 2;
     host->emulator().faults().set("photos.upload", unavailable);
-    Record media;
-    media.insert("core_object_type", Variant(9));
-    media.insert("media_uri", Variant(String(*photo)));
+    Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String(*photo))}};
     EXPECT_EQ(source->insert(media).code(), kServiceUnavailable);
     EXPECT_EQ(media.search("core_service_id"), nullptr);
 }
@@ -153,8 +153,7 @@ TEST_F(DataOperationsIntegrationTest, RetrieveFindsListedRecordsUntilTheLastCurs
     GUID const guid = row->search("core_object_id")->asGUID();
     ASSERT_EQ(same->search("core_object_id")->asGUID(), guid) << "one GUID per friend while both cursors live";
 
-    Record out;
-    out.insert("caller_key", Variant("kept"));
+    Record out{{"caller_key", Variant("kept")}};
     uError err = source->retrieve(guid, out, false);
     ASSERT_EQ(err.code(), kSuccess) << err;
     for (auto const& [key, value] : *row) EXPECT_EQ(*out.search(key), value) << key;

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <functional>
 #include <string>
 #include <vector>
@@ -25,18 +27,16 @@ public:
 };
 
 Configuration::Group configuredGroup() {
-    Configuration::Group group(kSourceName);
-    group.set("facebook_source_appkey", Variant("key"));
-    group.set("facebook_source_appsecret", Variant("secret"));
-    group.set("facebook_source_session_user", Variant("100000001"));
-    group.set("facebook_source_session_id", Variant("session"));
-    group.set("facebook_source_session_secret", Variant("session-secret"));
-    return group;
+    return Configuration::Group(kSourceName, {{"facebook_source_appkey", Variant("key")},
+                                              {"facebook_source_appsecret", Variant("secret")},
+                                              {"facebook_source_session_user", Variant("100000001")},
+                                              {"facebook_source_session_id", Variant("session")},
+                                              {"facebook_source_session_secret", Variant("session-secret")}});
 }
 
 Record record(std::initializer_list<std::pair<char const*, Variant>> entries) {
     Record r;
-    for (auto const& [key, value] : entries) r.insert(key, value);
+    for (auto const& [key, value] : entries) EXPECT_OK(r.insert(key, value));
     return r;
 }
 

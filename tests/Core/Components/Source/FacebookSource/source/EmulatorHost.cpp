@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 namespace trelm::test {
 
 EmulatorHost::EmulatorHost(emu::GeneratorOptions const& generator) {
@@ -11,7 +13,8 @@ EmulatorHost::EmulatorHost(emu::GeneratorOptions const& generator) {
 }
 
 EmulatorHost::~EmulatorHost() {
-    for (String const& name : registered_) registry_.remove(name);
+    // Teardown: a name that is already gone needs nothing more.
+    for (String const& name : registered_) registry_.remove(name).ignore();
     registry_.deactivate();
     sources_.clear();
     emulator_->stop();
@@ -31,16 +34,15 @@ bool EmulatorHost::start(std::string& error) {
 }
 
 Configuration::Group EmulatorHost::demoGroup(String const& name, bool session) {
-    Configuration::Group group(name);
-    group.set("facebook_source_appkey", Variant(emu::DemoAccount::apiKey));
-    group.set("facebook_source_appsecret", Variant(emu::DemoAccount::appSecret));
+    Map<String, Variant> values{{"facebook_source_appkey", Variant(emu::DemoAccount::apiKey)},
+                                {"facebook_source_appsecret", Variant(emu::DemoAccount::appSecret)}};
     if (session) {
         emu::Session s = emulator_->loginDemo();
-        group.set("facebook_source_session_user", Variant(String::from(static_cast<long long>(s.uid))));
-        group.set("facebook_source_session_id", Variant(String(s.key)));
-        group.set("facebook_source_session_secret", Variant(String(s.secret)));
+        EXPECT_OK(values.insert("facebook_source_session_user", Variant(String::from(static_cast<long long>(s.uid)))));
+        EXPECT_OK(values.insert("facebook_source_session_id", Variant(String(s.key))));
+        EXPECT_OK(values.insert("facebook_source_session_secret", Variant(String(s.secret))));
     }
-    return group;
+    return Configuration::Group(name, values);
 }
 
 FacebookSource& EmulatorHost::addBareSource(String const& name) {

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <atomic>
 #include <chrono>
 #include <random>
@@ -64,9 +66,8 @@ TEST(MappingCacheStressTest, CursorsOnSeveralThreadsKeepCountsAndGuidsConsistent
                         ++failures;
                         ADD_FAILURE() << "pinned id " << id << " got another GUID";
                     }
-                    auto record = makeSmart<Record>();
-                    record->insert("core_object_id", Variant(g));
-                    record->insert("sid", Variant(String::from(id)));
+                    auto record = makeSmart<Record>(
+                        Record{{"core_object_id", Variant(g)}, {"sid", Variant(String::from(id))}});
                     if (uError e = cache.setItem(tag, kKey, record); e.failed()) return fail("setItem", e);
 
                     // Whatever record another cursor stored under a GUID must carry that GUID.

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <map>
 #include <string>
 #include <vector>
@@ -70,7 +72,7 @@ TEST_P(MappingCacheScenario, AnswersExactCodesAndKeepsItsInvariants) {
             }
         } else if (s.op == Step::Store) {
             auto record = makeSmart<Record>();
-            record->insert("core_object_id", s.label ? Variant(labels.at(s.label)) : Variant(5));
+            ASSERT_OK(record->insert("core_object_id", s.label ? Variant(labels.at(s.label)) : Variant(5)));
             err = cache.setItem(s.tag, Metadata::Key(), record);
             if (err.ok()) stored[s.version] = record;
         } else if (s.op == Step::Fetch) {

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -41,12 +43,12 @@ Constraint other() {
 class QueryDispatchTest : public ::testing::Test {
 protected:
     void SetUp() override {
-        Configuration::Group group(kSourceName);
-        group.set("facebook_source_appkey", Variant("key"));
-        group.set("facebook_source_appsecret", Variant("secret"));
-        group.set("facebook_source_session_user", Variant("100000001"));
-        group.set("facebook_source_session_id", Variant("session"));
-        group.set("facebook_source_session_secret", Variant("session-secret"));
+        Configuration::Group const group(kSourceName,
+                                         {{"facebook_source_appkey", Variant("key")},
+                                          {"facebook_source_appsecret", Variant("secret")},
+                                          {"facebook_source_session_user", Variant("100000001")},
+                                          {"facebook_source_session_id", Variant("session")},
+                                          {"facebook_source_session_secret", Variant("session-secret")}});
         ASSERT_EQ(source.sendConfig(group).code(), kSuccess);
         ASSERT_EQ(source.startup().code(), kSuccess);
     }
