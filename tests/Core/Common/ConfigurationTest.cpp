@@ -40,7 +40,7 @@ TEST(ConfigurationTest, GetBoolAcceptsBoolLikeValuesAndDefaultsWhenAbsent) {
         // out starts as !def for successes so that a skipped write would show; for failures it
         // must keep its start value `expected`.
         bool out = c.code == kSuccess ? !c.expected : c.expected;
-        EXPECT_EQ(group.get(c.key, out, c.def).code(), c.code) << c.key;
+        EXPECT_CODE(group.get(c.key, out, c.def), c.code) << c.key;
         EXPECT_EQ(out, c.expected) << c.key;
     }
 }
@@ -60,7 +60,7 @@ TEST(ConfigurationTest, GetListAcceptsListsAndASingleString) {
                        {"flag_true", kInvalid, {"untouched"}}};
     for (auto const& c : cases) {
         Vector<String> out{"untouched"};
-        EXPECT_EQ(group.get(c.key, out, def).code(), c.code) << c.key;
+        EXPECT_CODE(group.get(c.key, out, def), c.code) << c.key;
         EXPECT_EQ(out, c.expected) << c.key;
     }
 }

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -82,10 +84,10 @@ TEST(GUIDTest, ForkedChildDoesNotRepeatTheParentsNextValues) {
 TEST(GUIDTest, TextRoundTripsAndUppercaseIsAccepted) {
     GUID g = GUID::generate();
     GUID back;
-    ASSERT_EQ(GUID::fromString(g.toString(), back).code(), kSuccess);
+    ASSERT_OK(GUID::fromString(g.toString(), back));
     EXPECT_EQ(back, g);
     GUID upper;
-    ASSERT_EQ(GUID::fromString("0F1E2D3C-4B5A-4978-8695-A4B3C2D1E0F9", upper).code(), kSuccess);
+    ASSERT_OK(GUID::fromString("0F1E2D3C-4B5A-4978-8695-A4B3C2D1E0F9", upper));
     EXPECT_EQ(upper.toString(), "0f1e2d3c-4b5a-4978-8695-a4b3c2d1e0f9");
 }
 
@@ -98,15 +100,15 @@ TEST(GUIDTest, MalformedTextIsRefusedAndLeavesTheTargetUntouched) {
                              "{0f1e2d3c-4b5a-4978-8695-a4b3c2d1e0f}",
                              "0f1e2d3c-4b5a-4978-8695-a4b3c2d1e0fg"}) {
         GUID target = original;
-        EXPECT_EQ(GUID::fromString(text, target).code(), kInvalid) << text;
+        EXPECT_CODE(GUID::fromString(text, target), kInvalid) << text;
         EXPECT_EQ(target, original) << text;
     }
 }
 
 TEST(GUIDTest, OrderFollowsTheBytesAndMatchesTheText) {
     GUID a, b;
-    ASSERT_TRUE(GUID::fromString("00000000-0000-0000-0000-0000000000ff", a).ok());
-    ASSERT_TRUE(GUID::fromString("00000000-0000-0000-0000-000000000100", b).ok());
+    ASSERT_OK(GUID::fromString("00000000-0000-0000-0000-0000000000ff", a));
+    ASSERT_OK(GUID::fromString("00000000-0000-0000-0000-000000000100", b));
     EXPECT_TRUE(a < b);
     EXPECT_FALSE(b < a);
     EXPECT_TRUE(GUID() < a);

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 namespace trelm {
 namespace {
 
@@ -22,14 +24,14 @@ TEST(MetadataTest, HostCoreKeysAreKnownWithTheirTypes) {
                        {"media_notes", TRELM_TYPES::STRING}};
     for (auto const& c : cases) {
         TYPES type = TRELM_TYPES::NONE;
-        ASSERT_EQ(Metadata::getType(c.name, type).code(), kSuccess) << c.name;
+        ASSERT_OK(Metadata::getType(c.name, type)) << c.name;
         EXPECT_EQ(type, c.type) << c.name;
     }
 }
 
 TEST(MetadataTest, UnknownNameIsNotFoundAndLeavesTheType) {
     TYPES type = TRELM_TYPES::INT64;
-    EXPECT_EQ(Metadata::getType("metadata_test_never_registered", type).code(), kNotFound);
+    EXPECT_CODE(Metadata::getType("metadata_test_never_registered", type), kNotFound);
     EXPECT_EQ(type, TRELM_TYPES::INT64);
 }
 
@@ -39,7 +41,7 @@ TEST(MetadataTest, SecondRegistrationOfANameKeepsTheFirstType) {
     Metadata::Key second = trelm_RegisterMetadataType("metadata_test_twice", TRELM_TYPES::INT32);
     EXPECT_EQ(second.type(), TRELM_TYPES::STRING);
     TYPES type = TRELM_TYPES::NONE;
-    ASSERT_TRUE(Metadata::getType("metadata_test_twice", type).ok());
+    ASSERT_OK(Metadata::getType("metadata_test_twice", type));
     EXPECT_EQ(type, TRELM_TYPES::STRING);
 }
 

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <climits>
 
 namespace trelm {
@@ -74,19 +76,19 @@ TEST_P(StringParseTest, WholeTextMustBeADecimalInRange) {
     int i = -777;
     uError ei = String(c.text).to(i);
     if (c.intOk) {
-        EXPECT_EQ(ei.code(), kSuccess);
+        EXPECT_OK(ei);
         EXPECT_EQ(i, c.intValue);
     } else {
-        EXPECT_EQ(ei.code(), kInvalid);
+        EXPECT_CODE(ei, kInvalid);
         EXPECT_EQ(i, -777) << "out-parameter written on failure";
     }
     unsigned u = 777;
     uError eu = String(c.text).to(u);
     if (c.unsignedOk) {
-        EXPECT_EQ(eu.code(), kSuccess);
+        EXPECT_OK(eu);
         EXPECT_EQ(u, c.unsignedValue);
     } else {
-        EXPECT_EQ(eu.code(), kInvalid);
+        EXPECT_CODE(eu, kInvalid);
         EXPECT_EQ(u, 777u) << "out-parameter written on failure";
     }
 }

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <climits>
 
 namespace trelm {
@@ -61,10 +63,10 @@ TEST_P(VariantConversionTest, ConvertsWhereTheValueAllowsAndOtherwiseLeavesTheTa
     bool untouched = false;
     uError e = convert(c.in, c.target, result, untouched);
     if (c.ok) {
-        ASSERT_EQ(e.code(), kSuccess) << e;
+        ASSERT_OK(e);
         EXPECT_EQ(result, c.expected);
     } else {
-        EXPECT_EQ(e.code(), kInvalid);
+        EXPECT_CODE(e, kInvalid);
         EXPECT_TRUE(untouched) << "out-parameter written on refusal, now " << result;
     }
 }

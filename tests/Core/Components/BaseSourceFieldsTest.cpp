@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "BaseSource.h"
 
 namespace trelm {
@@ -34,7 +36,7 @@ TEST(BaseSourceFieldsTest, FieldRequiredReadsAnIntegerOrRefuses) {
     for (auto const& c : cases) {
         int out = -1;
         uError e = BaseSource::fieldRequired(r, c.key, out);
-        EXPECT_EQ(e.code(), c.code) << c.key;
+        EXPECT_CODE(e, c.code) << c.key;
         EXPECT_EQ(e.cause() != nullptr, c.wrapsCause) << c.key;
         EXPECT_EQ(out, c.value) << c.key;
     }
@@ -51,10 +53,10 @@ TEST(BaseSourceFieldsTest, FieldRequiredNotEmptyRefusesMissingEmptyAndUnconverti
     for (auto const& c : cases) {
         String out("untouched");
         uError e = BaseSource::fieldRequiredNotEmpty(r, c.key, out);
-        EXPECT_EQ(e.code(), c.code) << c.key;
+        EXPECT_CODE(e, c.code) << c.key;
         EXPECT_EQ(e.cause() != nullptr, c.wrapsCause) << c.key;
         EXPECT_EQ(out, c.text) << c.key;
-        EXPECT_EQ(BaseSource::fieldRequiredStringNotEmpty(r, c.key).code(), c.code) << c.key;
+        EXPECT_CODE(BaseSource::fieldRequiredStringNotEmpty(r, c.key), c.code) << c.key;
     }
 }
 
@@ -73,7 +75,7 @@ TEST(BaseSourceFieldsTest, FieldOptionalTellsPresenceAndRefusesUnconvertible) {
         bool present = !c.present;
         if (c.code != kSuccess) present = c.present;
         String out("untouched");
-        EXPECT_EQ(BaseSource::fieldOptional(r, c.key, present, out).code(), c.code) << c.key;
+        EXPECT_CODE(BaseSource::fieldOptional(r, c.key, present, out), c.code) << c.key;
         EXPECT_EQ(present, c.present) << c.key;
         EXPECT_EQ(out, c.text) << c.key;
     }

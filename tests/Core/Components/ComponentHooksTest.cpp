@@ -82,7 +82,7 @@ class SourceSequenceTest : public testing::TestWithParam<SequenceCase> {};
 
 TEST_P(SourceSequenceTest, EntryPointRunsItsHooksInOrder) {
     RecordingSource source;
-    EXPECT_EQ(GetParam().call(source).code(), kSuccess);
+    EXPECT_CODE(GetParam().call(source), kSuccess);
     EXPECT_EQ(source.log, GetParam().expected);
 }
 
@@ -93,7 +93,7 @@ TEST_P(SourceSequenceTest, FirstFailingHookStopsTheSequenceAndIsReturned) {
         if (expected[failing].rfind("postMessageImpl", 0) == 0) continue;
         RecordingSource source;
         source.answers[expected[failing]] = TRELM_ERROR(kServiceError);
-        EXPECT_EQ(GetParam().call(source).code(), kServiceError) << expected[failing];
+        EXPECT_CODE(GetParam().call(source), kServiceError) << expected[failing];
         Log prefix(expected.begin(), expected.begin() + failing + 1);
         bool messageEntry = expected.front() == "preMessageImpl";
         if (messageEntry && failing > 0) {
@@ -162,17 +162,17 @@ TEST(BaseSourceTest, QueryMessageCarriesItsInteractiveFlagToTheHooks) {
     RecordingSource source;
     IQueryItems::StartQueryMessage msg;
     msg.interactive = false;
-    ASSERT_TRUE(source.onMessage(msg).ok());
+    ASSERT_OK(source.onMessage(msg));
     EXPECT_FALSE(source.lastInteractive);
     msg.interactive = true;
-    ASSERT_TRUE(source.onMessage(msg).ok());
+    ASSERT_OK(source.onMessage(msg));
     EXPECT_TRUE(source.lastInteractive);
 }
 
 TEST(BaseSourceTest, MessageWithAKnownNameButAnotherClassIsRefused) {
     RecordingSource source;
     IMessage impostor(ConfigurationChangedMessage::kType);
-    EXPECT_EQ(source.onMessage(impostor).code(), kInvalid);
+    EXPECT_CODE(source.onMessage(impostor), kInvalid);
     EXPECT_EQ(source.log, (Log{"preMessageImpl", "postMessageImpl(2147483652)"}));
 }
 
@@ -180,16 +180,16 @@ TEST(BaseSourceTest, DefaultsRefuseDataOperationsAndQueries) {
     BaseSource plain("plain", "@test:/plain");
     BaseSource::Record record;
     GUID guid = GUID::generate();
-    EXPECT_EQ(plain.insert(record).code(), kDataOpNotSupported);
-    EXPECT_EQ(plain.update(record).code(), kDataOpNotSupported);
-    EXPECT_EQ(plain.remove(guid, false).code(), kDataOpNotSupported);
-    EXPECT_EQ(plain.markInvisible(guid).code(), kDataOpNotSupported);
-    EXPECT_EQ(plain.retrieve(guid, record, false).code(), kDataOpNotSupported);
+    EXPECT_CODE(plain.insert(record), kDataOpNotSupported);
+    EXPECT_CODE(plain.update(record), kDataOpNotSupported);
+    EXPECT_CODE(plain.remove(guid, false), kDataOpNotSupported);
+    EXPECT_CODE(plain.markInvisible(guid), kDataOpNotSupported);
+    EXPECT_CODE(plain.retrieve(guid, record, false), kDataOpNotSupported);
     IQueryItems::StartQueryMessage query;
-    EXPECT_EQ(plain.onMessage(query).code(), kNotSupported);
+    EXPECT_CODE(plain.onMessage(query), kNotSupported);
     EXPECT_FALSE(query.cursor);
     ConfigurationChangedMessage changed;
-    EXPECT_EQ(plain.onMessage(changed).code(), kSuccess);
+    EXPECT_CODE(plain.onMessage(changed), kSuccess);
 }
 
 TEST(ComponentTest, StateFollowsTheEntryPointsThatSucceeded) {
@@ -242,8 +242,8 @@ protected:
 TEST(BaseConnectorTest, WakeupMessageReachesWakeupImplBetweenTheMessageHooks) {
     RecordingConnector connector;
     WakeupMessage msg(Map<String, String>{{"source", ""}});
-    EXPECT_EQ(connector.onMessage(msg).code(), kNoData);
-    EXPECT_EQ(connector.walk().code(), kSuccess);
+    EXPECT_CODE(connector.onMessage(msg), kNoData);
+    EXPECT_CODE(connector.walk(), kSuccess);
     EXPECT_EQ(connector.log, (Log{"preMessageImpl", "wakeupImpl", "postMessageImpl(1)", "walkImpl"}));
     EXPECT_EQ(connector.wakeupAccount, "source");
 }
@@ -267,9 +267,9 @@ TEST(BaseConnectorTest, ConnectorOperationsAreNotSupportedByDefault) {
                               plain.getPhotoAlbums(ids),
                               plain.publishPhoto("file:///a.jpg", ""),
                               plain.publishPhotoTo("1", "file:///a.jpg", "")};
-    for (uError const& e : results) EXPECT_EQ(e.code(), kNotSupported) << e;
+    for (uError const& e : results) EXPECT_CODE(e, kNotSupported);
     WakeupMessage wakeup;
-    EXPECT_EQ(plain.onMessage(wakeup).code(), kSuccess);
+    EXPECT_CODE(plain.onMessage(wakeup), kSuccess);
 }
 
 }  // namespace

@@ -40,12 +40,12 @@ TEST(ModuleBoundaryTest, MessagesAreRecognisedAcrossAHiddenVisibilityModule) {
     ASSERT_OK(registry.add("host", &host));
 
     WakeupMessage wakeup;
-    ASSERT_EQ(wakeup.send("module").code(), kSuccess);
+    ASSERT_OK(wakeup.send("module"));
     ASSERT_NE(wakeup.params.search("answered_by"), nullptr);
     EXPECT_EQ(*wakeup.params.search("answered_by"), "module");
 
     ConfigurationChangedMessage changed(Set<String>{"module_key"});
-    EXPECT_EQ(changed.send("module").code(), kSuccess);
+    EXPECT_OK(changed.send("module"));
 
     String sid;
     EXPECT_EQ(hiddenModuleAskUserSid("host", &sid), kSuccess);

@@ -5,6 +5,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "ItemQuery.h"
 #include "trelm/GUID.h"
 
@@ -41,9 +43,9 @@ class ConditionTest : public ::testing::TestWithParam<ConditionCase> {};
 TEST_P(ConditionTest, BecomesAConstraintOfTheKeysType) {
     ConditionCase const& c = GetParam();
     ItemQuery query = contacts();
-    ASSERT_EQ(query.where(c.text).code(), trelm::kSuccess);
+    ASSERT_CODE(query.where(c.text), trelm::kSuccess);
     trelm::IQueryItems::StartQueryMessage msg;
-    ASSERT_EQ(query.fill(msg).code(), trelm::kSuccess);
+    ASSERT_CODE(query.fill(msg), trelm::kSuccess);
     ASSERT_EQ(msg.constraints.size(), 2u);
     EXPECT_EQ(msg.constraints[0].key.name(), "core_object_type");
     EXPECT_EQ(msg.constraints[0].value, Variant(2));
@@ -98,11 +100,11 @@ TEST(ConditionRejectTest, MalformedConditionsAreInvalidAndAddNothing) {
     for (Bad const& c : cases) {
         ItemQuery query = contacts();
         uError e = query.where(c.text);
-        EXPECT_EQ(e.code(), trelm::kInvalid) << c.text;
+        EXPECT_CODE(e, trelm::kInvalid) << c.text;
         EXPECT_NE(e.toText().find(c.reason), std::string::npos) << c.text << ": " << e;
         EXPECT_NE(e.toText().find(c.text), std::string::npos) << e;
         trelm::IQueryItems::StartQueryMessage msg;
-        ASSERT_EQ(query.fill(msg).code(), trelm::kSuccess);
+        ASSERT_CODE(query.fill(msg), trelm::kSuccess);
         EXPECT_EQ(msg.constraints.size(), 1u) << c.text;
     }
 }
@@ -132,7 +134,7 @@ TEST(ItemQueryTest, EachKindAsksForTheOrderingItsCursorServes) {
         ItemQuery::Kind const* kind = ItemQuery::findKind(k.kind);
         ASSERT_NE(kind, nullptr) << k.kind;
         trelm::IQueryItems::StartQueryMessage msg;
-        ASSERT_EQ(ItemQuery(*kind).fill(msg).code(), trelm::kSuccess);
+        ASSERT_CODE(ItemQuery(*kind).fill(msg), trelm::kSuccess);
         EXPECT_EQ(msg.columns, k.ordering) << k.kind;
         ASSERT_EQ(msg.constraints.size(), 1u);
         EXPECT_EQ(msg.constraints[0].function, Constraint::Equal);
@@ -202,7 +204,7 @@ TEST_P(WalkTest, ListsTheRowsBetweenSkipAndLimit) {
     query.limit = c.limit;
     StepCursor cursor(c.rows, c.failAt);
     std::vector<ItemQuery::Record> rows;
-    EXPECT_EQ(query.walk(cursor, rows).code(), c.code);
+    EXPECT_CODE(query.walk(cursor, rows), c.code);
     std::vector<int> listed;
     for (auto const& row : rows) listed.push_back(row.search("n")->asInt32());
     EXPECT_EQ(listed, c.listed);

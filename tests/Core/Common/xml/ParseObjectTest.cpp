@@ -70,15 +70,14 @@ TEST(HashParseObjTest, AnswerDocumentsGiveTheirFieldsWithEntitiesDecodedAndNilFi
     };
     for (auto const& c : cases) {
         Map<String, String> out;
-        ASSERT_EQ(HashParseObj(c.root).parse(document(c.source), out).code(), kSuccess) << c.source;
+        ASSERT_OK(HashParseObj(c.root).parse(document(c.source), out)) << c.source;
         EXPECT_EQ(out.map(), c.expected) << c.source;
     }
 }
 
 TEST(FlatParseObjTest, StatusAnswerGivesItsValue) {
     String out = "old";
-    ASSERT_EQ(FlatParseObj("users_setStatus_response").parse(loadXml("users_setStatus_response.xml"), out).code(),
-              kSuccess);
+    ASSERT_OK(FlatParseObj("users_setStatus_response").parse(loadXml("users_setStatus_response.xml"), out));
     EXPECT_EQ(out, "1");
 }
 
@@ -93,7 +92,7 @@ TEST(ListParseObjTest, ValuesFollowExistingEntriesInOrderWithoutNilEntries) {
     };
     for (auto const& c : cases) {
         Vector<String> out{"existing"};
-        ASSERT_EQ(ListParseObj(c.root).parse(document(c.source), out).code(), kSuccess) << c.source;
+        ASSERT_OK(ListParseObj(c.root).parse(document(c.source), out)) << c.source;
         EXPECT_EQ(out, c.expected) << c.source;
     }
 }
@@ -115,7 +114,7 @@ TEST(ListHashParseObjTest, MailboxAnswersGiveOneRecordPerEntry) {
     };
     for (auto const& c : cases) {
         Rows rows;
-        ASSERT_EQ(ListHashParseObj(c.root).parse(loadXml(std::string(c.root) + ".xml"), rows).code(), kSuccess);
+        ASSERT_OK(ListHashParseObj(c.root).parse(loadXml(std::string(c.root) + ".xml"), rows));
         EXPECT_EQ(plain(rows), c.expected) << c.root;
     }
 }
@@ -126,7 +125,7 @@ TEST(FqlParseObjTest, NestedFieldsAreDottedNilFieldsAbsentEmptyFieldsEmpty) {
     Rows rows;
     unsigned count = 99;
     FqlParseObj p("fql_query_response", "user", 0);
-    ASSERT_EQ(p.parse(loadXml("fql_query_response_users.xml"), rows, count).code(), kSuccess);
+    ASSERT_OK(p.parse(loadXml("fql_query_response_users.xml"), rows, count));
     EXPECT_EQ(count, 3u);
     EXPECT_EQ(plain(rows),
               (std::vector<Row>{
@@ -167,7 +166,7 @@ TEST_P(FqlParseObjSkipTest, SkippedRowsAreCountedButNotReturned) {
     Rows rows;
     unsigned count = 0;
     FqlParseObj p("fql_query_response", "user", GetParam().skip);
-    ASSERT_EQ(p.parse(loadXml("fql_query_response_users.xml"), rows, count).code(), kSuccess);
+    ASSERT_OK(p.parse(loadXml("fql_query_response_users.xml"), rows, count));
     EXPECT_EQ(count, 3u);
     std::vector<std::string> uids;
     for (auto const& r : rows) uids.push_back(r.search("uid")->str());
@@ -182,7 +181,7 @@ TEST(FqlParseObjTest, EmptyAnswerIsSuccessWithNoRows) {
     Rows rows{Map<String, String>{{"earlier", "row"}}};
     unsigned count = 99;
     FqlParseObj p("fql_query_response", "user", 0);
-    ASSERT_EQ(p.parse(loadXml("fql_query_response_empty.xml"), rows, count).code(), kSuccess);
+    ASSERT_OK(p.parse(loadXml("fql_query_response_empty.xml"), rows, count));
     EXPECT_EQ(count, 0u);
     EXPECT_EQ(plain(rows), (std::vector<Row>{{{"earlier", "row"}}}));
 }
@@ -191,7 +190,7 @@ TEST(FqlParseObjTest, OnlyElementsOfTheRowTableAreRows) {
     Rows rows;
     unsigned count = 99;
     FqlParseObj p("fql_query_response", "photo", 0);
-    ASSERT_EQ(p.parse(loadXml("fql_query_response_users.xml"), rows, count).code(), kSuccess);
+    ASSERT_OK(p.parse(loadXml("fql_query_response_users.xml"), rows, count));
     EXPECT_EQ(count, 0u);
     EXPECT_TRUE(rows.empty());
 }
@@ -203,7 +202,7 @@ TEST(FqlParseObjTest, RowsReadBeforeATruncationStay) {
     Rows rows;
     unsigned count = 0;
     FqlParseObj p("fql_query_response", "user", 0);
-    EXPECT_EQ(p.parse(String(cut), rows, count).code(), kFailure);
+    EXPECT_CODE(p.parse(String(cut), rows, count), kFailure);
     ASSERT_EQ(rows.size(), 2u);
     EXPECT_EQ(*rows[1].search("uid"), "1002");
     EXPECT_EQ(count, 2u);
@@ -213,13 +212,11 @@ TEST(FqlParseObjTest, RepeatedNestedFieldKeepsFirstValue) {
     Rows rows;
     unsigned count = 0;
     FqlParseObj p("fql_query_response", "stream", 0);
-    ASSERT_EQ(p.parse(String("<fql_query_response><stream><attachment><media>"
+    ASSERT_OK(p.parse(String("<fql_query_response><stream><attachment><media>"
                              "<stream_media><src>first</src></stream_media>"
                              "<stream_media><src>second</src></stream_media>"
                              "</media></attachment></stream></fql_query_response>"),
-                      rows, count)
-                  .code(),
-              kSuccess);
+                      rows, count));
     EXPECT_EQ(plain(rows), (std::vector<Row>{{{"attachment.media.stream_media.src", "first"}}}));
 }
 
@@ -229,7 +226,7 @@ TEST(FStreamParseObjTest, StreamAnswerGivesOneRowPerPostByKind) {
     Rows rows;
     unsigned count = 0;
     FStreamParseObj p;
-    ASSERT_EQ(p.parse(loadXml("stream_get_response.xml"), rows, count).code(), kSuccess);
+    ASSERT_OK(p.parse(loadXml("stream_get_response.xml"), rows, count));
     EXPECT_EQ(count, 5u);
     EXPECT_EQ(plain(rows),
               (std::vector<Row>{
@@ -267,12 +264,10 @@ TEST(FStreamParseObjTest, StatusPostWithNilMessageHasNoMessageField) {
     Rows rows;
     unsigned count = 0;
     FStreamParseObj p;
-    ASSERT_EQ(p.parse(String(R"(<stream_get_response><posts list="true"><stream_post>)"
+    ASSERT_OK(p.parse(String(R"(<stream_get_response><posts list="true"><stream_post>)"
                              R"(<post_id>1_2</post_id><type>46</type><message xsi:nil="true"/>)"
                              R"(<created_time>5</created_time></stream_post></posts></stream_get_response>)"),
-                      rows, count)
-                  .code(),
-              kSuccess);
+                      rows, count));
     EXPECT_EQ(plain(rows), (std::vector<Row>{{{"is_status", "1"}, {"post_id", "1_2"}, {"created_time", "5"}}}));
 }
 
@@ -282,7 +277,7 @@ TEST(FStreamParseObjTest, PostsReadBeforeATruncationStay) {
     Rows rows;
     unsigned count = 0;
     FStreamParseObj p;
-    EXPECT_EQ(p.parse(String(cut), rows, count).code(), kFailure);
+    EXPECT_CODE(p.parse(String(cut), rows, count), kFailure);
     EXPECT_EQ(rows.size(), 2u);
     EXPECT_EQ(count, 2u);
 }
@@ -348,7 +343,7 @@ TEST(ParseObjectTest, ErrorDocumentFailsAndLeavesTheOutputForEveryParseObject) {
     for (ParseObject const& obj : allParseObjects()) {
         for (char const* source : {"error_response.xml", "auth_login_response.xml"}) {
             bool kept = false;
-            EXPECT_EQ(obj.run(loadXml(source), kept).code(), kFailure) << obj.name << " on " << source;
+            EXPECT_CODE(obj.run(loadXml(source), kept), kFailure) << obj.name << " on " << source;
             EXPECT_TRUE(kept) << obj.name << " on " << source;
         }
     }
@@ -375,7 +370,7 @@ TEST(ParseObjectTest, MalformedOrTruncatedDocumentsFailCleanly) {
         for (auto const& [what, xml] : documents) {
             bool kept = false;
             uError e = obj.run(String(xml), kept);
-            EXPECT_EQ(e.code(), kFailure) << obj.name << " on " << what << ": " << e;
+            EXPECT_CODE(e, kFailure) << obj.name << " on " << what << ": " << e;
         }
     }
 }

@@ -24,7 +24,7 @@ using test::TempDir;
 class RuntimeConfigurationTest : public ::testing::Test {
 protected:
     void SetUp() override {
-        ASSERT_EQ(registry_.add("RuntimeConfiguration", &store_).code(), kSuccess);
+        ASSERT_OK(registry_.add("RuntimeConfiguration", &store_));
         registry_.activate();
     }
 
@@ -44,7 +44,7 @@ protected:
         for (char const* k : keys) EXPECT_OK(values.insert(k, Variant()));
         GetRuntimeConfigurationMessage msg(tag, values);
         uError e = msg.send("RuntimeConfiguration");
-        EXPECT_EQ(e.code(), kSuccess) << e;
+        EXPECT_OK(e);
         std::vector<std::string> out;
         for (char const* k : keys) {
             Variant const& v = *values.search(k);
@@ -61,35 +61,33 @@ protected:
 using Texts = std::vector<std::string>;
 
 TEST_F(RuntimeConfigurationTest, StoredValuesComeBackAsTextAndUnknownKeysStayEmpty) {
-    ASSERT_EQ(put("src", {{"session", Variant("s1")},
+    ASSERT_OK(put("src", {{"session", Variant("s1")},
                           {"empty", Variant("")},
                           {"count", Variant(42)},
                           {"big", Variant(-5000000000LL)},
                           {"flag", Variant(true)},
-                          {"bytes", Variant(String(std::string("a\0b", 3)))}})
-                  .code(),
-              kSuccess);
+                          {"bytes", Variant(String(std::string("a\0b", 3)))}}));
     EXPECT_EQ(get("src", {"session", "empty", "count", "big", "flag", "bytes", "unknown"}),
               (Texts{"s1", "", "42", "-5000000000", "true", std::string("a\0b", 3), "-"}));
 }
 
 TEST_F(RuntimeConfigurationTest, StoringAgainReplacesAndResetForgetsOnlyNamedKeysOfItsTag) {
-    ASSERT_EQ(put("src", {{"a", Variant("1")}, {"b", Variant("2")}, {"c", Variant("3")}}).code(), kSuccess);
-    ASSERT_EQ(put("other", {{"a", Variant("100")}, {"b", Variant("200")}}).code(), kSuccess);
-    ASSERT_EQ(put("src", {{"a", Variant("one")}}).code(), kSuccess);
-    ASSERT_EQ(reset("src", {"b", "never-stored"}).code(), kSuccess);
+    ASSERT_OK(put("src", {{"a", Variant("1")}, {"b", Variant("2")}, {"c", Variant("3")}}));
+    ASSERT_OK(put("other", {{"a", Variant("100")}, {"b", Variant("200")}}));
+    ASSERT_OK(put("src", {{"a", Variant("one")}}));
+    ASSERT_OK(reset("src", {"b", "never-stored"}));
     EXPECT_EQ(get("src", {"a", "b", "c"}), (Texts{"one", "-", "3"}));
     EXPECT_EQ(get("other", {"a", "b"}), (Texts{"100", "200"}));
 
     Map<String, Variant> values{{"absent", Variant("caller's")}};  // unknown keys keep the caller's value
     GetRuntimeConfigurationMessage msg("src", values);
-    ASSERT_EQ(msg.send("RuntimeConfiguration").code(), kSuccess);
+    ASSERT_OK(msg.send("RuntimeConfiguration"));
     EXPECT_EQ(values.search("absent")->asString(), "caller's");
 }
 
 TEST_F(RuntimeConfigurationTest, ValueWithoutTextFormStoresNothingOfItsMessage) {
     uError e = put("src", {{"a", Variant("1")}, {"list", Variant(Vector<String>{"x"})}, {"z", Variant("2")}});
-    EXPECT_EQ(e.code(), kInvalid) << e;
+    EXPECT_CODE(e, kInvalid);
     EXPECT_EQ(get("src", {"a", "list", "z"}), (Texts{"-", "-", "-"}));
 }
 
@@ -97,14 +95,14 @@ TEST_F(RuntimeConfigurationTest, FileStoreKeepsValuesAcrossReopen) {
     TempDir dir;
     std::string path = dir.file("runtime.db");
     Configuration::Group group("RuntimeConfiguration", {{"path", Variant(String(path))}});
-    ASSERT_EQ(store_.sendConfig(group).code(), kSuccess);
-    ASSERT_EQ(put("src", {{"session", Variant("kept")}}).code(), kSuccess);
+    ASSERT_OK(store_.sendConfig(group));
+    ASSERT_OK(put("src", {{"session", Variant("kept")}}));
     store_.close();
 
     RuntimeConfiguration again("RuntimeConfiguration2");
-    ASSERT_EQ(again.open(String(path)).code(), kSuccess);
+    ASSERT_OK(again.open(String(path)));
     Map<String, Variant> values{{"session", Variant()}};
-    ASSERT_EQ(again.get("src", values).code(), kSuccess);
+    ASSERT_OK(again.get("src", values));
     EXPECT_EQ(values.search("session")->asString(), "kept");
 }
 
@@ -117,12 +115,12 @@ TEST_F(RuntimeConfigurationTest, StoreFileIsPrivateWhateverTheUmask) {
 
     mode_t old = ::umask(0);
     uError a = store_.open(String(created));
-    ASSERT_EQ(put("src", {{"secret", Variant("x")}}).code(), kSuccess);
+    ASSERT_OK(put("src", {{"secret", Variant("x")}}));
     RuntimeConfiguration other("Other");
     uError b = other.open(String(existing));
     ::umask(old);
-    ASSERT_EQ(a.code(), kSuccess) << a;
-    ASSERT_EQ(b.code(), kSuccess) << b;
+    ASSERT_OK(a);
+    ASSERT_OK(b);
 
     for (std::string const& p : {created, existing}) {
         struct stat st {};
@@ -133,23 +131,23 @@ TEST_F(RuntimeConfigurationTest, StoreFileIsPrivateWhateverTheUmask) {
 
 TEST_F(RuntimeConfigurationTest, FailedOpenLeavesNoStoreInsteadOfAFreshOne) {
     TempDir dir;
-    EXPECT_EQ(store_.open(String(dir.file("missing/dir/x.db"))).code(), kFailure);
-    EXPECT_EQ(put("src", {{"a", Variant("1")}}).code(), kFailure);
+    EXPECT_CODE(store_.open(String(dir.file("missing/dir/x.db"))), kFailure);
+    EXPECT_CODE(put("src", {{"a", Variant("1")}}), kFailure);
 
     std::string notDb = dir.file("text.db");
     std::ofstream(notDb) << "this is not a database file, not at all, really not";
-    EXPECT_EQ(store_.open(String(notDb)).code(), kFailure);
+    EXPECT_CODE(store_.open(String(notDb)), kFailure);
 
-    EXPECT_EQ(store_.open("").code(), kInvalid);
-    EXPECT_EQ(store_.open(":memory:").code(), kSuccess);
-    EXPECT_EQ(put("src", {{"a", Variant("1")}}).code(), kSuccess);
+    EXPECT_CODE(store_.open(""), kInvalid);
+    EXPECT_OK(store_.open(":memory:"));
+    EXPECT_OK(put("src", {{"a", Variant("1")}}));
 }
 
 TEST_F(RuntimeConfigurationTest, ConfiguringTheSameStoreAgainKeepsItsValues) {
     Configuration::Group group("RuntimeConfiguration");
-    ASSERT_EQ(store_.sendConfig(group).code(), kSuccess);
-    ASSERT_EQ(put("src", {{"a", Variant("1")}}).code(), kSuccess);
-    ASSERT_EQ(store_.sendConfig(group).code(), kSuccess);
+    ASSERT_OK(store_.sendConfig(group));
+    ASSERT_OK(put("src", {{"a", Variant("1")}}));
+    ASSERT_OK(store_.sendConfig(group));
     EXPECT_EQ(get("src", {"a"}), (Texts{"1"}));
 }
 

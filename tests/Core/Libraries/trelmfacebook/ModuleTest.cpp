@@ -6,6 +6,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "ModuleHandle.h"
 #include "trelm/Metadata.h"
 
@@ -37,7 +39,7 @@ protected:
 TEST_F(ModuleTest, EmptyTableGetsExactlyTheSourceAndTheConnector) {
     ModuleHandle::Table table;
     trelm::uError result = module_->getComponents(table);
-    ASSERT_EQ(result.code(), trelm::kSuccess) << result;
+    ASSERT_OK(result);
     EXPECT_EQ(idsOf(table), (std::vector<std::string>{kConnectorId, kSourceId}));
     EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
     EXPECT_EQ(*table.search(kConnectorId), module_->connectorFactory);
@@ -45,11 +47,11 @@ TEST_F(ModuleTest, EmptyTableGetsExactlyTheSourceAndTheConnector) {
 
 TEST_F(ModuleTest, IdentifiersAlreadyPresentGetTheModulesFactoriesAndOtherEntriesStay) {
     ModuleHandle::Table table;
-    ASSERT_TRUE(table.insert(kSourceId, &foreignFactory).ok());
-    ASSERT_TRUE(table.insert(kConnectorId, &foreignFactory).ok());
-    ASSERT_TRUE(table.insert("@other.example:/thing", &foreignFactory).ok());
+    ASSERT_OK(table.insert(kSourceId, &foreignFactory));
+    ASSERT_OK(table.insert(kConnectorId, &foreignFactory));
+    ASSERT_OK(table.insert("@other.example:/thing", &foreignFactory));
 
-    ASSERT_EQ(module_->getComponents(table).code(), trelm::kSuccess);
+    ASSERT_OK(module_->getComponents(table));
     EXPECT_EQ(table.size(), 3u);
     EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
     EXPECT_EQ(*table.search(kConnectorId), module_->connectorFactory);
@@ -59,7 +61,7 @@ TEST_F(ModuleTest, IdentifiersAlreadyPresentGetTheModulesFactoriesAndOtherEntrie
 TEST_F(ModuleTest, RepeatedCallsLeaveTheSameTwoEntries) {
     ModuleHandle::Table table;
     for (int call = 0; call < 3; ++call) {
-        ASSERT_EQ(module_->getComponents(table).code(), trelm::kSuccess) << "call " << call;
+        ASSERT_OK(module_->getComponents(table)) << "call " << call;
     }
     EXPECT_EQ(idsOf(table), (std::vector<std::string>{kConnectorId, kSourceId}));
     EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
@@ -69,7 +71,7 @@ TEST_F(ModuleTest, RepeatedCallsLeaveTheSameTwoEntries) {
 // component reports, would make the host configure one component as the other.
 TEST_F(ModuleTest, EveryFactoryMakesIndependentComponentsOfItsOwnIdentifier) {
     ModuleHandle::Table table;
-    ASSERT_EQ(module_->getComponents(table).code(), trelm::kSuccess);
+    ASSERT_OK(module_->getComponents(table));
     for (auto const& [id, factory] : table) {
         std::unique_ptr<Component> first(factory("first"));
         std::unique_ptr<Component> second(factory("second"));
@@ -112,7 +114,7 @@ TEST_F(ModuleTest, LoadingRegistersTheSixteenKeysWithTheirTypes) {
     for (Expected const& key : keys) {
         TYPES type = trelm::TRELM_TYPES::NONE;
         trelm::uError found = trelm::Metadata::getType(key.name, type);
-        EXPECT_EQ(found.code(), trelm::kSuccess) << key.name;
+        EXPECT_OK(found) << key.name;
         EXPECT_EQ(type, key.type) << key.name;
     }
 }

@@ -163,7 +163,7 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
             std::string const text = value == "$session" ? fresh.key : value == "$secret" ? fresh.secret : value;
             ASSERT_OK(values.insert(Configuration::Value(key, Variant(String(text)))));
         }
-        ASSERT_EQ(host->runtime().store(name, values).code(), kSuccess);
+        ASSERT_OK(host->runtime().store(name, values));
         observer->clear();
         host->emulator().log().clear();
 
@@ -171,7 +171,7 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
         for (char const* key : c.changed) ASSERT_OK(changed.insert(key));
         ConfigurationChangedMessage msg(changed);
         uError err = source.onMessage(msg);
-        EXPECT_EQ(err.code(), kSuccess) << err;
+        EXPECT_OK(err);
 
         EXPECT_EQ(observer->events(), c.events);
         auto logins = host->emulator().log().entriesFor("auth.login");
@@ -179,7 +179,7 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
         for (auto const& login : logins) EXPECT_TRUE(login.https);
 
         IServiceSource::GetUserSidMessage sid;
-        EXPECT_EQ(source.onMessage(sid).code(), c.userCode);
+        EXPECT_CODE(source.onMessage(sid), c.userCode);
         if (c.userCode == kSuccess) {
             EXPECT_EQ(sid.result.str(), kDemoUid);
         }
@@ -188,24 +188,24 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
             Vector<IQueryItems::Column>(),
             Vector<IQueryItems::Constraint>{IQueryItems::Constraint{
                 Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), IQueryItems::Constraint::Equal}});
-        ASSERT_EQ(source.onMessage(query).code(), kSuccess);
+        ASSERT_OK(source.onMessage(query));
         SmartPtr<Map<String, Variant>> row;
-        EXPECT_EQ(query.cursor->getRow(row).code(), c.queryCode);
+        EXPECT_CODE(query.cursor->getRow(row), c.queryCode);
     }
 }
 
 TEST_F(ConfigurationChangeTest, ChangesBeforeStartupFailClearlyWhenTheyNeedTheClient) {
     FacebookSource& source = host->addBareSource("unstarted");
     ConfigurationChangedMessage login(Set<String>{kLogin});
-    EXPECT_EQ(source.onMessage(login).code(), kNotSet) << "no settings yet";
+    EXPECT_CODE(source.onMessage(login), kNotSet) << "no settings yet";
 
     Configuration::Group group = host->demoGroup("unstarted", false);
     ASSERT_OK(group.set("haveExtendedApi", Variant(false)));
-    ASSERT_EQ(source.sendConfig(group).code(), kSuccess);
+    ASSERT_OK(source.sendConfig(group));
     ConfigurationChangedMessage session(Set<String>{kSessionId});
-    EXPECT_EQ(source.onMessage(session).code(), kNotSet) << "no client yet";
+    EXPECT_CODE(source.onMessage(session), kNotSet) << "no client yet";
     ConfigurationChangedMessage unrelated(Set<String>{"wipeComponents"});
-    EXPECT_EQ(source.onMessage(unrelated).code(), kSuccess);
+    EXPECT_OK(source.onMessage(unrelated));
 }
 
 }  // namespace

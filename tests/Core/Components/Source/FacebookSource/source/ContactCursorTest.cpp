@@ -83,14 +83,14 @@ protected:
         for (Constraint const& c : extra) EXPECT_OK(constraints.pushBack(c));
         IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints);
         uError err = source->onMessage(msg);
-        EXPECT_EQ(err.code(), kSuccess) << err;
+        EXPECT_CODE(err, kSuccess);
         return msg.cursor;
     }
 
     static std::string uidAt(Cursor const& cursor) {
         SmartPtr<Map<String, Variant>> row;
         uError err = cursor->getRow(row);
-        EXPECT_EQ(err.code(), kSuccess) << err;
+        EXPECT_CODE(err, kSuccess);
         if (!row) return "";
         Variant const* uid = row->search("core_contact_service_id");
         return uid ? uid->asString().str() : "";
@@ -98,7 +98,7 @@ protected:
 
     static GUID guidAt(Cursor const& cursor) {
         SmartPtr<Map<String, Variant>> row;
-        EXPECT_EQ(cursor->getRow(row).code(), kSuccess);
+        EXPECT_CODE(cursor->getRow(row), kSuccess);
         return row ? row->search("core_object_id")->asGUID() : GUID();
     }
 
@@ -119,10 +119,10 @@ TEST_F(ContactCursorTest, ForwardSeeksVisitEveryFriendOnceInOrderWithOneStatemen
     int moved = 1;
     while (moved != 0) {
         SmartPtr<Map<String, Variant>> row;
-        ASSERT_EQ(cursor->getRow(row).code(), kSuccess);
+        ASSERT_CODE(cursor->getRow(row), kSuccess);
         seen.push_back(row->search("core_contact_service_id")->asString().str());
         guids.insert(row->search("core_object_id")->asGUID());
-        ASSERT_EQ(cursor->seek(1, moved).code(), seen.size() == size_t(kFriends) ? unsigned(kNoData) : kSuccess);
+        ASSERT_CODE(cursor->seek(1, moved), seen.size() == size_t(kFriends) ? unsigned(kNoData) : kSuccess);
     }
     EXPECT_EQ(seen, *expected);
     EXPECT_EQ(guids.size(), size_t(kFriends)) << "every friend has a GUID of its own";
@@ -138,12 +138,12 @@ TEST_F(ContactCursorTest, ForwardSeeksVisitEveryFriendOnceInOrderWithOneStatemen
 
 TEST_F(ContactCursorTest, BackwardSeeksFromTheEndVisitEveryFriendInReverse) {
     Cursor cursor = open();
-    ASSERT_EQ(cursor->jumpEnd().code(), kSuccess);
+    ASSERT_CODE(cursor->jumpEnd(), kSuccess);
     std::vector<std::string> seen;
     int moved = -1;
     while (moved != 0) {
         seen.push_back(uidAt(cursor));
-        ASSERT_TRUE(cursor->seek(-1, moved).ok());
+        ASSERT_OK(cursor->seek(-1, moved));
     }
     std::reverse(seen.begin(), seen.end());
     EXPECT_EQ(seen, *expected);
@@ -193,13 +193,13 @@ TEST_F(ContactCursorTest, JumpsAndLongSeeksLandOnTheRightFriendAndKnowTheirIndex
             case Move::Beginning: err = cursor->jumpBeginning(); break;
             case Move::End: err = cursor->jumpEnd(); break;
         }
-        ASSERT_EQ(err.code(), m.code) << err;
+        ASSERT_CODE(err, m.code);
         if (m.op == Move::Seek) {
             EXPECT_EQ(moved, m.moved);
         }
         EXPECT_EQ(uidAt(cursor), (*expected)[m.index]);
         unsigned index = 0;
-        ASSERT_EQ(cursor->curRow(index).code(), kSuccess);
+        ASSERT_CODE(cursor->curRow(index), kSuccess);
         EXPECT_EQ(index, unsigned(m.index));
     }
     // The cursor keeps the GUIDs it gave out across refills.
@@ -209,14 +209,14 @@ TEST_F(ContactCursorTest, JumpsAndLongSeeksLandOnTheRightFriendAndKnowTheirIndex
 TEST_F(ContactCursorTest, CountingAndPositionStatementsAskForTinyRowsWithoutOrdering) {
     Cursor cursor = open();
     unsigned count = 0;
-    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);
+    ASSERT_CODE(cursor->numRows(count), kSuccess);
     EXPECT_EQ(count, unsigned(kFriends));
-    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);  // from memory
+    ASSERT_CODE(cursor->numRows(count), kSuccess);  // from memory
     EXPECT_EQ(count, unsigned(kFriends));
 
-    ASSERT_EQ(cursor->jump(200).code(), kSuccess);
+    ASSERT_CODE(cursor->jump(200), kSuccess);
     unsigned index = 0;
-    ASSERT_EQ(cursor->curRow(index).code(), kSuccess);
+    ASSERT_CODE(cursor->curRow(index), kSuccess);
     EXPECT_EQ(index, 200u);
 
     std::string const& at200 = (*expected)[200];
@@ -236,14 +236,14 @@ TEST_F(ContactCursorTest, ShortFirstPageGivesTheCountAndRepeatedJumpsAskNothing)
     Cursor cursor = open({Constraint{Metadata::Key("core_contact_service_id", TRELM_TYPES::STRING),
                                      Variant(Vector<String>{String(e[20]), String(e[5]), String(e[10])}),
                                      Constraint::InList}});
-    ASSERT_EQ(cursor->jumpBeginning().code(), kSuccess);
-    ASSERT_EQ(cursor->jumpBeginning().code(), kSuccess);
+    ASSERT_CODE(cursor->jumpBeginning(), kSuccess);
+    ASSERT_CODE(cursor->jumpBeginning(), kSuccess);
     unsigned count = 0;
-    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);
+    ASSERT_CODE(cursor->numRows(count), kSuccess);
     EXPECT_EQ(count, 3u);
     EXPECT_EQ(uidAt(cursor), e[5]);
     int moved = 0;
-    EXPECT_EQ(cursor->seek(10, moved).code(), kSuccess);  // the window holds the whole result
+    EXPECT_CODE(cursor->seek(10, moved), kSuccess);  // the window holds the whole result
     EXPECT_EQ(moved, 2);
     EXPECT_EQ(uidAt(cursor), e[20]);
 
@@ -256,24 +256,24 @@ TEST_F(ContactCursorTest, QueryThatCannotMatchAnswersNothingWithoutAsking) {
     Cursor cursor = open({Constraint{Metadata::Key("core_contact_service", TRELM_TYPES::STRING), Variant("Other"),
                                      Constraint::Equal}});
     SmartPtr<Map<String, Variant>> row = makeSmart<Map<String, Variant>>();
-    EXPECT_EQ(cursor->getRow(row).code(), kNoData);
+    EXPECT_CODE(cursor->getRow(row), kNoData);
     EXPECT_FALSE(row);
     unsigned count = 7;
-    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);
+    ASSERT_CODE(cursor->numRows(count), kSuccess);
     EXPECT_EQ(count, 0u);
-    EXPECT_EQ(cursor->jumpEnd().code(), kNoData);
+    EXPECT_CODE(cursor->jumpEnd(), kNoData);
     int moved = 5;
-    EXPECT_EQ(cursor->seek(3, moved).code(), kSuccess);
+    EXPECT_CODE(cursor->seek(3, moved), kSuccess);
     EXPECT_EQ(moved, 0);
     Vector<SmartPtr<Map<String, Variant>>> rows;
-    EXPECT_EQ(cursor->getRows(10, rows).code(), kNotSupported);
+    EXPECT_CODE(cursor->getRows(10, rows), kNotSupported);
     EXPECT_TRUE(host->fqlStatements().empty());
 }
 
 TEST_F(ContactCursorTest, RecordsCarryContactFieldsAndTheSourcesIdentityAsACopy) {
     Cursor cursor = open();
     SmartPtr<Map<String, Variant>> row;
-    ASSERT_EQ(cursor->getRow(row).code(), kSuccess);
+    ASSERT_CODE(cursor->getRow(row), kSuccess);
     std::vector<std::pair<char const*, Variant>> const wanted = {
         {"core_object_type", Variant(2)},
         {"core_contact_service", Variant("Facebook")},
@@ -293,7 +293,7 @@ TEST_F(ContactCursorTest, RecordsCarryContactFieldsAndTheSourcesIdentityAsACopy)
 
     ASSERT_OK(row->insert("core_contact_name", Variant("changed")));
     SmartPtr<Map<String, Variant>> again;
-    ASSERT_EQ(cursor->getRow(again).code(), kSuccess);
+    ASSERT_CODE(cursor->getRow(again), kSuccess);
     EXPECT_NE(again->search("core_contact_name")->asString(), "changed");
 }
 

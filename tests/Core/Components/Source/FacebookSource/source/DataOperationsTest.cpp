@@ -44,8 +44,8 @@ Record record(std::initializer_list<std::pair<char const*, Variant>> entries) {
 // (no HTTP factory is registered, so a request would fail with another code).
 TEST(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
     CheckableSource source(kSourceName);
-    ASSERT_EQ(source.sendConfig(configuredGroup()).code(), kSuccess);
-    ASSERT_EQ(source.startup().code(), kSuccess);
+    ASSERT_OK(source.sendConfig(configuredGroup()));
+    ASSERT_OK(source.startup());
 
     struct Case {
         char const* name;
@@ -75,7 +75,7 @@ TEST(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
     };
     for (Case const& c : cases) {
         uError err = c.run();
-        EXPECT_EQ(err.code(), c.code) << c.name << ": " << err;
+        EXPECT_CODE(err, c.code) << c.name << ": " << err;
     }
     EXPECT_TRUE(scratch.empty());
 }
@@ -99,20 +99,20 @@ TEST(DataOperationsTest, InputCheckAcceptsOnlyCompleteStatusAndPhotoRecords) {
         {"flag set", record({{"core_object_type", 4}, {"core_event_text", "hi"}}), true, kDataOpNotSupported},
     };
     for (Case const& c : cases) {
-        EXPECT_EQ(source.manageInputDataImpl(static_cast<Record const&>(c.input), c.flag).code(), c.code) << c.name;
+        EXPECT_CODE(source.manageInputDataImpl(static_cast<Record const&>(c.input), c.flag), c.code) << c.name;
     }
 }
 
 TEST(DataOperationsTest, OperationsBeforeStartupFailWithNotSet) {
     FacebookSource source(kSourceName);
     Record status = record({{"core_object_type", 4}, {"core_event_text", "hi"}});
-    EXPECT_EQ(source.insert(status).code(), kNotSet);
+    EXPECT_CODE(source.insert(status), kNotSet);
     Record out;
-    EXPECT_EQ(source.retrieve(GUID::generate(), out, false).code(), kNotSet);
+    EXPECT_CODE(source.retrieve(GUID::generate(), out, false), kNotSet);
     IServiceSource::GetUserSidMessage sid;
-    EXPECT_EQ(source.onMessage(sid).code(), kNotSet);
+    EXPECT_CODE(source.onMessage(sid), kNotSet);
     // Starting without a configuration is refused too, rather than making a client without settings.
-    EXPECT_EQ(source.startup().code(), kNotSet);
+    EXPECT_CODE(source.startup(), kNotSet);
 }
 
 // The dump pads every key to 30 columns; a longer key gets (length - 30) spaces instead.

@@ -53,26 +53,24 @@ FacebookSource& EmulatorHost::addBareSource(String const& name) {
 
 FacebookSource& EmulatorHost::addSource(Configuration::Group const& group) {
     FacebookSource& source = addBareSource(group.name());
-    EXPECT_EQ(source.sendConfig(group).code(), kSuccess);
-    EXPECT_EQ(source.startup().code(), kSuccess);
+    EXPECT_OK(source.sendConfig(group));
+    EXPECT_OK(source.startup());
     return source;
 }
 
 void EmulatorHost::addComponent(String const& name, Component& component) {
-    EXPECT_EQ(registry_.add(name, &component).code(), kSuccess);
+    EXPECT_OK(registry_.add(name, &component));
     registered_.push_back(name);
 }
 
 SmartPtr<FacebookLibrary> EmulatorHost::demoClient() {
     emu::Session session = emulator_->loginDemo();
     auto info = makeSmart<FacebookLibrary::ConnectionInfo>("reference");
-    EXPECT_EQ(info->setAppConfig(emu::DemoAccount::apiKey, emu::DemoAccount::appSecret).code(), kSuccess);
-    EXPECT_EQ(info->setSessionConfig(String(session.key), String(session.secret),
-                                     String::from(static_cast<long long>(session.uid)), false, false)
-                  .code(),
-              kSuccess);
+    EXPECT_OK(info->setAppConfig(emu::DemoAccount::apiKey, emu::DemoAccount::appSecret));
+    EXPECT_OK(info->setSessionConfig(String(session.key), String(session.secret),
+                                     String::from(static_cast<long long>(session.uid)), false, false));
     auto lib = makeSmart<FacebookLibrary>();
-    EXPECT_EQ(lib->setup(info).code(), kSuccess);
+    EXPECT_OK(lib->setup(info));
     return lib;
 }
 
@@ -81,7 +79,7 @@ std::vector<std::string> EmulatorHost::fqlColumn(std::string const& query, std::
     Vector<Map<String, String>> rows;
     unsigned count = 0;
     uError err = demoClient()->runFqlQuery(String(query), String(table), rows, 0, count);
-    EXPECT_EQ(err.code(), kSuccess) << err;
+    EXPECT_OK(err);
     std::vector<std::string> out;
     for (auto const& row : rows) {
         String const* value = row.search(String(field));

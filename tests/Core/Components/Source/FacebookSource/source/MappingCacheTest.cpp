@@ -54,7 +54,7 @@ class MappingCacheScenario : public ::testing::TestWithParam<Scenario> {};
 
 TEST_P(MappingCacheScenario, AnswersExactCodesAndKeepsItsInvariants) {
     Cache cache;
-    ASSERT_EQ(cache.setup().code(), kSuccess);
+    ASSERT_OK(cache.setup());
     std::map<std::string, GUID> labels;
     std::map<int, SmartPtr<Record>> stored;
     for (size_t i = 0; i < GetParam().steps.size(); ++i) {
@@ -82,9 +82,9 @@ TEST_P(MappingCacheScenario, AnswersExactCodesAndKeepsItsInvariants) {
         } else {
             err = s.op == Step::ClearMap ? cache.clearMapping(s.tag) : cache.clearItems(s.tag);
         }
-        EXPECT_EQ(err.code(), s.code) << err;
+        EXPECT_CODE(err, s.code);
         uError inv = cache.checkInvariants();
-        EXPECT_TRUE(inv.ok()) << inv;
+        EXPECT_OK(inv);
     }
 }
 
@@ -150,12 +150,12 @@ TEST(MappingCacheTest, ServiceIdKeysOrderByNameThenIdIgnoringTheTypeCode) {
 TEST(MappingCacheTest, TagsCountFromZeroAndNothingRunsBeforeSetup) {
     Cache cache;
     String tag;
-    EXPECT_EQ(cache.getTag(tag).code(), kNotSet);
-    ASSERT_EQ(cache.setup().code(), kSuccess);
-    EXPECT_EQ(cache.setup().code(), kInvalid);
-    ASSERT_EQ(cache.getTag(tag).code(), kSuccess);
+    EXPECT_CODE(cache.getTag(tag), kNotSet);
+    ASSERT_OK(cache.setup());
+    EXPECT_CODE(cache.setup(), kInvalid);
+    ASSERT_OK(cache.getTag(tag));
     EXPECT_EQ(tag, "0");
-    ASSERT_EQ(cache.getTag(tag).code(), kSuccess);
+    ASSERT_OK(cache.getTag(tag));
     EXPECT_EQ(tag, "1");
 }
 
