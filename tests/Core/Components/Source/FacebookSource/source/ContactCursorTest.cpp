@@ -178,6 +178,8 @@ TEST_F(ContactCursorTest, JumpsAndLongSeeksLandOnTheRightFriendAndKnowTheirIndex
         {Move::Jump, kFriends, kNoData, 2999, 0},
         {Move::Jump, 149, kSuccess, 149, 0},
         {Move::Jump, 150, kSuccess, 150, 0},
+        {Move::Seek, -100, kSuccess, 50, -100},     // a short backward window: rows 0..50
+        {Move::Seek, 1, kSuccess, 51, 1},           // off its last row: the next page, not the end
         {Move::End, 0, kSuccess, 2999, 0},
         {Move::Seek, -150, kSuccess, 2849, -150},
         {Move::Beginning, 0, kSuccess, 0, 0},
