@@ -15,20 +15,9 @@
 namespace trelm {
 namespace {
 
-TEST(GUIDTest, GeneratedValuesAreDistinctAndInLowercaseCanonicalForm) {
-    std::set<GUID> seen;
-    std::regex const form("^[0-9a-f]{8}-[0-9a-f]{4}-4[0-9a-f]{3}-[89ab][0-9a-f]{3}-[0-9a-f]{12}$");
-    for (int i = 0; i < 1000; ++i) {
-        GUID g = GUID::generate();
-        EXPECT_FALSE(g.isNull());
-        EXPECT_TRUE(std::regex_match(g.toString().str(), form)) << g.toString();
-        EXPECT_TRUE(seen.insert(g).second) << "duplicate " << g;
-    }
-}
-
 // Identifiers are derived in per-thread blocks; threads running at once, each through several
-// blocks, must still never meet.
-TEST(GUIDTest, ConcurrentThreadsNeverProduceTheSameValue) {
+// blocks, must still never meet. Each is a random (version 4) identifier in lowercase text.
+TEST(GUIDTest, ConcurrentThreadsNeverProduceTheSameValueAndTextIsCanonical) {
     constexpr int kThreads = 4;
     constexpr int kEach = 3000;
     std::vector<std::vector<GUID>> made(kThreads);
@@ -39,9 +28,11 @@ TEST(GUIDTest, ConcurrentThreadsNeverProduceTheSameValue) {
         });
     }
     for (std::thread& th : threads) th.join();
+    std::regex const form("^[0-9a-f]{8}-[0-9a-f]{4}-4[0-9a-f]{3}-[89ab][0-9a-f]{3}-[0-9a-f]{12}$");
     std::set<GUID> seen;
     for (auto const& list : made) {
         for (GUID const& g : list) EXPECT_TRUE(seen.insert(g).second) << "duplicate " << g;
+        for (int i = 0; i < 300; ++i) EXPECT_TRUE(std::regex_match(list[i].toString().str(), form)) << list[i];
     }
     EXPECT_EQ(seen.size(), static_cast<std::size_t>(kThreads * kEach));
 }

@@ -27,7 +27,6 @@ public:
 
     Log log;
     std::map<std::string, uError> answers;
-    bool lastInteractive = false;
 
 protected:
     uError hook(std::string const& name) {
@@ -64,8 +63,7 @@ protected:
     uError postRemove(GUID const&) override { return hook("postRemove"); }
     uError retrieveData(GUID const&, Record&, bool) override { return hook("retrieveData"); }
     uError checkQuery(IQueryItems::StartQueryMessage const&, bool interactive) override {
-        lastInteractive = interactive;
-        return hook("checkQuery");
+        return hook(std::string("checkQuery(") + (interactive ? "true" : "false") + ")");
     }
     uError doStartQuery(IQueryItems::StartQueryMessage&, bool) override {
         return hook("doStartQuery");
@@ -107,67 +105,43 @@ BaseSource::Record someRecord() {
     return BaseSource::Record{{"core_object_type", 4}};
 }
 
+// A message-driven entry point: the message's own hooks between the pre- and post-message hooks.
+template <class Message>
+std::function<uError(RecordingSource&)> sending(std::function<void(Message&)> prepare = {}) {
+    return [prepare](RecordingSource& s) {
+        Message msg;
+        if (prepare) prepare(msg);
+        return s.onMessage(msg);
+    };
+}
+
 INSTANTIATE_TEST_SUITE_P(
     Table, SourceSequenceTest,
     testing::Values(
-        SequenceCase{"sendConfig",
-                     [](RecordingSource& s) { return s.sendConfig(Configuration::Group("g")); },
+        SequenceCase{"sendConfig", [](RecordingSource& s) { return s.sendConfig(Configuration::Group("g")); },
                      {"sendConfigImpl"}},
         SequenceCase{"startup", [](RecordingSource& s) { return s.startup(); }, {"startupImpl"}},
-        SequenceCase{"shutdown", [](RecordingSource& s) { return s.shutdown(); },
-                     {"shutdownImpl"}},
-        SequenceCase{"insert",
-                     [](RecordingSource& s) {
-                         auto r = someRecord();
-                         return s.insert(r);
-                     },
+        SequenceCase{"shutdown", [](RecordingSource& s) { return s.shutdown(); }, {"shutdownImpl"}},
+        SequenceCase{"insert", [](RecordingSource& s) { auto r = someRecord(); return s.insert(r); },
                      {"manageInputDataImpl(false)", "insertData", "postInsert"}},
-        SequenceCase{"update",
-                     [](RecordingSource& s) {
-                         auto r = someRecord();
-                         return s.update(r);
-                     },
+        SequenceCase{"update", [](RecordingSource& s) { auto r = someRecord(); return s.update(r); },
                      {"manageUpdateDataImpl(0)", "updateData", "postUpdate"}},
-        SequenceCase{"remove", [](RecordingSource& s) { return s.remove(GUID(), true); },
-                     {"removeData", "postRemove"}},
+        SequenceCase{"remove", [](RecordingSource& s) { return s.remove(GUID(), true); }, {"removeData", "postRemove"}},
         SequenceCase{"markInvisible", [](RecordingSource& s) { return s.markInvisible(GUID()); },
                      {"markDataInvisible", "postMarkInvisible"}},
-        SequenceCase{"retrieve",
-                     [](RecordingSource& s) {
-                         BaseSource::Record r;
-                         return s.retrieve(GUID(), r, false);
-                     },
+        SequenceCase{"retrieve", [](RecordingSource& s) { BaseSource::Record r; return s.retrieve(GUID(), r, false); },
                      {"retrieveData", "modifyRetrievedData"}},
         SequenceCase{"startQueryMessage",
-                     [](RecordingSource& s) {
-                         IQueryItems::StartQueryMessage msg;
-                         return s.onMessage(msg);
-                     },
-                     {"preMessageImpl", "checkQuery", "doStartQuery", "postMessageImpl(0)"}},
+                     sending<IQueryItems::StartQueryMessage>([](auto& m) { m.interactive = false; }),
+                     {"preMessageImpl", "checkQuery(false)", "doStartQuery", "postMessageImpl(0)"}},
+        SequenceCase{"interactiveStartQueryMessage",
+                     sending<IQueryItems::StartQueryMessage>([](auto& m) { m.interactive = true; }),
+                     {"preMessageImpl", "checkQuery(true)", "doStartQuery", "postMessageImpl(0)"}},
         SequenceCase{"configurationChangedMessage",
-                     [](RecordingSource& s) {
-                         ConfigurationChangedMessage msg(Set<String>{"a", "b"});
-                         return s.onMessage(msg);
-                     },
+                     sending<ConfigurationChangedMessage>([](auto& m) { m.keys = Set<String>{"a", "b"}; }),
                      {"preMessageImpl", "configurationChangedImpl(2)", "postMessageImpl(0)"}},
-        SequenceCase{"otherMessage",
-                     [](RecordingSource& s) {
-                         WipeMessage msg;
-                         return s.onMessage(msg);
-                     },
-                     {"preMessageImpl", "postMessageImpl(0)"}}),
+        SequenceCase{"otherMessage", sending<WipeMessage>(), {"preMessageImpl", "postMessageImpl(0)"}}),
     [](testing::TestParamInfo<SequenceCase> const& info) { return info.param.name; });
-
-TEST(BaseSourceTest, QueryMessageCarriesItsInteractiveFlagToTheHooks) {
-    RecordingSource source;
-    IQueryItems::StartQueryMessage msg;
-    msg.interactive = false;
-    ASSERT_OK(source.onMessage(msg));
-    EXPECT_FALSE(source.lastInteractive);
-    msg.interactive = true;
-    ASSERT_OK(source.onMessage(msg));
-    EXPECT_TRUE(source.lastInteractive);
-}
 
 TEST(BaseSourceTest, MessageWithAKnownNameButAnotherClassIsRefused) {
     RecordingSource source;

@@ -52,19 +52,12 @@ TEST(HashParseObjTest, AnswerDocumentsGiveTheirFieldsWithEntitiesDecodedAndNilFi
         {"error_response", "error_response.xml",
          {{"error_code", "102"}, {"error_msg", "Session key invalid or no longer valid"}, {"request_args", ""}}},
         {"auth_login_response", "auth_login_response.xml",
-         {{"session_key", "2.b1c2d3e4f5a6b7c8d9e0f1a2.3600.1262307600-1001"},
-          {"uid", "1001"},
-          {"secret", "9f8e7d6c5b4a39281706f5e4d3c2b1a0"},
-          {"expires", "0"}}},
+         {{"session_key", "2.b1c2d3e4f5a6b7c8d9e0f1a2.3600.1262307600-1001"}, {"uid", "1001"},
+          {"secret", "9f8e7d6c5b4a39281706f5e4d3c2b1a0"}, {"expires", "0"}}},
         {"photos_upload_response", "photos_upload_response.xml",
-         {{"pid", "1001_90210"},
-          {"aid", "1001_7"},
-          {"owner", "1001"},
-          {"src", "http://photos.example/s1001_90210.jpg"},
-          {"src_big", "http://photos.example/n1001_90210.jpg"},
-          {"src_small", "http://photos.example/t1001_90210.jpg"},
-          {"link", "http://www.facebook.com/photo.php?pid=90210&id=1001"},
-          {"caption", "Harbour at dusk"},
+         {{"pid", "1001_90210"}, {"aid", "1001_7"}, {"owner", "1001"}, {"src", "http://photos.example/s1001_90210.jpg"},
+          {"src_big", "http://photos.example/n1001_90210.jpg"}, {"src_small", "http://photos.example/t1001_90210.jpg"},
+          {"link", "http://www.facebook.com/photo.php?pid=90210&id=1001"}, {"caption", "Harbour at dusk"},
           {"created", "1262390400"}}},
         {"r", R"(<r xmlns:xsi="x"><a xsi:nil="true"/><b/><c></c><d> </d></r>)", {{"b", ""}, {"c", ""}, {"d", " "}}},
     };
@@ -129,71 +122,50 @@ TEST(FqlParseObjTest, NestedFieldsAreDottedNilFieldsAbsentEmptyFieldsEmpty) {
     EXPECT_EQ(count, 3u);
     EXPECT_EQ(plain(rows),
               (std::vector<Row>{
-                  {{"uid", "1001"},
-                   {"name", "Ada Tester"},
-                   {"about_me", ""},
-                   {"current_location.city", "Z\xC3\xBCrich"},
-                   {"current_location.country", "Switzerland"},
-                   {"current_location.zip", ""},
-                   {"status.message", "Reading <XML> & \"quotes\""},
-                   {"status.time", "1262304000"},
-                   {"status.status_id", "55"}},
-                  {{"uid", "1002"},
-                   {"name", "Bo Example"},
-                   {"about_me", "line one\nline two"},
-                   {"status.message", ""},
-                   {"status.time", "0"},
-                   {"status.status_id", "0"},
-                   {"birthday", "March 3"}},
-                  {{"uid", "1003"},
-                   {"name", "Cy Sample"},
-                   {"about_me", "\xE2\x98\xBA"},
-                   {"current_location", ""},
+                  {{"uid", "1001"}, {"name", "Ada Tester"}, {"about_me", ""},
+                   {"current_location.city", "Z\xC3\xBCrich"}, {"current_location.country", "Switzerland"},
+                   {"current_location.zip", ""}, {"status.message", "Reading <XML> & \"quotes\""},
+                   {"status.time", "1262304000"}, {"status.status_id", "55"}},
+                  {{"uid", "1002"}, {"name", "Bo Example"}, {"about_me", "line one\nline two"}, {"status.message", ""},
+                   {"status.time", "0"}, {"status.status_id", "0"}, {"birthday", "March 3"}},
+                  {{"uid", "1003"}, {"name", "Cy Sample"}, {"about_me", "\xE2\x98\xBA"}, {"current_location", ""},
                    {"birthday", ""}},
               }));
 }
 
-struct SkipCase {
+// Rows follow what the output already held; skipped rows and rows of other tables are not returned.
+struct RowsCase {
+    char const* file;
+    char const* table;
     unsigned skip;
+    unsigned count;  // rows of the table in the answer, skipped ones included
     std::vector<std::string> uids;
 };
 
-void PrintTo(SkipCase const& c, std::ostream* os) { *os << "skip " << c.skip; }
+void PrintTo(RowsCase const& c, std::ostream* os) { *os << c.file << " " << c.table << " skip " << c.skip; }
 
-class FqlParseObjSkipTest : public ::testing::TestWithParam<SkipCase> {};
+class FqlParseObjRowsTest : public ::testing::TestWithParam<RowsCase> {};
 
-TEST_P(FqlParseObjSkipTest, SkippedRowsAreCountedButNotReturned) {
-    Rows rows;
-    unsigned count = 0;
-    FqlParseObj p("fql_query_response", "user", GetParam().skip);
-    ASSERT_OK(p.parse(loadXml("fql_query_response_users.xml"), rows, count));
-    EXPECT_EQ(count, 3u);
-    std::vector<std::string> uids;
-    for (auto const& r : rows) uids.push_back(r.search("uid")->str());
-    EXPECT_EQ(uids, GetParam().uids);
-}
-
-INSTANTIATE_TEST_SUITE_P(Skips, FqlParseObjSkipTest,
-                         ::testing::Values(SkipCase{0, {"1001", "1002", "1003"}}, SkipCase{1, {"1002", "1003"}},
-                                           SkipCase{3, {}}, SkipCase{7, {}}));
-
-TEST(FqlParseObjTest, EmptyAnswerIsSuccessWithNoRows) {
+TEST_P(FqlParseObjRowsTest, SkippedRowsAreCountedButNotReturned) {
+    RowsCase const& c = GetParam();
     Rows rows{Map<String, String>{{"earlier", "row"}}};
     unsigned count = 99;
-    FqlParseObj p("fql_query_response", "user", 0);
-    ASSERT_OK(p.parse(loadXml("fql_query_response_empty.xml"), rows, count));
-    EXPECT_EQ(count, 0u);
-    EXPECT_EQ(plain(rows), (std::vector<Row>{{{"earlier", "row"}}}));
+    ASSERT_OK(FqlParseObj("fql_query_response", c.table, c.skip).parse(loadXml(c.file), rows, count));
+    EXPECT_EQ(count, c.count);
+    ASSERT_FALSE(rows.empty());
+    EXPECT_EQ(rows[0].map(), (Row{{"earlier", "row"}}));
+    std::vector<std::string> uids;
+    for (unsigned i = 1; i < rows.size(); ++i) uids.push_back(rows[i].search("uid")->str());
+    EXPECT_EQ(uids, c.uids);
 }
 
-TEST(FqlParseObjTest, OnlyElementsOfTheRowTableAreRows) {
-    Rows rows;
-    unsigned count = 99;
-    FqlParseObj p("fql_query_response", "photo", 0);
-    ASSERT_OK(p.parse(loadXml("fql_query_response_users.xml"), rows, count));
-    EXPECT_EQ(count, 0u);
-    EXPECT_TRUE(rows.empty());
-}
+INSTANTIATE_TEST_SUITE_P(Rows, FqlParseObjRowsTest,
+                         ::testing::Values(RowsCase{"fql_query_response_users.xml", "user", 0, 3, {"1001", "1002", "1003"}},
+                                           RowsCase{"fql_query_response_users.xml", "user", 1, 3, {"1002", "1003"}},
+                                           RowsCase{"fql_query_response_users.xml", "user", 3, 3, {}},
+                                           RowsCase{"fql_query_response_users.xml", "user", 7, 3, {}},
+                                           RowsCase{"fql_query_response_users.xml", "photo", 0, 0, {}},
+                                           RowsCase{"fql_query_response_empty.xml", "user", 0, 0, {}}));
 
 TEST(FqlParseObjTest, RowsReadBeforeATruncationStay) {
     std::string whole = loadXml("fql_query_response_users.xml").str();
@@ -231,31 +203,19 @@ TEST(FStreamParseObjTest, StreamAnswerGivesOneRowPerPostByKind) {
     EXPECT_EQ(plain(rows),
               (std::vector<Row>{
                   // status update (type 46): comment texts and times must not leak in
-                  {{"is_status", "1"},
-                   {"post_id", "1002_501"},
-                   {"source_id", "1002"},
-                   {"created_time", "1262396000"},
+                  {{"is_status", "1"}, {"post_id", "1002_501"}, {"source_id", "1002"}, {"created_time", "1262396000"},
                    {"message", "Off to the mountains & back on Monday"}},
                   // photo post: the first photo medium, the post's own time
-                  {{"is_photo", "1"},
-                   {"pid", "1003_77"},
-                   {"aid", "1003_12"},
-                   {"owner", "1003"},
-                   {"src", "http://photos.example/s1003_77.jpg"},
-                   {"alt", "The lake at noon"},
+                  {{"is_photo", "1"}, {"pid", "1003_77"}, {"aid", "1003_12"}, {"owner", "1003"},
+                   {"src", "http://photos.example/s1003_77.jpg"}, {"alt", "The lake at noon"},
                    {"created_time", "1262394000"}},
                   // link post
                   {{"post_id", "1004_503"}, {"created_time", "1262392000"}},
                   // wall post without media counts as a status
-                  {{"is_status", "1"},
-                   {"post_id", "1002_504"},
-                   {"source_id", "1001"},
-                   {"created_time", "1262390000"},
+                  {{"is_status", "1"}, {"post_id", "1002_504"}, {"source_id", "1001"}, {"created_time", "1262390000"},
                    {"message", ""}},
                   // photo medium without its photo element: no pid, aid or owner
-                  {{"is_photo", "1"},
-                   {"src", "http://photos.example/s1005_90.jpg"},
-                   {"alt", ""},
+                  {{"is_photo", "1"}, {"src", "http://photos.example/s1005_90.jpg"}, {"alt", ""},
                    {"created_time", "1262388000"}},
               }));
 }

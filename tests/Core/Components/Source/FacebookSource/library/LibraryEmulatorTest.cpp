@@ -1,10 +1,7 @@
 #include <gtest/gtest.h>
 
 #include "ErrorAssertions.h"
-#include <stdlib.h>
 
-#include <filesystem>
-#include <fstream>
 #include <memory>
 #include <mutex>
 
@@ -118,70 +115,6 @@ TEST_F(LibraryEmulatorTest, EveryCallReturnsTheEmulatorsData) {
         EXPECT_FALSE(message.messageId.empty());
         EXPECT_TRUE(message.hasAttachment);  // a non-zero time sent gives the flag
     }
-}
-
-TEST_F(LibraryEmulatorTest, PostedStatusAndUploadedPhotoAreSeenByTheService) {
-    ASSERT_OK(lib->connect());
-    ASSERT_OK(lib->setStatus("testing the client", false));
-    auto me = fql("SELECT status FROM user WHERE uid = " + kDemoUid, "user");
-    ASSERT_EQ(me.size(), 1u);
-    EXPECT_EQ(*me[0].search("status.message"), "testing the client");
-
-    char dir[] = "/tmp/trelm-library-test-XXXXXX";
-    ASSERT_NE(mkdtemp(dir), nullptr);
-    std::string const path = std::string(dir) + "/photo.jpg";
-    std::ofstream(path, std::ios::binary) << "\xff\xd8\xff\xe0 a picture \xff\xd9";
-    auto photo = makeSmart<InputDataStream>();
-    ASSERT_OK(photo->setUri(path));
-    String pid;
-    uError err = lib->sendPhoto(photo, "", "a caption", pid);
-    std::filesystem::remove_all(dir);
-    ASSERT_OK(err);
-    auto rows = fql("SELECT caption, owner FROM photo WHERE pid = '" + pid.str() + "'", "photo");
-    ASSERT_EQ(rows.size(), 1u);
-    EXPECT_EQ(*rows[0].search("caption") + "|" + *rows[0].search("owner"), "a caption|" + kDemoUid);
-    auto uploads = emulator->log().entriesFor("photos.upload");
-    ASSERT_EQ(uploads.size(), 1u);
-    EXPECT_TRUE(uploads[0].hadFile);
-}
-
-TEST_F(LibraryEmulatorTest, WrongPasswordIsNotSignedIn) {
-    ASSERT_OK(info->setLoginConfig(emu::DemoAccount::email, "not the password"));
-    EXPECT_CODE(lib->connect(), kNotSignedIn);
-    EXPECT_FALSE(info->hasSession());
-    EXPECT_EQ(stored("facebook_source_lastuser"), "");
-}
-
-// The service ends the session: the client drops it, keeps the user, and can sign in again.
-TEST_F(LibraryEmulatorTest, ExpiredSessionIsDroppedAndASecondLoginRecovers) {
-    emu::FaultRule rule;
-    rule.expireAfter = 2;
-    emulator->faults().set("fql.query", rule);
-    ASSERT_OK(lib->connect());
-    std::string const query = "SELECT uid FROM user WHERE uid = " + kDemoUid;
-    fql(query, "user");
-    fql(query, "user");
-    fql(query, "user", kNotSignedIn);
-    EXPECT_FALSE(info->hasSession());
-    String user;
-    ASSERT_OK(lib->getUserId(user));
-    EXPECT_EQ(user, kDemoUid);
-    EXPECT_EQ(stored("facebook_source_session_id"), "");
-
-    emulator->faults().clearAll();
-    ASSERT_OK(lib->connect());
-    EXPECT_EQ(fql(query, "user").size(), 1u);
-}
-
-TEST_F(LibraryEmulatorTest, ThrottledCallAnswersRequestLimitAndKeepsTheSession) {
-    ASSERT_OK(lib->connect());
-    emu::FaultRule rule;
-    rule.rate = 0.001;  // one call now, the next in a quarter of an hour
-    rule.burst = 1;
-    emulator->faults().set("users.setStatus", rule);
-    ASSERT_OK(lib->setStatus("first", false));
-    EXPECT_CODE(lib->setStatus("second", false), kRequestLimit);
-    EXPECT_TRUE(info->hasSession());
 }
 
 // The password goes out only in the HTTPS login; the session secret never goes out; neither
