@@ -193,34 +193,28 @@ protected:
     }
 };
 
-TEST_P(ConnectionReuseTest, RequestsOfOneFactoryShareOneConnectionAcrossDisconnect) {
+// Requests of one factory (a new request object each time) share one connection across
+// disconnect; requests with private connections connect again, which also shows that remote
+// ports do tell connections apart.
+TEST_P(ConnectionReuseTest, RequestsOfOneFactoryShareOneConnectionAndPrivateOnesConnectAgain) {
     auto server = makeServer();
     HttpRequestFactory factory;
     factory.setCaFile(String(files_.caCertPath));
-    for (int i = 0; i < 3; ++i) {
-        SmartPtr<HttpRequest> r = newRequest(factory);  // a new request object every time
-        Posted answer = post(*r, server->url("/echo"), {{"echo", "x"}});
+    HttpRequest::Settings settings;
+    settings.caFile = String(files_.caCertPath);
+    for (int i = 0; i < 5; ++i) {
+        SmartPtr<HttpRequest> shared = newRequest(factory);
+        HttpRequest own(settings, {});
+        Posted answer = post(i < 3 ? *shared : own, server->url("/echo"), {{"echo", "x"}});
         ASSERT_OK(answer.err);
         EXPECT_EQ(answer.body, "x");
     }
     auto seen = server->requests();
-    ASSERT_EQ(seen.size(), 3u);
+    ASSERT_EQ(seen.size(), 5u);
     EXPECT_EQ(seen[1].remotePort, seen[0].remotePort);
     EXPECT_EQ(seen[2].remotePort, seen[0].remotePort);
-}
-
-TEST_P(ConnectionReuseTest, RequestsWithPrivateConnectionsConnectAgain) {
-    // The counterpart of the test above: shows that remote ports do tell connections apart.
-    auto server = makeServer();
-    HttpRequest::Settings settings;
-    settings.caFile = String(files_.caCertPath);
-    for (int i = 0; i < 2; ++i) {
-        HttpRequest r(settings, {});
-        ASSERT_OK(post(r, server->url("/echo"), {}).err);
-    }
-    auto seen = server->requests();
-    ASSERT_EQ(seen.size(), 2u);
-    EXPECT_NE(seen[1].remotePort, seen[0].remotePort);
+    EXPECT_NE(seen[3].remotePort, seen[0].remotePort);
+    EXPECT_NE(seen[4].remotePort, seen[3].remotePort);
 }
 
 INSTANTIATE_TEST_SUITE_P(PlainAndTls, ConnectionReuseTest, ::testing::Bool(),
