@@ -61,11 +61,8 @@ protected:
 using Texts = std::vector<std::string>;
 
 TEST_F(RuntimeConfigurationTest, StoredValuesComeBackAsTextAndUnknownKeysStayEmpty) {
-    ASSERT_OK(put("src", {{"session", Variant("s1")},
-                          {"empty", Variant("")},
-                          {"count", Variant(42)},
-                          {"big", Variant(-5000000000LL)},
-                          {"flag", Variant(true)},
+    ASSERT_OK(put("src", {{"session", Variant("s1")}, {"empty", Variant("")}, {"count", Variant(42)},
+                          {"big", Variant(-5000000000LL)}, {"flag", Variant(true)},
                           {"bytes", Variant(String(std::string("a\0b", 3)))}}));
     EXPECT_EQ(get("src", {"session", "empty", "count", "big", "flag", "bytes", "unknown"}),
               (Texts{"s1", "", "42", "-5000000000", "true", std::string("a\0b", 3), "-"}));
@@ -143,6 +140,7 @@ TEST_F(RuntimeConfigurationTest, FailedOpenLeavesNoStoreInsteadOfAFreshOne) {
     EXPECT_OK(put("src", {{"a", Variant("1")}}));
 }
 
+// The in-memory store would lose its values if configuring it again opened it afresh.
 TEST_F(RuntimeConfigurationTest, ConfiguringTheSameStoreAgainKeepsItsValues) {
     Configuration::Group group("RuntimeConfiguration");
     ASSERT_OK(store_.sendConfig(group));
