@@ -375,15 +375,5 @@ TEST(SqliteStoreTest, ConcurrentCallersGetTheSameAnswersAsOneCaller) {
     EXPECT_EQ(data.fql("select status.message from user where uid = me()")[0].at("status.message"), "round 24");
 }
 
-TEST(SqliteStoreTest, DemoAccountAndApplicationAreKnown) {
-    GeneratedStore data(smallOptions());
-    EXPECT_EQ(data.store().appSecret(DemoAccount::apiKey), std::optional<std::string>(DemoAccount::appSecret));
-    EXPECT_EQ(data.store().appSecret("0000"), std::nullopt);
-    EXPECT_EQ(data.store().checkLogin(DemoAccount::email, DemoAccount::password),
-              std::optional<std::int64_t>(DemoAccount::uid));
-    EXPECT_EQ(data.store().checkLogin(DemoAccount::email, "wrong"), std::nullopt);
-    EXPECT_EQ(data.store().checkLogin("nobody@trelm.example", DemoAccount::password), std::nullopt);
-}
-
 }  // namespace
 }  // namespace emu::test

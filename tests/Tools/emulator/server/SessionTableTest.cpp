@@ -47,19 +47,6 @@ TEST(SessionTableTest, KeysAndSecretsAreFreshForEverySession) {
     EXPECT_EQ(secrets.size(), 100u);
 }
 
-TEST(SessionTableTest, UseCountsCallsPerSessionAndRemoveEndsIt) {
-    SessionTable table;
-    const Session a = table.create(1, 0);
-    const Session b = table.create(2, 0);
-    EXPECT_EQ(table.use(a.key).calls, 1);
-    EXPECT_EQ(table.use(a.key).calls, 2);
-    EXPECT_EQ(table.use(b.key).calls, 1);
-    EXPECT_EQ(table.use(b.key).session.secret, b.secret);
-    table.remove(a.key);
-    EXPECT_EQ(table.use(a.key).check, SessionTable::Check::Unknown);
-    EXPECT_EQ(table.use(b.key).check, SessionTable::Check::Valid);
-}
-
 TEST(SessionTableTest, CallIdMustGrowWithinEachSession) {
     SessionTable table;
     const Session a = table.create(1, 0);
