@@ -159,12 +159,13 @@ TEST_P(FqlParseObjRowsTest, SkippedRowsAreCountedButNotReturned) {
     EXPECT_EQ(uids, c.uids);
 }
 
+char const* const kUsers = "fql_query_response_users.xml";
+
 INSTANTIATE_TEST_SUITE_P(Rows, FqlParseObjRowsTest,
-                         ::testing::Values(RowsCase{"fql_query_response_users.xml", "user", 0, 3, {"1001", "1002", "1003"}},
-                                           RowsCase{"fql_query_response_users.xml", "user", 1, 3, {"1002", "1003"}},
-                                           RowsCase{"fql_query_response_users.xml", "user", 3, 3, {}},
-                                           RowsCase{"fql_query_response_users.xml", "user", 7, 3, {}},
-                                           RowsCase{"fql_query_response_users.xml", "photo", 0, 0, {}},
+                         ::testing::Values(RowsCase{kUsers, "user", 0, 3, {"1001", "1002", "1003"}},
+                                           RowsCase{kUsers, "user", 1, 3, {"1002", "1003"}},
+                                           RowsCase{kUsers, "user", 3, 3, {}}, RowsCase{kUsers, "user", 7, 3, {}},
+                                           RowsCase{kUsers, "photo", 0, 0, {}},
                                            RowsCase{"fql_query_response_empty.xml", "user", 0, 0, {}}));
 
 TEST(FqlParseObjTest, RowsReadBeforeATruncationStay) {

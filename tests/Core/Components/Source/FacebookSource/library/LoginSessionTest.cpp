@@ -63,12 +63,9 @@ TEST_F(LoginSessionTest, LoginPostsCredentialsOverHttpsAndStoresTheSession) {
     auto sent = http.exchanges();
     ASSERT_EQ(sent.size(), 1u);
     EXPECT_EQ(sent[0].url, "https://api.facebook.com/restserver.php");
-    EXPECT_EQ(entries(sent[0].fields), (Fields{{"api_key", "k"},
-                                               {"email", "me@example.org"},
-                                               {"method", "facebook.auth.login"},
-                                               {"password", "pw"},
-                                               {"sig", "5697f76f44ccb154732267ab67afb620"},
-                                               {"v", "1.0"}}));
+    EXPECT_EQ(entries(sent[0].fields), (Fields{{"api_key", "k"}, {"email", "me@example.org"},
+                                               {"method", "facebook.auth.login"}, {"password", "pw"},
+                                               {"sig", "5697f76f44ccb154732267ab67afb620"}, {"v", "1.0"}}));
     for (auto const& [key, value] : Fields{{"facebook_source_session_id", "SK"},
                                            {"facebook_source_session_secret", "SS"},
                                            {"facebook_source_session_user", "42"},
