@@ -111,49 +111,41 @@ EmulatorHost* ContactCursorTest::host = nullptr;
 FacebookSource* ContactCursorTest::source = nullptr;
 std::vector<std::string>* ContactCursorTest::expected = nullptr;
 
-TEST_F(ContactCursorTest, ForwardSeeksVisitEveryFriendOnceInOrderWithOneStatementPerPage) {
-    Cursor cursor = open();
-    ASSERT_TRUE(cursor);
-    std::vector<std::string> seen;
-    std::set<GUID> guids;
-    int moved = 1;
-    while (moved != 0) {
-        SmartPtr<Map<String, Variant>> row;
-        ASSERT_CODE(cursor->getRow(row), kSuccess);
-        seen.push_back(row->search("core_contact_service_id")->asString().str());
-        guids.insert(row->search("core_object_id")->asGUID());
-        ASSERT_CODE(cursor->seek(1, moved), seen.size() == size_t(kFriends) ? unsigned(kNoData) : kSuccess);
-    }
-    EXPECT_EQ(seen, *expected);
-    EXPECT_EQ(guids.size(), size_t(kFriends)) << "every friend has a GUID of its own";
+// Forward from the first friend and backward from the last, one row at a time: every friend once,
+// each with a GUID of its own, with the first page, one page past the edge row of each window, and
+// one more that finds the end.
+TEST_F(ContactCursorTest, SingleStepsEitherWayVisitEveryFriendOnceWithOneStatementPerPage) {
+    for (int step : {1, -1}) {
+        SCOPED_TRACE(step > 0 ? "forward" : "backward");
+        host->emulator().log().clear();
+        Cursor cursor = open();
+        ASSERT_TRUE(cursor);
+        if (step < 0) {
+            ASSERT_CODE(cursor->jumpEnd(), kSuccess);
+        }
+        std::vector<std::string> seen;
+        std::set<GUID> guids;
+        for (int moved = step; moved != 0;) {
+            SmartPtr<Map<String, Variant>> row;
+            ASSERT_CODE(cursor->getRow(row), kSuccess);
+            seen.push_back(row->search("core_contact_service_id")->asString().str());
+            guids.insert(row->search("core_object_id")->asGUID());
+            ASSERT_CODE(cursor->seek(step, moved), seen.size() == size_t(kFriends) ? unsigned(kNoData) : kSuccess);
+        }
+        if (step < 0) std::reverse(seen.begin(), seen.end());
+        EXPECT_EQ(seen, *expected);
+        EXPECT_EQ(guids.size(), size_t(kFriends));
 
-    // The first page, one page after the last row of each window, and one more that finds the end.
-    std::vector<std::string> statements = host->fqlStatements();
-    ASSERT_EQ(statements.size(), size_t(kFriends / kWindow + 1));
-    EXPECT_EQ(statements[0], firstPage());
-    for (size_t k = 1; k < statements.size(); ++k) {
-        EXPECT_EQ(statements[k], pageAfter((*expected)[k * kWindow - 1])) << "page " << k;
-    }
-}
-
-TEST_F(ContactCursorTest, BackwardSeeksFromTheEndVisitEveryFriendInReverse) {
-    Cursor cursor = open();
-    ASSERT_CODE(cursor->jumpEnd(), kSuccess);
-    std::vector<std::string> seen;
-    int moved = -1;
-    while (moved != 0) {
-        seen.push_back(uidAt(cursor));
-        ASSERT_OK(cursor->seek(-1, moved));
-    }
-    std::reverse(seen.begin(), seen.end());
-    EXPECT_EQ(seen, *expected);
-
-    std::vector<std::string> statements = host->fqlStatements();
-    ASSERT_EQ(statements.size(), size_t(kFriends / kWindow + 1));
-    EXPECT_EQ(statements[0], "select uid,name,pic_big from user where " + kFriendCondition +
-                                 " order by concat(uid,' ') desc limit 150");
-    for (size_t k = 1; k < statements.size(); ++k) {
-        EXPECT_EQ(statements[k], pageBefore((*expected)[kFriends - k * kWindow])) << "page " << k;
+        std::vector<std::string> statements = host->fqlStatements();
+        ASSERT_EQ(statements.size(), size_t(kFriends / kWindow + 1));
+        EXPECT_EQ(statements[0], step > 0 ? firstPage()
+                                          : "select uid,name,pic_big from user where " + kFriendCondition +
+                                                " order by concat(uid,' ') desc limit 150");
+        for (size_t k = 1; k < statements.size(); ++k) {
+            EXPECT_EQ(statements[k], step > 0 ? pageAfter((*expected)[k * kWindow - 1])
+                                              : pageBefore((*expected)[kFriends - k * kWindow]))
+                << "page " << k;
+        }
     }
 }
 
