@@ -111,8 +111,16 @@ TEST(DataOperationsTest, OperationsBeforeStartupFailWithNotSet) {
     EXPECT_CODE(source.retrieve(GUID::generate(), out, false), kNotSet);
     IServiceSource::GetUserSidMessage sid;
     EXPECT_CODE(source.onMessage(sid), kNotSet);
+    // A query gets no cursor without a client, before and after a configuration.
+    IQueryItems::StartQueryMessage query(Vector<IQueryItems::Column>(), Vector<IQueryItems::Constraint>{
+        IQueryItems::Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2),
+                                IQueryItems::Constraint::Equal}});
+    EXPECT_CODE(source.onMessage(query), kNotSet);
     // Starting without a configuration is refused too, rather than making a client without settings.
     EXPECT_CODE(source.startup(), kNotSet);
+    ASSERT_OK(source.sendConfig(Configuration::Group(kSourceName)));
+    EXPECT_CODE(source.onMessage(query), kNotSet);
+    EXPECT_FALSE(query.cursor);
 }
 
 // The dump pads every key to 30 columns; a longer key gets (length - 30) spaces instead.

@@ -135,17 +135,6 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
     }
 }
 
-TEST(QueryBeforeStartupTest, FailsWithNotSetInsteadOfHandingOutACursorWithoutClient) {
-    FacebookSource source(kSourceName);
-    IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), Vector<Constraint>{typeIs(2)});
-    EXPECT_CODE(source.onMessage(msg), kNotSet);
-    EXPECT_FALSE(msg.cursor);
-
-    ASSERT_CODE(source.sendConfig(Configuration::Group(kSourceName)), kSuccess);
-    EXPECT_CODE(source.onMessage(msg), kNotSet);
-    EXPECT_FALSE(msg.cursor);
-}
-
 TEST_F(QueryDispatchTest, ContactConstraintTheCursorCannotReadFailsTheQuery) {
     Vector<Constraint> constraints{typeIs(2), other()};
     IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints);
