@@ -41,16 +41,9 @@ std::string pageBefore(std::string const& uid) {
 class ContactCursorTest : public ::testing::Test {
 protected:
     static void SetUpTestSuite() {
-        emu::GeneratorOptions generator;
-        generator.users = kFriends + 200;
-        generator.demoFriends = kFriends;
-        generator.friendsPerUser = 2;
-        generator.albumsPerUser = 1;
-        generator.photosPerAlbum = 1;
-        generator.postsPerUser = 1;
-        generator.threadsPerUser = 1;
-        generator.messagesPerThread = 1;
-        host = new EmulatorHost(generator);
+        host = new EmulatorHost(emu::GeneratorOptions{.users = kFriends + 200, .demoFriends = kFriends,
+                                                      .friendsPerUser = 2, .albumsPerUser = 1, .photosPerAlbum = 1,
+                                                      .postsPerUser = 1, .threadsPerUser = 1, .messagesPerThread = 1});
         std::string error;
         ASSERT_TRUE(host->start(error)) << error;
         source = &host->addSource(host->demoGroup(kSourceName, true));
