@@ -10,7 +10,7 @@
 
 #include "trelm/uError.h"
 
-namespace trelm::testing {
+namespace trelm::assertions {
 
 inline ::testing::AssertionResult isOk(char const* expr, uError const& e) {
     if (e.ok()) return ::testing::AssertionSuccess();
@@ -25,9 +25,9 @@ inline ::testing::AssertionResult hasCode(char const* expr, char const* /*codeEx
     return ::testing::AssertionFailure() << expr << " should give " << want << " but gave:\n" << e.toText();
 }
 
-}  // namespace trelm::testing
+}  // namespace trelm::assertions
 
-#define EXPECT_OK(expr) EXPECT_PRED_FORMAT1(::trelm::testing::isOk, (expr))
-#define ASSERT_OK(expr) ASSERT_PRED_FORMAT1(::trelm::testing::isOk, (expr))
-#define EXPECT_CODE(expr, code) EXPECT_PRED_FORMAT2(::trelm::testing::hasCode, (expr), (code))
-#define ASSERT_CODE(expr, code) ASSERT_PRED_FORMAT2(::trelm::testing::hasCode, (expr), (code))
+#define EXPECT_OK(expr) EXPECT_PRED_FORMAT1(::trelm::assertions::isOk, (expr))
+#define ASSERT_OK(expr) ASSERT_PRED_FORMAT1(::trelm::assertions::isOk, (expr))
+#define EXPECT_CODE(expr, code) EXPECT_PRED_FORMAT2(::trelm::assertions::hasCode, (expr), (code))
+#define ASSERT_CODE(expr, code) ASSERT_PRED_FORMAT2(::trelm::assertions::hasCode, (expr), (code))

@@ -2,22 +2,19 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "trelm/Set.h"
 
 namespace trelm {
 namespace {
 
 Configuration::Group makeGroup() {
-    Map<String, Variant> values;
-    values.insert("flag_true", true);
-    values.insert("flag_text", "false");
-    values.insert("flag_one", 1);
-    values.insert("flag_two", 2);
-    values.insert("flag_word", "yes");
-    values.insert("list", Vector<String>{"a", "b"});
-    values.insert("int_list", Vector<int>{3, 4});
-    values.insert("single", "solo");
-    values.insert("number", 7);
+    Map<String, Variant> const values{
+        {"flag_true", true},  {"flag_text", "false"},          {"flag_one", 1},
+        {"flag_two", 2},      {"flag_word", "yes"},            {"list", Vector<String>{"a", "b"}},
+        {"single", "solo"},   {"int_list", Vector<int>{3, 4}}, {"number", 7},
+    };
     return Configuration::Group("source", values);
 }
 
@@ -43,7 +40,7 @@ TEST(ConfigurationTest, GetBoolAcceptsBoolLikeValuesAndDefaultsWhenAbsent) {
         // out starts as !def for successes so that a skipped write would show; for failures it
         // must keep its start value `expected`.
         bool out = c.code == kSuccess ? !c.expected : c.expected;
-        EXPECT_EQ(group.get(c.key, out, c.def).code(), c.code) << c.key;
+        EXPECT_CODE(group.get(c.key, out, c.def), c.code) << c.key;
         EXPECT_EQ(out, c.expected) << c.key;
     }
 }
@@ -63,23 +60,23 @@ TEST(ConfigurationTest, GetListAcceptsListsAndASingleString) {
                        {"flag_true", kInvalid, {"untouched"}}};
     for (auto const& c : cases) {
         Vector<String> out{"untouched"};
-        EXPECT_EQ(group.get(c.key, out, def).code(), c.code) << c.key;
+        EXPECT_CODE(group.get(c.key, out, def), c.code) << c.key;
         EXPECT_EQ(out, c.expected) << c.key;
     }
 }
 
 TEST(ConfigurationTest, SetReplacesAndValuesAreOrderedByKey) {
     Configuration::Group group("g");
-    group.set("b", 1);
-    group.set("a", 2);
-    group.set("b", 3);
+    ASSERT_OK(group.set("b", 1));
+    ASSERT_OK(group.set("a", 2));
+    ASSERT_OK(group.set("b", 3));
     ASSERT_EQ(group.values().size(), 2u);
     EXPECT_EQ(group.values().begin()->first, "a");
     EXPECT_EQ(group.get("b"), Variant(3));
 
     Set<Configuration::Value> values;
-    values.insert(Configuration::Value("k", "one"));
-    values.insert(Configuration::Value("k", "two"));
+    ASSERT_OK(values.insert(Configuration::Value("k", "one")));
+    ASSERT_OK(values.insert(Configuration::Value("k", "two")));
     EXPECT_EQ(values.size(), 1u);
 }
 

@@ -2,6 +2,8 @@
 
 #include <vector>
 
+#include "ErrorAssertions.h"
+
 #include "trelm/Map.h"
 #include "trelm/Set.h"
 #include "trelm/SmartPtr.h"
@@ -14,22 +16,22 @@ namespace {
 TEST(MapTest, InsertReplacesAnEqualKeyAndAbsentKeysAreNullOrRemovedQuietly) {
     Map<String, int> m;
     Map<String, int> const& cm = m;
-    EXPECT_EQ(m.insert("k", 1).code(), kSuccess);
-    EXPECT_EQ(m.insert("k", 2).code(), kSuccess);
+    EXPECT_OK(m.insert("k", 1));
+    EXPECT_OK(m.insert("k", 2));
     EXPECT_EQ(m.size(), 1u);
     ASSERT_NE(cm.search("k"), nullptr);
     EXPECT_EQ(*m.search("k"), 2);
     EXPECT_EQ(m.search("none"), nullptr);
     EXPECT_EQ(cm.search("none"), nullptr);
-    EXPECT_EQ(m.remove("none").code(), kSuccess);
-    EXPECT_EQ(m.remove("k").code(), kSuccess);
+    EXPECT_OK(m.remove("none"));
+    EXPECT_OK(m.remove("k"));
     EXPECT_TRUE(m.empty());
 }
 
 TEST(MapTest, IterationRunsInAscendingByteOrder) {
     Map<String, int> m;
     for (char const* k : {"session_key", "api_key", "call_id", "Zeta", "v", "format"}) {
-        m.insert(k, 0);
+        ASSERT_OK(m.insert(k, 0));
     }
     std::vector<std::string> keys;
     for (auto const& entry : m) keys.push_back(entry.first.str());
@@ -39,26 +41,26 @@ TEST(MapTest, IterationRunsInAscendingByteOrder) {
 
 TEST(SetTest, KeepsOneCopyOfEqualValuesInOrder) {
     Set<String> s;
-    s.insert("b");
-    s.insert("a");
-    s.insert("b");
+    ASSERT_OK(s.insert("b"));
+    ASSERT_OK(s.insert("a"));
+    ASSERT_OK(s.insert("b"));
     EXPECT_EQ(s.size(), 2u);
     EXPECT_TRUE(s.contains("a"));
     EXPECT_EQ(*s.begin(), "a");
-    EXPECT_EQ(s.remove("zzz").code(), kSuccess);
-    s.remove("a");
+    EXPECT_OK(s.remove("zzz"));
+    EXPECT_OK(s.remove("a"));
     EXPECT_FALSE(s.contains("a"));
 }
 
 TEST(VectorTest, InsertAndEraseRejectPositionsOutOfRange) {
     Vector<int> v(16);  // growth step accepted and ignored
-    EXPECT_EQ(v.insert(1, 5).code(), kInvalid);
-    EXPECT_EQ(v.insert(0, 2).code(), kSuccess);
-    EXPECT_EQ(v.insert(0, 1).code(), kSuccess);
-    EXPECT_EQ(v.insert(2, 3).code(), kSuccess);  // append
+    EXPECT_CODE(v.insert(1, 5), kInvalid);
+    EXPECT_OK(v.insert(0, 2));
+    EXPECT_OK(v.insert(0, 1));
+    EXPECT_OK(v.insert(2, 3));  // append
     EXPECT_EQ(v, (Vector<int>{1, 2, 3}));
-    EXPECT_EQ(v.erase(3).code(), kInvalid);
-    EXPECT_EQ(v.erase(1).code(), kSuccess);
+    EXPECT_CODE(v.erase(3), kInvalid);
+    EXPECT_OK(v.erase(1));
     EXPECT_EQ(v, (Vector<int>{1, 3}));
 }
 

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 namespace trelm {
 namespace {
 
@@ -22,24 +24,22 @@ TEST(MetadataTest, HostCoreKeysAreKnownWithTheirTypes) {
                        {"media_notes", TRELM_TYPES::STRING}};
     for (auto const& c : cases) {
         TYPES type = TRELM_TYPES::NONE;
-        ASSERT_EQ(Metadata::getType(c.name, type).code(), kSuccess) << c.name;
+        ASSERT_OK(Metadata::getType(c.name, type)) << c.name;
         EXPECT_EQ(type, c.type) << c.name;
     }
 }
 
-TEST(MetadataTest, UnknownNameIsNotFoundAndLeavesTheType) {
-    TYPES type = TRELM_TYPES::INT64;
-    EXPECT_EQ(Metadata::getType("metadata_test_never_registered", type).code(), kNotFound);
-    EXPECT_EQ(type, TRELM_TYPES::INT64);
-}
-
-TEST(MetadataTest, SecondRegistrationOfANameKeepsTheFirstType) {
+// A second registration of a name keeps the first type; a name never registered is not found and
+// leaves the caller's type alone.
+TEST(MetadataTest, SecondRegistrationKeepsTheFirstTypeAndUnknownNamesAreNotFound) {
     Metadata::Key first = trelm_RegisterMetadataType("metadata_test_twice", TRELM_TYPES::STRING);
     EXPECT_EQ(first, Metadata::Key("metadata_test_twice", TRELM_TYPES::STRING));
     Metadata::Key second = trelm_RegisterMetadataType("metadata_test_twice", TRELM_TYPES::INT32);
     EXPECT_EQ(second.type(), TRELM_TYPES::STRING);
     TYPES type = TRELM_TYPES::NONE;
-    ASSERT_TRUE(Metadata::getType("metadata_test_twice", type).ok());
+    ASSERT_OK(Metadata::getType("metadata_test_twice", type));
+    EXPECT_EQ(type, TRELM_TYPES::STRING);
+    EXPECT_CODE(Metadata::getType("metadata_test_never_registered", type), kNotFound);
     EXPECT_EQ(type, TRELM_TYPES::STRING);
 }
 

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <climits>
 
 namespace trelm {
@@ -69,26 +71,20 @@ struct ParseCase {
 
 class StringParseTest : public testing::TestWithParam<ParseCase> {};
 
+// A refused text leaves the out-parameter as it was.
+template <class T>
+void expectParse(char const* text, bool ok, T value, T sentinel) {
+    T out = sentinel;
+    uError const e = String(text).to(out);
+    if (ok) EXPECT_OK(e) << text;
+    else EXPECT_CODE(e, kInvalid) << text;
+    EXPECT_EQ(out, ok ? value : sentinel) << text;
+}
+
 TEST_P(StringParseTest, WholeTextMustBeADecimalInRange) {
     ParseCase const& c = GetParam();
-    int i = -777;
-    uError ei = String(c.text).to(i);
-    if (c.intOk) {
-        EXPECT_EQ(ei.code(), kSuccess);
-        EXPECT_EQ(i, c.intValue);
-    } else {
-        EXPECT_EQ(ei.code(), kInvalid);
-        EXPECT_EQ(i, -777) << "out-parameter written on failure";
-    }
-    unsigned u = 777;
-    uError eu = String(c.text).to(u);
-    if (c.unsignedOk) {
-        EXPECT_EQ(eu.code(), kSuccess);
-        EXPECT_EQ(u, c.unsignedValue);
-    } else {
-        EXPECT_EQ(eu.code(), kInvalid);
-        EXPECT_EQ(u, 777u) << "out-parameter written on failure";
-    }
+    expectParse(c.text, c.intOk, c.intValue, -777);
+    expectParse(c.text, c.unsignedOk, c.unsignedValue, 777u);
 }
 
 INSTANTIATE_TEST_SUITE_P(

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "trelm/String.h"
 
 namespace trelm {
@@ -18,7 +20,7 @@ TEST(uErrorTest, HighBitDecidesFailureAndNoDataIsNotAFailure) {
         EXPECT_EQ(e.failed(), c.failed) << std::hex << c.code;
         EXPECT_EQ(e.ok(), !c.failed) << std::hex << c.code;
     }
-    EXPECT_TRUE(uError().ok());
+    EXPECT_OK(uError());
     EXPECT_EQ(uError().cause(), nullptr);
 }
 
@@ -27,11 +29,11 @@ TEST(uErrorTest, MacrosStampTheProjectRelativePathWithoutExtension) {
     uError e = TRELM_ERROR(kInvalid);
     EXPECT_STREQ(e.file(), "tests/Core/Common/uErrorTest");
     EXPECT_EQ(e.line(), line);
-    EXPECT_EQ(e.code(), kInvalid);
+    EXPECT_CODE(e, kInvalid);
     EXPECT_TRUE(e.message().empty());
 
     uError ok = TRELM_OK();
-    EXPECT_EQ(ok.code(), kSuccess);
+    EXPECT_CODE(ok, kSuccess);
     EXPECT_STREQ(ok.file(), "tests/Core/Common/uErrorTest");
 }
 

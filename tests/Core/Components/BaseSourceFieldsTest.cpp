@@ -1,22 +1,18 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "BaseSource.h"
 
 namespace trelm {
 namespace {
 
 BaseSource::Record record() {
-    BaseSource::Record r;
-    r.insert("type_int", 9);
-    r.insert("type_text", "4");
-    r.insert("type_junk", "four");
-    r.insert("type_big", 1LL << 40);
-    r.insert("text", "hello");
-    r.insert("text_empty", "");
-    r.insert("number", 12);
-    r.insert("list", Vector<String>{"a"});
-    r.insert("empty_variant", Variant());
-    return r;
+    return BaseSource::Record{
+        {"type_int", 9},  {"type_text", "4"},      {"type_junk", "four"},      {"type_big", 1LL << 40},
+        {"text", "hello"}, {"text_empty", ""},     {"number", 12},             {"list", Vector<String>{"a"}},
+        {"empty_variant", Variant()},
+    };
 }
 
 struct FieldCase {
@@ -40,7 +36,7 @@ TEST(BaseSourceFieldsTest, FieldRequiredReadsAnIntegerOrRefuses) {
     for (auto const& c : cases) {
         int out = -1;
         uError e = BaseSource::fieldRequired(r, c.key, out);
-        EXPECT_EQ(e.code(), c.code) << c.key;
+        EXPECT_CODE(e, c.code) << c.key;
         EXPECT_EQ(e.cause() != nullptr, c.wrapsCause) << c.key;
         EXPECT_EQ(out, c.value) << c.key;
     }
@@ -57,10 +53,10 @@ TEST(BaseSourceFieldsTest, FieldRequiredNotEmptyRefusesMissingEmptyAndUnconverti
     for (auto const& c : cases) {
         String out("untouched");
         uError e = BaseSource::fieldRequiredNotEmpty(r, c.key, out);
-        EXPECT_EQ(e.code(), c.code) << c.key;
+        EXPECT_CODE(e, c.code) << c.key;
         EXPECT_EQ(e.cause() != nullptr, c.wrapsCause) << c.key;
         EXPECT_EQ(out, c.text) << c.key;
-        EXPECT_EQ(BaseSource::fieldRequiredStringNotEmpty(r, c.key).code(), c.code) << c.key;
+        EXPECT_CODE(BaseSource::fieldRequiredStringNotEmpty(r, c.key), c.code) << c.key;
     }
 }
 
@@ -79,7 +75,7 @@ TEST(BaseSourceFieldsTest, FieldOptionalTellsPresenceAndRefusesUnconvertible) {
         bool present = !c.present;
         if (c.code != kSuccess) present = c.present;
         String out("untouched");
-        EXPECT_EQ(BaseSource::fieldOptional(r, c.key, present, out).code(), c.code) << c.key;
+        EXPECT_CODE(BaseSource::fieldOptional(r, c.key, present, out), c.code) << c.key;
         EXPECT_EQ(present, c.present) << c.key;
         EXPECT_EQ(out, c.text) << c.key;
     }

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <functional>
 #include <map>
 #include <string>
@@ -25,7 +27,6 @@ public:
 
     Log log;
     std::map<std::string, uError> answers;
-    bool lastInteractive = false;
 
 protected:
     uError hook(std::string const& name) {
@@ -62,8 +63,7 @@ protected:
     uError postRemove(GUID const&) override { return hook("postRemove"); }
     uError retrieveData(GUID const&, Record&, bool) override { return hook("retrieveData"); }
     uError checkQuery(IQueryItems::StartQueryMessage const&, bool interactive) override {
-        lastInteractive = interactive;
-        return hook("checkQuery");
+        return hook(std::string("checkQuery(") + (interactive ? "true" : "false") + ")");
     }
     uError doStartQuery(IQueryItems::StartQueryMessage&, bool) override {
         return hook("doStartQuery");
@@ -80,7 +80,7 @@ class SourceSequenceTest : public testing::TestWithParam<SequenceCase> {};
 
 TEST_P(SourceSequenceTest, EntryPointRunsItsHooksInOrder) {
     RecordingSource source;
-    EXPECT_EQ(GetParam().call(source).code(), kSuccess);
+    EXPECT_CODE(GetParam().call(source), kSuccess);
     EXPECT_EQ(source.log, GetParam().expected);
 }
 
@@ -91,7 +91,7 @@ TEST_P(SourceSequenceTest, FirstFailingHookStopsTheSequenceAndIsReturned) {
         if (expected[failing].rfind("postMessageImpl", 0) == 0) continue;
         RecordingSource source;
         source.answers[expected[failing]] = TRELM_ERROR(kServiceError);
-        EXPECT_EQ(GetParam().call(source).code(), kServiceError) << expected[failing];
+        EXPECT_CODE(GetParam().call(source), kServiceError) << expected[failing];
         Log prefix(expected.begin(), expected.begin() + failing + 1);
         bool messageEntry = expected.front() == "preMessageImpl";
         if (messageEntry && failing > 0) {
@@ -102,77 +102,51 @@ TEST_P(SourceSequenceTest, FirstFailingHookStopsTheSequenceAndIsReturned) {
 }
 
 BaseSource::Record someRecord() {
-    BaseSource::Record r;
-    r.insert("core_object_type", 4);
-    return r;
+    return BaseSource::Record{{"core_object_type", 4}};
+}
+
+// A message-driven entry point: the message's own hooks between the pre- and post-message hooks.
+template <class Message>
+std::function<uError(RecordingSource&)> sending(std::function<void(Message&)> prepare = {}) {
+    return [prepare](RecordingSource& s) {
+        Message msg;
+        if (prepare) prepare(msg);
+        return s.onMessage(msg);
+    };
 }
 
 INSTANTIATE_TEST_SUITE_P(
     Table, SourceSequenceTest,
     testing::Values(
-        SequenceCase{"sendConfig",
-                     [](RecordingSource& s) { return s.sendConfig(Configuration::Group("g")); },
+        SequenceCase{"sendConfig", [](RecordingSource& s) { return s.sendConfig(Configuration::Group("g")); },
                      {"sendConfigImpl"}},
         SequenceCase{"startup", [](RecordingSource& s) { return s.startup(); }, {"startupImpl"}},
-        SequenceCase{"shutdown", [](RecordingSource& s) { return s.shutdown(); },
-                     {"shutdownImpl"}},
-        SequenceCase{"insert",
-                     [](RecordingSource& s) {
-                         auto r = someRecord();
-                         return s.insert(r);
-                     },
+        SequenceCase{"shutdown", [](RecordingSource& s) { return s.shutdown(); }, {"shutdownImpl"}},
+        SequenceCase{"insert", [](RecordingSource& s) { auto r = someRecord(); return s.insert(r); },
                      {"manageInputDataImpl(false)", "insertData", "postInsert"}},
-        SequenceCase{"update",
-                     [](RecordingSource& s) {
-                         auto r = someRecord();
-                         return s.update(r);
-                     },
+        SequenceCase{"update", [](RecordingSource& s) { auto r = someRecord(); return s.update(r); },
                      {"manageUpdateDataImpl(0)", "updateData", "postUpdate"}},
-        SequenceCase{"remove", [](RecordingSource& s) { return s.remove(GUID(), true); },
-                     {"removeData", "postRemove"}},
+        SequenceCase{"remove", [](RecordingSource& s) { return s.remove(GUID(), true); }, {"removeData", "postRemove"}},
         SequenceCase{"markInvisible", [](RecordingSource& s) { return s.markInvisible(GUID()); },
                      {"markDataInvisible", "postMarkInvisible"}},
-        SequenceCase{"retrieve",
-                     [](RecordingSource& s) {
-                         BaseSource::Record r;
-                         return s.retrieve(GUID(), r, false);
-                     },
+        SequenceCase{"retrieve", [](RecordingSource& s) { BaseSource::Record r; return s.retrieve(GUID(), r, false); },
                      {"retrieveData", "modifyRetrievedData"}},
         SequenceCase{"startQueryMessage",
-                     [](RecordingSource& s) {
-                         IQueryItems::StartQueryMessage msg;
-                         return s.onMessage(msg);
-                     },
-                     {"preMessageImpl", "checkQuery", "doStartQuery", "postMessageImpl(0)"}},
+                     sending<IQueryItems::StartQueryMessage>([](auto& m) { m.interactive = false; }),
+                     {"preMessageImpl", "checkQuery(false)", "doStartQuery", "postMessageImpl(0)"}},
+        SequenceCase{"interactiveStartQueryMessage",
+                     sending<IQueryItems::StartQueryMessage>([](auto& m) { m.interactive = true; }),
+                     {"preMessageImpl", "checkQuery(true)", "doStartQuery", "postMessageImpl(0)"}},
         SequenceCase{"configurationChangedMessage",
-                     [](RecordingSource& s) {
-                         ConfigurationChangedMessage msg(Set<String>{"a", "b"});
-                         return s.onMessage(msg);
-                     },
+                     sending<ConfigurationChangedMessage>([](auto& m) { m.keys = Set<String>{"a", "b"}; }),
                      {"preMessageImpl", "configurationChangedImpl(2)", "postMessageImpl(0)"}},
-        SequenceCase{"otherMessage",
-                     [](RecordingSource& s) {
-                         WipeMessage msg;
-                         return s.onMessage(msg);
-                     },
-                     {"preMessageImpl", "postMessageImpl(0)"}}),
+        SequenceCase{"otherMessage", sending<WipeMessage>(), {"preMessageImpl", "postMessageImpl(0)"}}),
     [](testing::TestParamInfo<SequenceCase> const& info) { return info.param.name; });
-
-TEST(BaseSourceTest, QueryMessageCarriesItsInteractiveFlagToTheHooks) {
-    RecordingSource source;
-    IQueryItems::StartQueryMessage msg;
-    msg.interactive = false;
-    ASSERT_TRUE(source.onMessage(msg).ok());
-    EXPECT_FALSE(source.lastInteractive);
-    msg.interactive = true;
-    ASSERT_TRUE(source.onMessage(msg).ok());
-    EXPECT_TRUE(source.lastInteractive);
-}
 
 TEST(BaseSourceTest, MessageWithAKnownNameButAnotherClassIsRefused) {
     RecordingSource source;
     IMessage impostor(ConfigurationChangedMessage::kType);
-    EXPECT_EQ(source.onMessage(impostor).code(), kInvalid);
+    EXPECT_CODE(source.onMessage(impostor), kInvalid);
     EXPECT_EQ(source.log, (Log{"preMessageImpl", "postMessageImpl(2147483652)"}));
 }
 
@@ -180,34 +154,34 @@ TEST(BaseSourceTest, DefaultsRefuseDataOperationsAndQueries) {
     BaseSource plain("plain", "@test:/plain");
     BaseSource::Record record;
     GUID guid = GUID::generate();
-    EXPECT_EQ(plain.insert(record).code(), kDataOpNotSupported);
-    EXPECT_EQ(plain.update(record).code(), kDataOpNotSupported);
-    EXPECT_EQ(plain.remove(guid, false).code(), kDataOpNotSupported);
-    EXPECT_EQ(plain.markInvisible(guid).code(), kDataOpNotSupported);
-    EXPECT_EQ(plain.retrieve(guid, record, false).code(), kDataOpNotSupported);
+    EXPECT_CODE(plain.insert(record), kDataOpNotSupported);
+    EXPECT_CODE(plain.update(record), kDataOpNotSupported);
+    EXPECT_CODE(plain.remove(guid, false), kDataOpNotSupported);
+    EXPECT_CODE(plain.markInvisible(guid), kDataOpNotSupported);
+    EXPECT_CODE(plain.retrieve(guid, record, false), kDataOpNotSupported);
     IQueryItems::StartQueryMessage query;
-    EXPECT_EQ(plain.onMessage(query).code(), kNotSupported);
+    EXPECT_CODE(plain.onMessage(query), kNotSupported);
     EXPECT_FALSE(query.cursor);
     ConfigurationChangedMessage changed;
-    EXPECT_EQ(plain.onMessage(changed).code(), kSuccess);
+    EXPECT_CODE(plain.onMessage(changed), kSuccess);
 }
 
 TEST(ComponentTest, StateFollowsTheEntryPointsThatSucceeded) {
     RecordingSource source;
     EXPECT_EQ(source.state(), Component::State::Created);
     source.answers["sendConfigImpl"] = TRELM_ERROR(kInvalid);
-    source.sendConfig(Configuration::Group("g"));
+    EXPECT_CODE(source.sendConfig(Configuration::Group("g")), kInvalid);
     EXPECT_EQ(source.state(), Component::State::Created);
     source.answers.clear();
-    source.sendConfig(Configuration::Group("g"));
+    EXPECT_OK(source.sendConfig(Configuration::Group("g")));
     EXPECT_EQ(source.state(), Component::State::Configured);
-    source.startup();
+    EXPECT_OK(source.startup());
     EXPECT_EQ(source.state(), Component::State::Started);
-    source.sendConfig(Configuration::Group("g"));
+    EXPECT_OK(source.sendConfig(Configuration::Group("g")));
     EXPECT_EQ(source.state(), Component::State::Started);
-    source.stop();
+    EXPECT_OK(source.stop());
     EXPECT_EQ(source.state(), Component::State::Stopped);
-    source.shutdown();
+    EXPECT_OK(source.shutdown());
     EXPECT_EQ(source.state(), Component::State::ShutDown);
     EXPECT_EQ(source.name(), "source");
     EXPECT_EQ(source.componentId(), "@test:/source");
@@ -241,11 +215,9 @@ protected:
 
 TEST(BaseConnectorTest, WakeupMessageReachesWakeupImplBetweenTheMessageHooks) {
     RecordingConnector connector;
-    Map<String, String> params;
-    params.insert("source", "");
-    WakeupMessage msg(params);
-    EXPECT_EQ(connector.onMessage(msg).code(), kNoData);
-    EXPECT_EQ(connector.walk().code(), kSuccess);
+    WakeupMessage msg(Map<String, String>{{"source", ""}});
+    EXPECT_CODE(connector.onMessage(msg), kNoData);
+    EXPECT_CODE(connector.walk(), kSuccess);
     EXPECT_EQ(connector.log, (Log{"preMessageImpl", "wakeupImpl", "postMessageImpl(1)", "walkImpl"}));
     EXPECT_EQ(connector.wakeupAccount, "source");
 }
@@ -269,9 +241,9 @@ TEST(BaseConnectorTest, ConnectorOperationsAreNotSupportedByDefault) {
                               plain.getPhotoAlbums(ids),
                               plain.publishPhoto("file:///a.jpg", ""),
                               plain.publishPhotoTo("1", "file:///a.jpg", "")};
-    for (uError const& e : results) EXPECT_EQ(e.code(), kNotSupported) << e;
+    for (uError const& e : results) EXPECT_CODE(e, kNotSupported);
     WakeupMessage wakeup;
-    EXPECT_EQ(plain.onMessage(wakeup).code(), kSuccess);
+    EXPECT_CODE(plain.onMessage(wakeup), kSuccess);
 }
 
 }  // namespace

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <atomic>
 #include <string>
 #include <thread>
@@ -32,7 +34,7 @@ TEST(FrameworkConcurrencyTest, MessagesFlowWhileComponentsComeAndGo) {
     ComponentRegistry registry;
     registry.activate();
     Counter stable("stable");
-    ASSERT_TRUE(registry.add("stable", &stable).ok());
+    ASSERT_OK(registry.add("stable", &stable));
     // The churning components stay alive for the whole test: only their registration changes.
     std::vector<std::unique_ptr<Counter>> churn;
     for (int i = 0; i < kThreads; ++i) {
@@ -82,7 +84,7 @@ TEST(FrameworkConcurrencyTest, ConcurrentRegistrationKeepsOneTypePerName) {
     for (auto& th : threads) th.join();
     for (int i = 0; i < kNames; ++i) {
         TRELM_TYPES::TYPES stored = TRELM_TYPES::NONE;
-        ASSERT_TRUE(Metadata::getType(String("concurrency_key_") + String::from(i), stored).ok());
+        ASSERT_OK(Metadata::getType(String("concurrency_key_") + String::from(i), stored));
         for (int t = 0; t < kThreads; ++t) EXPECT_EQ(seen[t][i], stored) << i;
     }
 }

@@ -13,8 +13,7 @@ public:
 protected:
     trelm::uError handleMessage(trelm::IMessage& msg) override {
         if (auto* wakeup = dynamic_cast<trelm::WakeupMessage*>(&msg)) {
-            wakeup->params.insert("answered_by", name());
-            return TRELM_OK();
+            return wakeup->params.insert("answered_by", name());
         }
         return BaseSource::handleMessage(msg);
     }

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <string>
 #include <vector>
 
@@ -39,30 +41,30 @@ protected:
 
 TEST_F(MessagingTest, TargetedMessageReachesOnlyThatComponentAndReturnsItsResult) {
     Recorder a("a", log_), b("b", log_, TRELM_ERROR(kNotSignedIn));
-    ASSERT_TRUE(registry_.add("a", &a).ok());
-    ASSERT_TRUE(registry_.add("b", &b).ok());
+    ASSERT_OK(registry_.add("a", &a));
+    ASSERT_OK(registry_.add("b", &b));
     WipeMessage msg;
-    EXPECT_EQ(msg.send("b").code(), kNotSignedIn);
+    EXPECT_CODE(msg.send("b"), kNotSignedIn);
     EXPECT_EQ(log_, (std::vector<std::string>{"b:WipeMessage"}));
 }
 
 TEST_F(MessagingTest, UnknownTargetOrNoActiveRegistryIsNotFound) {
     Recorder a("a", log_);
-    registry_.add("a", &a);
+    ASSERT_OK(registry_.add("a", &a));
     WipeMessage msg;
-    EXPECT_EQ(msg.send("RuntimeConfiguration").code(), kNotFound);
+    EXPECT_CODE(msg.send("RuntimeConfiguration"), kNotFound);
     registry_.deactivate();
-    EXPECT_EQ(msg.send("a").code(), kNotFound);
-    EXPECT_EQ(msg.send("").code(), kNotFound);
+    EXPECT_CODE(msg.send("a"), kNotFound);
+    EXPECT_CODE(msg.send(""), kNotFound);
     EXPECT_TRUE(log_.empty());
 }
 
 TEST_F(MessagingTest, BroadcastReachesEveryoneInOrderAndReturnsTheFirstFailure) {
     Recorder a("a", log_), b("b", log_, TRELM_ERROR(kInvalid)), c("c", log_),
         d("d", log_, TRELM_ERROR(kFailure));
-    for (Recorder* r : {&c, &a, &b, &d}) ASSERT_TRUE(registry_.add(r->name(), r).ok());
+    for (Recorder* r : {&c, &a, &b, &d}) ASSERT_OK(registry_.add(r->name(), r));
     WipeMessage msg;
-    EXPECT_EQ(msg.send("").code(), kInvalid);
+    EXPECT_CODE(msg.send(""), kInvalid);
     EXPECT_EQ(log_, (std::vector<std::string>{"c:WipeMessage", "a:WipeMessage", "b:WipeMessage",
                                               "d:WipeMessage"}));
 }
@@ -81,12 +83,10 @@ TEST_F(MessagingTest, ReceiverAnswersThroughTheCallersMap) {
             return TRELM_OK();
         }
     } store;
-    registry_.add(store.name(), &store);
-    Map<String, Variant> values;
-    values.insert("facebook_source_lastuser", Variant());
-    values.insert("other", Variant());
+    ASSERT_OK(registry_.add(store.name(), &store));
+    Map<String, Variant> values{{"facebook_source_lastuser", Variant()}, {"other", Variant()}};
     GetRuntimeConfigurationMessage msg("source", values);
-    ASSERT_EQ(msg.send("RuntimeConfiguration").code(), kSuccess);
+    ASSERT_OK(msg.send("RuntimeConfiguration"));
     EXPECT_EQ(*values.search("facebook_source_lastuser"), Variant("1234"));
     EXPECT_TRUE(values.search("other")->empty());
 }
@@ -107,10 +107,9 @@ protected:
     uError handleMessage(IMessage& msg) override {
         log_.push_back(name().str() + ":" + msg.type().str());
         if (msg.type() != "WipeMessage") return TRELM_OK();
-        registry_.add(late_->name(), late_);
+        TRELM_RETURN_IF_ERROR(registry_.add(late_->name(), late_));
         IMessage inner("Inner");
-        uError e = inner.send(next_);
-        if (e.failed()) return e;
+        TRELM_RETURN_IF_ERROR(inner.send(next_));
         IMessage everyone("Everyone");
         return everyone.send("");
     }
@@ -126,10 +125,10 @@ TEST_F(MessagingTest, HandlerMaySendAndRegisterReentrantly) {
     Recorder late("late", log_);
     Recorder b("b", log_);
     Forwarder a("a", "b", log_, registry_, &late);
-    registry_.add("a", &a);
-    registry_.add("b", &b);
+    ASSERT_OK(registry_.add("a", &a));
+    ASSERT_OK(registry_.add("b", &b));
     WipeMessage msg;
-    ASSERT_EQ(msg.send("a").code(), kSuccess);
+    ASSERT_OK(msg.send("a"));
     EXPECT_EQ(log_, (std::vector<std::string>{"a:WipeMessage", "b:Inner", "a:Everyone",
                                               "b:Everyone", "late:Everyone"}));
 }
@@ -138,17 +137,17 @@ TEST(ComponentRegistryTest, NamesAreUniqueAndKeptInRegistrationOrder) {
     std::vector<std::string> log;
     Recorder a("a", log), b("b", log);
     ComponentRegistry registry;
-    EXPECT_EQ(registry.add("z", &a).code(), kSuccess);
-    EXPECT_EQ(registry.add("y", &b).code(), kSuccess);
-    EXPECT_EQ(registry.add("z", &b).code(), kInvalid);
-    EXPECT_EQ(registry.add("", &b).code(), kInvalid);
-    EXPECT_EQ(registry.add("x", nullptr).code(), kInvalid);
+    EXPECT_OK(registry.add("z", &a));
+    EXPECT_OK(registry.add("y", &b));
+    EXPECT_CODE(registry.add("z", &b), kInvalid);
+    EXPECT_CODE(registry.add("", &b), kInvalid);
+    EXPECT_CODE(registry.add("x", nullptr), kInvalid);
     EXPECT_EQ(registry.names(), (Vector<String>{"z", "y"}));
     EXPECT_EQ(registry.find("z"), &a);
-    EXPECT_EQ(registry.remove("z").code(), kSuccess);
-    EXPECT_EQ(registry.remove("z").code(), kNotFound);
+    EXPECT_OK(registry.remove("z"));
+    EXPECT_CODE(registry.remove("z"), kNotFound);
     EXPECT_EQ(registry.find("z"), nullptr);
-    EXPECT_EQ(registry.add("z", &a).code(), kSuccess);
+    EXPECT_OK(registry.add("z", &a));
     EXPECT_EQ(registry.names(), (Vector<String>{"y", "z"}));
 }
 

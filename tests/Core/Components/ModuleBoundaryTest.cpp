@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <memory>
 
 #include "BaseSource.h"
@@ -34,16 +36,16 @@ TEST(ModuleBoundaryTest, MessagesAreRecognisedAcrossAHiddenVisibilityModule) {
     registry.activate();
     std::unique_ptr<Component> module(hiddenModuleComponent("module"));
     SidAnswerer host;
-    registry.add("module", module.get());
-    registry.add("host", &host);
+    ASSERT_OK(registry.add("module", module.get()));
+    ASSERT_OK(registry.add("host", &host));
 
     WakeupMessage wakeup;
-    ASSERT_EQ(wakeup.send("module").code(), kSuccess);
+    ASSERT_OK(wakeup.send("module"));
     ASSERT_NE(wakeup.params.search("answered_by"), nullptr);
     EXPECT_EQ(*wakeup.params.search("answered_by"), "module");
 
     ConfigurationChangedMessage changed(Set<String>{"module_key"});
-    EXPECT_EQ(changed.send("module").code(), kSuccess);
+    EXPECT_OK(changed.send("module"));
 
     String sid;
     EXPECT_EQ(hiddenModuleAskUserSid("host", &sid), kSuccess);

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <algorithm>
 #include <string>
 #include <vector>
@@ -18,7 +20,7 @@ Column col(char const* name, bool ascending) {
 
 Record rec(std::initializer_list<std::pair<char const*, Variant>> fields) {
     Record r;
-    for (auto const& f : fields) r.insert(f.first, f.second);
+    for (auto const& f : fields) EXPECT_OK(r.insert(f.first, f.second));
     return r;
 }
 

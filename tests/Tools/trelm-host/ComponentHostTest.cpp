@@ -3,6 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "ComponentHost.h"
 #include "GetRuntimeConfigurationMessage.h"
 #include "trelm/Set.h"
@@ -57,15 +59,14 @@ protected:
         RecordingComponent::startupCode = trelm::kSuccess;
         RecordingComponent::shutdownQuery = TRELM_ERROR(trelm::kFailure);
         RecordingComponent::storeStateAtShutdown = Component::State::Created;
-        ASSERT_TRUE(table_.insert("@test:/recording", &RecordingComponent::make).ok());
-        ASSERT_EQ(host_.startBuiltins({}, {{"path", Variant(":memory:")}}, "unused").code(),
-                  trelm::kSuccess);
+        ASSERT_OK(table_.insert("@test:/recording", &RecordingComponent::make));
+        ASSERT_OK(host_.startBuiltins({}, {{"path", Variant(":memory:")}}, "unused"));
     }
 
     void store(String const& tag, String const& key, String const& value) {
         trelm::Set<trelm::Configuration::Value> values;
-        ASSERT_TRUE(values.insert(trelm::Configuration::Value(key, Variant(value))).ok());
-        ASSERT_EQ(host_.runtimeConfiguration().store(tag, values).code(), trelm::kSuccess);
+        ASSERT_OK(values.insert(trelm::Configuration::Value(key, Variant(value))));
+        ASSERT_OK(host_.runtimeConfiguration().store(tag, values));
     }
 
     static HostConfig::ComponentEntry entry(String name, String id = "@test:/recording") {
@@ -89,13 +90,13 @@ TEST_F(ComponentHostTest, StoredValuesOfTheComponentsKeysOverrideTheFile) {
     store("other", "password", "other-component");
 
     auto e = entry("rec");
-    ASSERT_TRUE(e.config.insert("login", Variant("file-login")).ok());
-    ASSERT_TRUE(e.config.insert("password", Variant("file-password")).ok());
-    ASSERT_TRUE(e.config.insert("polltime", Variant(300)).ok());
+    ASSERT_OK(e.config.insert("login", Variant("file-login")));
+    ASSERT_OK(e.config.insert("password", Variant("file-password")));
+    ASSERT_OK(e.config.insert("polltime", Variant(300)));
     e.runtimeKeys = Vector<String>{"session"};
 
     ComponentHost::Instance made = host_.addComponent(e, table_);
-    ASSERT_EQ(made.error.code(), trelm::kSuccess) << made.error;
+    ASSERT_OK(made.error) << made.error;
     ASSERT_NE(made.component, nullptr);
     EXPECT_EQ(made.component->state(), Component::State::Started);
     EXPECT_EQ(made.restored, (Vector<String>{"login", "session"}));
@@ -127,7 +128,7 @@ TEST_P(ComponentHostFailureTest, IsRecordedWithTheCauseAndTheStateReached) {
     FailureCase const& c = GetParam();
     RecordingComponent::startupCode = c.startupCode;
     ComponentHost::Instance made = host_.addComponent(entry(c.componentName, c.id), table_);
-    EXPECT_EQ(made.error.code(), c.code) << made.error;
+    EXPECT_CODE(made.error, c.code) << made.error;
     if (c.causeCode == 0) {
         EXPECT_EQ(made.error.cause(), nullptr);
     } else {
@@ -139,7 +140,7 @@ TEST_P(ComponentHostFailureTest, IsRecordedWithTheCauseAndTheStateReached) {
         EXPECT_EQ(made.component->state(), c.state);
     }
     ASSERT_EQ(host_.instances().size(), 1u);
-    EXPECT_EQ(host_.instances()[0].error.code(), c.code);
+    EXPECT_CODE(host_.instances()[0].error, c.code);
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -156,9 +157,9 @@ INSTANTIATE_TEST_SUITE_P(
 
 // Components may still talk to the built-ins while they shut down.
 TEST_F(ComponentHostTest, ComponentsShutDownBeforeTheBuiltinsGo) {
-    ASSERT_EQ(host_.addComponent(entry("rec"), table_).error.code(), trelm::kSuccess);
+    ASSERT_OK(host_.addComponent(entry("rec"), table_).error);
     host_.shutdownAll();
-    EXPECT_EQ(RecordingComponent::shutdownQuery.code(), trelm::kSuccess)
+    EXPECT_OK(RecordingComponent::shutdownQuery)
         << RecordingComponent::shutdownQuery;
     EXPECT_EQ(RecordingComponent::storeStateAtShutdown, Component::State::Started);
     EXPECT_EQ(host_.instances()[0].component->state(), Component::State::ShutDown);

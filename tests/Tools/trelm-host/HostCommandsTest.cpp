@@ -76,14 +76,6 @@ protected:
         return result;
     }
 
-    static std::vector<json> linesOfType(ProgramRunner::Result const& result, std::string const& type) {
-        std::vector<json> lines;
-        for (std::string const& line : result.outLines()) {
-            json object = json::parse(line);
-            if (object.at("type") == type) lines.push_back(object);
-        }
-        return lines;
-    }
 
     // What the service holds, read as the demo user; nested columns become "parent.child".
     std::vector<Row> fql(std::string const& query) {

@@ -3,6 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "HostConfig.h"
 
 using trelm::String;
@@ -23,30 +25,16 @@ TEST(HostConfigTest, ValuesKeepTheirKindAndComponentsTheirOrder) {
              "list": ["p", "q"], "none": []}},
           {"name": "a", "id": "@x:/a", "runtime_keys": ["k"]}]})",
                                       "test", config);
-    ASSERT_EQ(e.code(), trelm::kSuccess) << e;
+    ASSERT_OK(e);
 
     ASSERT_EQ(config.components().size(), 2u);
     auto const& b = config.components()[0];
     EXPECT_EQ(b.name, "b");
     EXPECT_EQ(b.id, "@x:/b");
-    struct Expected {
-        char const* key;
-        Variant value;
-    };
-    Expected const values[] = {
-        {"text", Variant("t")},
-        {"flag", Variant(false)},
-        {"small", Variant(-7)},
-        {"big", Variant(5000000000LL)},
-        {"list", Variant(Vector<String>{"p", "q"})},
-        {"none", Variant(Vector<String>{})},
-    };
-    EXPECT_EQ(b.config.size(), std::size(values));
-    for (Expected const& v : values) {
-        Variant const* found = b.config.search(v.key);
-        ASSERT_NE(found, nullptr) << v.key;
-        EXPECT_EQ(*found, v.value) << v.key;
-    }
+    EXPECT_EQ(b.config, (trelm::Map<String, Variant>{{"text", Variant("t")}, {"flag", Variant(false)},
+                                                     {"small", Variant(-7)}, {"big", Variant(5000000000LL)},
+                                                     {"list", Variant(Vector<String>{"p", "q"})},
+                                                     {"none", Variant(Vector<String>{})}}));
     EXPECT_EQ(b.runtimeKeys, HostConfig::defaultRuntimeKeys());
     EXPECT_EQ(config.components()[1].runtimeKeys, (Vector<String>{"k"}));
     EXPECT_TRUE(config.namesEndpoint());
@@ -55,7 +43,7 @@ TEST(HostConfigTest, ValuesKeepTheirKindAndComponentsTheirOrder) {
 
 TEST(HostConfigTest, EmptyDocumentNamesNoEndpointAndNoComponents) {
     HostConfig config;
-    ASSERT_EQ(HostConfig::parse("{}", "test", config).code(), trelm::kSuccess);
+    ASSERT_OK(HostConfig::parse("{}", "test", config));
     EXPECT_FALSE(config.namesEndpoint());
     EXPECT_TRUE(config.components().empty());
 }
@@ -73,11 +61,9 @@ class HostConfigRejectTest : public ::testing::TestWithParam<BadConfig> {};
 // Every mistake is refused with kInvalid and the place, and the output is left alone.
 TEST_P(HostConfigRejectTest, IsRefusedWithThePlace) {
     HostConfig config;
-    ASSERT_EQ(HostConfig::parse(R"({"components": [{"name": "keep", "id": "@x:/k"}]})", "t", config)
-                  .code(),
-              trelm::kSuccess);
+    ASSERT_OK(HostConfig::parse(R"({"components": [{"name": "keep", "id": "@x:/k"}]})", "t", config));
     trelm::uError e = HostConfig::parse(GetParam().text, "file.json", config);
-    EXPECT_EQ(e.code(), trelm::kInvalid);
+    EXPECT_CODE(e, trelm::kInvalid);
     std::string message = e.message().str();
     EXPECT_NE(message.find("file.json: "), std::string::npos) << message;
     EXPECT_NE(message.find(GetParam().place), std::string::npos) << message;
@@ -119,7 +105,7 @@ INSTANTIATE_TEST_SUITE_P(
 TEST(HostConfigTest, UnreadableFileIsNotFound) {
     HostConfig config;
     trelm::uError e = HostConfig::load("/nonexistent/config.json", config);
-    EXPECT_EQ(e.code(), trelm::kNotFound);
+    EXPECT_CODE(e, trelm::kNotFound);
     EXPECT_NE(e.message().str().find("/nonexistent/config.json"), std::string::npos);
 }
 

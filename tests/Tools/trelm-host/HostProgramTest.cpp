@@ -42,15 +42,6 @@ protected:
     }
     std::string stateDir() const { return runner_.folder() + "/state"; }
 
-    // The output's lines of one type, parsed.
-    static std::vector<json> linesOfType(ProgramRunner::Result const& result, std::string const& type) {
-        std::vector<json> lines;
-        for (std::string const& line : result.outLines()) {
-            json object = json::parse(line);
-            if (object.at("type") == type) lines.push_back(object);
-        }
-        return lines;
-    }
 
     ProgramRunner runner_;
 };

@@ -5,6 +5,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "ItemQuery.h"
 #include "trelm/GUID.h"
 
@@ -41,9 +43,9 @@ class ConditionTest : public ::testing::TestWithParam<ConditionCase> {};
 TEST_P(ConditionTest, BecomesAConstraintOfTheKeysType) {
     ConditionCase const& c = GetParam();
     ItemQuery query = contacts();
-    ASSERT_EQ(query.where(c.text).code(), trelm::kSuccess);
+    ASSERT_CODE(query.where(c.text), trelm::kSuccess);
     trelm::IQueryItems::StartQueryMessage msg;
-    ASSERT_EQ(query.fill(msg).code(), trelm::kSuccess);
+    ASSERT_CODE(query.fill(msg), trelm::kSuccess);
     ASSERT_EQ(msg.constraints.size(), 2u);
     EXPECT_EQ(msg.constraints[0].key.name(), "core_object_type");
     EXPECT_EQ(msg.constraints[0].value, Variant(2));
@@ -60,27 +62,26 @@ GUID const kGuid = [] {
     return g;
 }();
 
+using C = ConditionCase;
+using F = Constraint::Function;
+
 INSTANTIATE_TEST_SUITE_P(
     Conditions, ConditionTest,
     ::testing::Values(
-        ConditionCase{"TextEqual", "core_contact_name=Anna Moreau", "core_contact_name", Types::STRING,
-                      Constraint::Equal, Variant("Anna Moreau")},
-        ConditionCase{"TimeAtLeast", "core_object_time>=1000", "core_object_time", Types::INT32,
-                      Constraint::GreaterOrEqual, Variant(1000)},
-        ConditionCase{"TimeBelowNegative", "core_object_time<-5", "core_object_time", Types::INT32,
-                      Constraint::LessThan, Variant(-5)},
-        ConditionCase{"NotEqual", "core_contact_service!=Facebook", "core_contact_service", Types::STRING,
-                      Constraint::NotEqual, Variant("Facebook")},
-        ConditionCase{"IdList", "core_contact_service_id=12,34", "core_contact_service_id", Types::STRING,
-                      Constraint::InList, Variant(Vector<String>{"12", "34"})},
-        ConditionCase{"TypeList", "core_object_type=2,11", "core_object_type", Types::INT32,
-                      Constraint::InList, Variant(Vector<int>{2, 11})},
-        ConditionCase{"Guid", "core_object_id=0F1E2D3C-4B5A-4978-8695-A4B3C2D1E0F9", "core_object_id",
-                      Types::GUID_TYPE, Constraint::Equal, Variant(kGuid)},
-        ConditionCase{"UnregisteredKeyIsText", "no_such_key<=7", "no_such_key", Types::STRING,
-                      Constraint::LessOrEqual, Variant("7")},
-        ConditionCase{"EqualSignInTheValue", "core_event_text=a=b", "core_event_text", Types::STRING,
-                      Constraint::Equal, Variant("a=b")}),
+        C{"TextEqual", "core_contact_name=Anna Moreau", "core_contact_name", Types::STRING, F::Equal,
+          Variant("Anna Moreau")},
+        C{"TimeAtLeast", "core_object_time>=1000", "core_object_time", Types::INT32, F::GreaterOrEqual, Variant(1000)},
+        C{"TimeBelowNegative", "core_object_time<-5", "core_object_time", Types::INT32, F::LessThan, Variant(-5)},
+        C{"NotEqual", "core_contact_service!=Facebook", "core_contact_service", Types::STRING, F::NotEqual,
+          Variant("Facebook")},
+        C{"IdList", "core_contact_service_id=12,34", "core_contact_service_id", Types::STRING, F::InList,
+          Variant(Vector<String>{"12", "34"})},
+        C{"TypeList", "core_object_type=2,11", "core_object_type", Types::INT32, F::InList,
+          Variant(Vector<int>{2, 11})},
+        C{"Guid", "core_object_id=0F1E2D3C-4B5A-4978-8695-A4B3C2D1E0F9", "core_object_id", Types::GUID_TYPE, F::Equal,
+          Variant(kGuid)},
+        C{"UnregisteredKeyIsText", "no_such_key<=7", "no_such_key", Types::STRING, F::LessOrEqual, Variant("7")},
+        C{"EqualSignInTheValue", "core_event_text=a=b", "core_event_text", Types::STRING, F::Equal, Variant("a=b")}),
     [](auto const& info) { return std::string(info.param.name); });
 
 TEST(ConditionRejectTest, MalformedConditionsAreInvalidAndAddNothing) {
@@ -98,11 +99,11 @@ TEST(ConditionRejectTest, MalformedConditionsAreInvalidAndAddNothing) {
     for (Bad const& c : cases) {
         ItemQuery query = contacts();
         uError e = query.where(c.text);
-        EXPECT_EQ(e.code(), trelm::kInvalid) << c.text;
+        EXPECT_CODE(e, trelm::kInvalid) << c.text;
         EXPECT_NE(e.toText().find(c.reason), std::string::npos) << c.text << ": " << e;
         EXPECT_NE(e.toText().find(c.text), std::string::npos) << e;
         trelm::IQueryItems::StartQueryMessage msg;
-        ASSERT_EQ(query.fill(msg).code(), trelm::kSuccess);
+        ASSERT_CODE(query.fill(msg), trelm::kSuccess);
         EXPECT_EQ(msg.constraints.size(), 1u) << c.text;
     }
 }
@@ -132,7 +133,7 @@ TEST(ItemQueryTest, EachKindAsksForTheOrderingItsCursorServes) {
         ItemQuery::Kind const* kind = ItemQuery::findKind(k.kind);
         ASSERT_NE(kind, nullptr) << k.kind;
         trelm::IQueryItems::StartQueryMessage msg;
-        ASSERT_EQ(ItemQuery(*kind).fill(msg).code(), trelm::kSuccess);
+        ASSERT_CODE(ItemQuery(*kind).fill(msg), trelm::kSuccess);
         EXPECT_EQ(msg.columns, k.ordering) << k.kind;
         ASSERT_EQ(msg.constraints.size(), 1u);
         EXPECT_EQ(msg.constraints[0].function, Constraint::Equal);
@@ -202,7 +203,7 @@ TEST_P(WalkTest, ListsTheRowsBetweenSkipAndLimit) {
     query.limit = c.limit;
     StepCursor cursor(c.rows, c.failAt);
     std::vector<ItemQuery::Record> rows;
-    EXPECT_EQ(query.walk(cursor, rows).code(), c.code);
+    EXPECT_CODE(query.walk(cursor, rows), c.code);
     std::vector<int> listed;
     for (auto const& row : rows) listed.push_back(row.search("n")->asInt32());
     EXPECT_EQ(listed, c.listed);

@@ -108,3 +108,12 @@ ProgramRunner::Result ProgramRunner::run(std::string const& program,
     result.err = readAll(errPath);
     return result;
 }
+
+std::vector<nlohmann::json> linesOfType(ProgramRunner::Result const& result, std::string const& type) {
+    std::vector<nlohmann::json> lines;
+    for (std::string const& line : result.outLines()) {
+        nlohmann::json object = nlohmann::json::parse(line);
+        if (object.at("type") == type) lines.push_back(object);
+    }
+    return lines;
+}

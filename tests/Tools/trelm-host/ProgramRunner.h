@@ -3,6 +3,8 @@
 #include <string>
 #include <vector>
 
+#include <nlohmann/json.hpp>
+
 // Runs a program as a user would, in a scratch folder of its own that is removed afterwards.
 // HOME points into the scratch folder, so nothing touches the real home.
 class ProgramRunner {
@@ -32,3 +34,6 @@ public:
 private:
     std::string folder_;
 };
+
+// The lines of a run with "--format json" whose "type" is `type`, parsed, in output order.
+std::vector<nlohmann::json> linesOfType(ProgramRunner::Result const& result, std::string const& type);

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <ostream>
 #include <string>
 #include <vector>
@@ -55,7 +57,7 @@ TEST(XMLParserTest, PathIncludesElementAtStartAndExcludesItAtEnd) {
         R"(<?xml version="1.0"?><error_response xmlns="http://api.facebook.com/1.0/" )"
         R"(xmlns:xsi="http://www.w3.org/2001/XMLSchema-instance"><code>102</code>)"
         R"(<x xsi:nil="true"/></error_response>)"));
-    ASSERT_EQ(e.code(), kSuccess) << e;
+    ASSERT_OK(e);
     std::vector<std::string> want = {
         "start error_response @.error_response xmlns=http://api.facebook.com/1.0/ "
         "xmlns:xsi=http://www.w3.org/2001/XMLSchema-instance",
@@ -83,7 +85,7 @@ TEST_P(XMLParserStopTest, FailingCallbackStopsParseWithItsOwnError) {
     RecordingParser p;
     p.failOn = GetParam().failOn;
     uError e = p.runParser(String("<r><a>one</a><b>two</b><c/></r>"));
-    EXPECT_EQ(e.code(), kNotSupported) << e;
+    EXPECT_CODE(e, kNotSupported);
     EXPECT_EQ(p.events, GetParam().events);
 }
 
@@ -100,17 +102,17 @@ INSTANTIATE_TEST_SUITE_P(
 TEST(XMLParserTest, RunAfterAbortedRunStartsWithEmptyPath) {
     RecordingParser p;
     p.failOn = "start:deep";
-    EXPECT_EQ(p.runParser(String("<r><s><deep/></s></r>")).code(), kNotSupported);
+    EXPECT_CODE(p.runParser(String("<r><s><deep/></s></r>")), kNotSupported);
     p.failOn.clear();
     p.events.clear();
-    ASSERT_EQ(p.runParser(String("<other/>")).code(), kSuccess);
+    ASSERT_OK(p.runParser(String("<other/>")));
     EXPECT_EQ(p.events, (std::vector<std::string>{"start other @.other", "end other @"}));
 }
 
 TEST(XMLParserTest, MalformedDocumentReportsFailureWithExpatPosition) {
     RecordingParser p;
     uError e = p.runParser(String("<a>\n<b></a>"));
-    EXPECT_EQ(e.code(), kFailure);
+    EXPECT_CODE(e, kFailure);
     EXPECT_NE(e.message().str().find("line 2"), std::string::npos) << e;
     EXPECT_NE(e.message().str().find("mismatched tag"), std::string::npos) << e;
 }

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "ComponentRegistry.h"
 #include "HttpObjectRequestMessage.h"
 
@@ -11,13 +13,13 @@ namespace {
 TEST(HttpRequestFactoryTest, RequestMessageIsAnsweredWithANewRequest) {
     HttpRequestFactory factory;
     ComponentRegistry registry;
-    ASSERT_EQ(registry.add(factory.name(), &factory).code(), kSuccess);
+    ASSERT_OK(registry.add(factory.name(), &factory));
     registry.activate();
 
     IHttpRequestFactory::HttpObjectRequestMessage first;
     IHttpRequestFactory::HttpObjectRequestMessage second;
-    ASSERT_EQ(first.send("HttpRequestFactory").code(), kSuccess);
-    ASSERT_EQ(second.send("HttpRequestFactory").code(), kSuccess);
+    ASSERT_OK(first.send("HttpRequestFactory"));
+    ASSERT_OK(second.send("HttpRequestFactory"));
     ASSERT_TRUE(first.request);
     ASSERT_TRUE(second.request);
     EXPECT_NE(first.request.get(), second.request.get());
@@ -31,7 +33,7 @@ TEST(HttpRequestFactoryTest, ConfigurationSetsEveryKey) {
                                 {"timeout_ms", Variant("1500")},
                                 {"ca_file", Variant("/etc/ca.pem")},
                                 {"connect_to", Variant("api.facebook.com:80:127.0.0.1:8080")}});
-    ASSERT_EQ(factory.sendConfig(group).code(), kSuccess);
+    ASSERT_OK(factory.sendConfig(group));
     HttpRequest::Settings s = factory.settings();
     EXPECT_EQ(s.connectTimeoutMs, 250);
     EXPECT_EQ(s.timeoutMs, 1500);
@@ -54,8 +56,8 @@ TEST(HttpRequestFactoryTest, BadValueFailsConfigurationAndChangesNothing) {
         HttpRequestFactory factory;
         // A valid key next to the bad one must not be applied either.
         Configuration::Group group("HttpRequestFactory", {{"ca_file", Variant("/x.pem")}});
-        ASSERT_EQ(group.set(c.key, c.value).code(), kSuccess);
-        EXPECT_EQ(factory.sendConfig(group).code(), kInvalid) << c.key << " " << c.value;
+        ASSERT_OK(group.set(c.key, c.value));
+        EXPECT_CODE(factory.sendConfig(group), kInvalid) << c.key << " " << c.value;
         EXPECT_EQ(factory.settings().caFile, "") << c.key;
         EXPECT_EQ(factory.settings().timeoutMs, 60000) << c.key;
     }

@@ -1,6 +1,8 @@
 #include "RuntimeConfiguration.h"
 
 #include <gtest/gtest.h>
+
+#include "ErrorAssertions.h"
 #include <sys/stat.h>
 
 #include <fstream>
@@ -22,13 +24,13 @@ using test::TempDir;
 class RuntimeConfigurationTest : public ::testing::Test {
 protected:
     void SetUp() override {
-        ASSERT_EQ(registry_.add("RuntimeConfiguration", &store_).code(), kSuccess);
+        ASSERT_OK(registry_.add("RuntimeConfiguration", &store_));
         registry_.activate();
     }
 
     uError put(String const& tag, std::initializer_list<std::pair<char const*, Variant>> values) {
         Set<Configuration::Value> set;
-        for (auto const& [k, v] : values) set.insert(Configuration::Value(k, v));
+        for (auto const& [k, v] : values) EXPECT_OK(set.insert(Configuration::Value(k, v)));
         RuntimeConfigurationMessage msg(tag, set);
         return msg.send("RuntimeConfiguration");
     }
@@ -39,10 +41,10 @@ protected:
     // The values under tag for keys; "-" marks a key that stayed empty.
     std::vector<std::string> get(String const& tag, std::vector<char const*> const& keys) {
         Map<String, Variant> values;
-        for (char const* k : keys) values.insert(k, Variant());
+        for (char const* k : keys) EXPECT_OK(values.insert(k, Variant()));
         GetRuntimeConfigurationMessage msg(tag, values);
         uError e = msg.send("RuntimeConfiguration");
-        EXPECT_EQ(e.code(), kSuccess) << e;
+        EXPECT_OK(e);
         std::vector<std::string> out;
         for (char const* k : keys) {
             Variant const& v = *values.search(k);
@@ -59,35 +61,30 @@ protected:
 using Texts = std::vector<std::string>;
 
 TEST_F(RuntimeConfigurationTest, StoredValuesComeBackAsTextAndUnknownKeysStayEmpty) {
-    ASSERT_EQ(put("src", {{"session", Variant("s1")},
-                          {"empty", Variant("")},
-                          {"count", Variant(42)},
-                          {"big", Variant(-5000000000LL)},
-                          {"flag", Variant(true)},
-                          {"bytes", Variant(String(std::string("a\0b", 3)))}})
-                  .code(),
-              kSuccess);
+    ASSERT_OK(put("src", {{"session", Variant("s1")}, {"empty", Variant("")}, {"count", Variant(42)},
+                          {"big", Variant(-5000000000LL)}, {"flag", Variant(true)},
+                          {"bytes", Variant(String(std::string("a\0b", 3)))}}));
     EXPECT_EQ(get("src", {"session", "empty", "count", "big", "flag", "bytes", "unknown"}),
               (Texts{"s1", "", "42", "-5000000000", "true", std::string("a\0b", 3), "-"}));
 }
 
 TEST_F(RuntimeConfigurationTest, StoringAgainReplacesAndResetForgetsOnlyNamedKeysOfItsTag) {
-    ASSERT_EQ(put("src", {{"a", Variant("1")}, {"b", Variant("2")}, {"c", Variant("3")}}).code(), kSuccess);
-    ASSERT_EQ(put("other", {{"a", Variant("100")}, {"b", Variant("200")}}).code(), kSuccess);
-    ASSERT_EQ(put("src", {{"a", Variant("one")}}).code(), kSuccess);
-    ASSERT_EQ(reset("src", {"b", "never-stored"}).code(), kSuccess);
+    ASSERT_OK(put("src", {{"a", Variant("1")}, {"b", Variant("2")}, {"c", Variant("3")}}));
+    ASSERT_OK(put("other", {{"a", Variant("100")}, {"b", Variant("200")}}));
+    ASSERT_OK(put("src", {{"a", Variant("one")}}));
+    ASSERT_OK(reset("src", {"b", "never-stored"}));
     EXPECT_EQ(get("src", {"a", "b", "c"}), (Texts{"one", "-", "3"}));
     EXPECT_EQ(get("other", {"a", "b"}), (Texts{"100", "200"}));
 
     Map<String, Variant> values{{"absent", Variant("caller's")}};  // unknown keys keep the caller's value
     GetRuntimeConfigurationMessage msg("src", values);
-    ASSERT_EQ(msg.send("RuntimeConfiguration").code(), kSuccess);
+    ASSERT_OK(msg.send("RuntimeConfiguration"));
     EXPECT_EQ(values.search("absent")->asString(), "caller's");
 }
 
 TEST_F(RuntimeConfigurationTest, ValueWithoutTextFormStoresNothingOfItsMessage) {
     uError e = put("src", {{"a", Variant("1")}, {"list", Variant(Vector<String>{"x"})}, {"z", Variant("2")}});
-    EXPECT_EQ(e.code(), kInvalid) << e;
+    EXPECT_CODE(e, kInvalid);
     EXPECT_EQ(get("src", {"a", "list", "z"}), (Texts{"-", "-", "-"}));
 }
 
@@ -95,14 +92,14 @@ TEST_F(RuntimeConfigurationTest, FileStoreKeepsValuesAcrossReopen) {
     TempDir dir;
     std::string path = dir.file("runtime.db");
     Configuration::Group group("RuntimeConfiguration", {{"path", Variant(String(path))}});
-    ASSERT_EQ(store_.sendConfig(group).code(), kSuccess);
-    ASSERT_EQ(put("src", {{"session", Variant("kept")}}).code(), kSuccess);
+    ASSERT_OK(store_.sendConfig(group));
+    ASSERT_OK(put("src", {{"session", Variant("kept")}}));
     store_.close();
 
     RuntimeConfiguration again("RuntimeConfiguration2");
-    ASSERT_EQ(again.open(String(path)).code(), kSuccess);
+    ASSERT_OK(again.open(String(path)));
     Map<String, Variant> values{{"session", Variant()}};
-    ASSERT_EQ(again.get("src", values).code(), kSuccess);
+    ASSERT_OK(again.get("src", values));
     EXPECT_EQ(values.search("session")->asString(), "kept");
 }
 
@@ -115,12 +112,12 @@ TEST_F(RuntimeConfigurationTest, StoreFileIsPrivateWhateverTheUmask) {
 
     mode_t old = ::umask(0);
     uError a = store_.open(String(created));
-    ASSERT_EQ(put("src", {{"secret", Variant("x")}}).code(), kSuccess);
+    ASSERT_OK(put("src", {{"secret", Variant("x")}}));
     RuntimeConfiguration other("Other");
     uError b = other.open(String(existing));
     ::umask(old);
-    ASSERT_EQ(a.code(), kSuccess) << a;
-    ASSERT_EQ(b.code(), kSuccess) << b;
+    ASSERT_OK(a);
+    ASSERT_OK(b);
 
     for (std::string const& p : {created, existing}) {
         struct stat st {};
@@ -131,23 +128,24 @@ TEST_F(RuntimeConfigurationTest, StoreFileIsPrivateWhateverTheUmask) {
 
 TEST_F(RuntimeConfigurationTest, FailedOpenLeavesNoStoreInsteadOfAFreshOne) {
     TempDir dir;
-    EXPECT_EQ(store_.open(String(dir.file("missing/dir/x.db"))).code(), kFailure);
-    EXPECT_EQ(put("src", {{"a", Variant("1")}}).code(), kFailure);
+    EXPECT_CODE(store_.open(String(dir.file("missing/dir/x.db"))), kFailure);
+    EXPECT_CODE(put("src", {{"a", Variant("1")}}), kFailure);
 
     std::string notDb = dir.file("text.db");
     std::ofstream(notDb) << "this is not a database file, not at all, really not";
-    EXPECT_EQ(store_.open(String(notDb)).code(), kFailure);
+    EXPECT_CODE(store_.open(String(notDb)), kFailure);
 
-    EXPECT_EQ(store_.open("").code(), kInvalid);
-    EXPECT_EQ(store_.open(":memory:").code(), kSuccess);
-    EXPECT_EQ(put("src", {{"a", Variant("1")}}).code(), kSuccess);
+    EXPECT_CODE(store_.open(""), kInvalid);
+    EXPECT_OK(store_.open(":memory:"));
+    EXPECT_OK(put("src", {{"a", Variant("1")}}));
 }
 
+// The in-memory store would lose its values if configuring it again opened it afresh.
 TEST_F(RuntimeConfigurationTest, ConfiguringTheSameStoreAgainKeepsItsValues) {
     Configuration::Group group("RuntimeConfiguration");
-    ASSERT_EQ(store_.sendConfig(group).code(), kSuccess);
-    ASSERT_EQ(put("src", {{"a", Variant("1")}}).code(), kSuccess);
-    ASSERT_EQ(store_.sendConfig(group).code(), kSuccess);
+    ASSERT_OK(store_.sendConfig(group));
+    ASSERT_OK(put("src", {{"a", Variant("1")}}));
+    ASSERT_OK(store_.sendConfig(group));
     EXPECT_EQ(get("src", {"a"}), (Texts{"1"}));
 }
 
@@ -160,9 +158,8 @@ TEST_F(RuntimeConfigurationTest, ConcurrentWritersAndReadersSeeWholeValues) {
         threads.emplace_back([&, t] {
             String tag = String::from(t);
             for (int i = 0; i < kRounds; ++i) {
-                Set<Configuration::Value> set;
-                set.insert(Configuration::Value("a", Variant(String::from(i))));
-                set.insert(Configuration::Value("b", Variant(String::from(i))));
+                Set<Configuration::Value> const set{Configuration::Value("a", Variant(String::from(i))),
+                                                    Configuration::Value("b", Variant(String::from(i)))};
                 if (store_.store(tag, set).failed()) ++failures;
                 Map<String, Variant> values{{"a", Variant()}, {"b", Variant()}};
                 if (store_.get(tag, values).failed() || values.search("a")->asString() != String::from(i) ||

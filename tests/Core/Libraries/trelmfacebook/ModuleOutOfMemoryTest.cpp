@@ -8,6 +8,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "ModuleHandle.h"
 
 namespace {
@@ -79,7 +81,7 @@ TEST(ModuleOutOfMemoryTest, FailedInsertIsWrappedAndKeepsTheEntriesInsertedBefor
             EXPECT_EQ(ids, (std::vector<std::string>{kConnectorId, kSourceId}));
             continue;
         }
-        EXPECT_EQ(result.code(), trelm::kFailure);
+        EXPECT_CODE(result, trelm::kFailure);
         EXPECT_STREQ(result.file(), "Core/Libraries/trelmfacebook/loader");
         ASSERT_NE(result.cause(), nullptr);
         EXPECT_EQ(result.cause()->code(), trelm::kOutOfMemory);

@@ -6,6 +6,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include "ModuleHandle.h"
 #include "trelm/Metadata.h"
 
@@ -34,52 +36,38 @@ protected:
     std::unique_ptr<ModuleHandle> module_;
 };
 
-TEST_F(ModuleTest, EmptyTableGetsExactlyTheSourceAndTheConnector) {
-    ModuleHandle::Table table;
-    trelm::uError result = module_->getComponents(table);
-    ASSERT_EQ(result.code(), trelm::kSuccess) << result;
-    EXPECT_EQ(idsOf(table), (std::vector<std::string>{kConnectorId, kSourceId}));
-    EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
-    EXPECT_EQ(*table.search(kConnectorId), module_->connectorFactory);
-}
-
-TEST_F(ModuleTest, IdentifiersAlreadyPresentGetTheModulesFactoriesAndOtherEntriesStay) {
-    ModuleHandle::Table table;
-    ASSERT_TRUE(table.insert(kSourceId, &foreignFactory).ok());
-    ASSERT_TRUE(table.insert(kConnectorId, &foreignFactory).ok());
-    ASSERT_TRUE(table.insert("@other.example:/thing", &foreignFactory).ok());
-
-    ASSERT_EQ(module_->getComponents(table).code(), trelm::kSuccess);
-    EXPECT_EQ(table.size(), 3u);
-    EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
-    EXPECT_EQ(*table.search(kConnectorId), module_->connectorFactory);
-    EXPECT_EQ(*table.search("@other.example:/thing"), &foreignFactory);
-}
-
-TEST_F(ModuleTest, RepeatedCallsLeaveTheSameTwoEntries) {
-    ModuleHandle::Table table;
-    for (int call = 0; call < 3; ++call) {
-        ASSERT_EQ(module_->getComponents(table).code(), trelm::kSuccess) << "call " << call;
+// Into an empty table, or one that already holds the module's identifiers (with other factories)
+// and a foreign entry, and however often it is called: the module's two factories under their
+// identifiers, every other entry left as it was.
+TEST_F(ModuleTest, TableGetsTheSourceAndTheConnectorAndOtherEntriesStay) {
+    char const* const kOther = "@other.example:/thing";
+    for (bool prefilled : {false, true}) {
+        SCOPED_TRACE(prefilled ? "prefilled" : "empty");
+        ModuleHandle::Table table;
+        if (prefilled) {
+            for (char const* id : {kSourceId, kConnectorId, kOther}) ASSERT_OK(table.insert(id, &foreignFactory));
+        }
+        for (int call = 0; call < 3; ++call) ASSERT_OK(module_->getComponents(table)) << "call " << call;
+        std::vector<std::string> ids{kConnectorId, kSourceId};
+        if (prefilled) ids.insert(ids.begin(), kOther);
+        EXPECT_EQ(idsOf(table), ids);
+        EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
+        EXPECT_EQ(*table.search(kConnectorId), module_->connectorFactory);
+        EXPECT_EQ(prefilled ? *table.search(kOther) : &foreignFactory, &foreignFactory);
     }
-    EXPECT_EQ(idsOf(table), (std::vector<std::string>{kConnectorId, kSourceId}));
-    EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
 }
 
 // A factory filed under the wrong identifier, or an identifier that differs from the one the
 // component reports, would make the host configure one component as the other.
 TEST_F(ModuleTest, EveryFactoryMakesIndependentComponentsOfItsOwnIdentifier) {
     ModuleHandle::Table table;
-    ASSERT_EQ(module_->getComponents(table).code(), trelm::kSuccess);
+    ASSERT_OK(module_->getComponents(table));
     for (auto const& [id, factory] : table) {
-        std::unique_ptr<Component> first(factory("first"));
-        std::unique_ptr<Component> second(factory("second"));
-        ASSERT_NE(first, nullptr) << id;
-        ASSERT_NE(second, nullptr) << id;
+        std::unique_ptr<Component> first(factory("first")), second(factory("second"));
+        ASSERT_TRUE(first && second) << id;
         EXPECT_NE(first.get(), second.get());
-        EXPECT_EQ(first->componentId(), id);
-        EXPECT_EQ(second->componentId(), id);
-        EXPECT_EQ(first->name(), "first");
-        EXPECT_EQ(second->name(), "second");
+        EXPECT_EQ(first->componentId() + "|" + second->componentId(), id + "|" + id);
+        EXPECT_EQ(first->name() + "|" + second->name(), "first|second");
         EXPECT_EQ(first->state(), Component::State::Created);
     }
 }
@@ -91,28 +79,20 @@ TEST_F(ModuleTest, LoadingRegistersTheSixteenKeysWithTheirTypes) {
     };
     // Coordinates and the modification time are text keys on purpose; only the photo count is a
     // number.
+    TYPES const text = trelm::TRELM_TYPES::STRING;
     Expected const keys[] = {
-        {"facebook_media_owner_service_id", trelm::TRELM_TYPES::STRING},
-        {"facebook_media_album_service_id", trelm::TRELM_TYPES::STRING},
-        {"facebook_media_thumb_uri", trelm::TRELM_TYPES::STRING},
-        {"facebook_photo_tag_photo_service_id", trelm::TRELM_TYPES::STRING},
-        {"facebook_photo_tag_tagged_service_id", trelm::TRELM_TYPES::STRING},
-        {"facebook_photo_tag_x", trelm::TRELM_TYPES::STRING},
-        {"facebook_photo_tag_y", trelm::TRELM_TYPES::STRING},
-        {"facebook_photo_tag_text", trelm::TRELM_TYPES::STRING},
-        {"facebook_album_owner_service_id", trelm::TRELM_TYPES::STRING},
-        {"facebook_album_modified", trelm::TRELM_TYPES::STRING},
-        {"facebook_album_location", trelm::TRELM_TYPES::STRING},
-        {"facebook_album_link", trelm::TRELM_TYPES::STRING},
-        {"facebook_album_notes", trelm::TRELM_TYPES::STRING},
-        {"facebook_album_photocount", trelm::TRELM_TYPES::INT32},
-        {"facebook_album_cover_service_id", trelm::TRELM_TYPES::STRING},
-        {"facebook_album_type", trelm::TRELM_TYPES::STRING},
+        {"facebook_media_owner_service_id", text},      {"facebook_media_album_service_id", text},
+        {"facebook_media_thumb_uri", text},             {"facebook_photo_tag_photo_service_id", text},
+        {"facebook_photo_tag_tagged_service_id", text}, {"facebook_photo_tag_x", text},
+        {"facebook_photo_tag_y", text},                 {"facebook_photo_tag_text", text},
+        {"facebook_album_owner_service_id", text},      {"facebook_album_modified", text},
+        {"facebook_album_location", text},              {"facebook_album_link", text},
+        {"facebook_album_notes", text},                 {"facebook_album_photocount", trelm::TRELM_TYPES::INT32},
+        {"facebook_album_cover_service_id", text},      {"facebook_album_type", text},
     };
     for (Expected const& key : keys) {
         TYPES type = trelm::TRELM_TYPES::NONE;
-        trelm::uError found = trelm::Metadata::getType(key.name, type);
-        EXPECT_EQ(found.code(), trelm::kSuccess) << key.name;
+        EXPECT_OK(trelm::Metadata::getType(key.name, type)) << key.name;
         EXPECT_EQ(type, key.type) << key.name;
     }
 }

@@ -173,14 +173,5 @@ TEST(FqlStatements, LiteralsNeverReachTheSqlText) {
     EXPECT_TRUE(found);
 }
 
-// A number compared with a text compares as numbers, so the text literal arrives converted.
-TEST(FqlStatements, TextComparedWithNumberIsConvertedToANumber) {
-    FqlPlan plan;
-    ASSERT_FALSE(FqlEngine::compile(kViewer, 1300000000, "select uid from user where uid = ' 42 '", plan));
-    ASSERT_FALSE(plan.params.empty());
-    EXPECT_EQ(plan.params[0].kind, SqlValue::Kind::Integer);
-    EXPECT_EQ(plan.params[0].integer, 42);
-}
-
 }  // namespace
 }  // namespace emu::test

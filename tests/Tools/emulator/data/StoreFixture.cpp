@@ -28,19 +28,9 @@ void flattenInto(const XmlNode& node, const std::string& prefix, Row& row) {
 }  // namespace
 
 GeneratorOptions testOptions() {
-    GeneratorOptions o;
-    o.seed = 7;
-    o.users = 3000;
-    o.demoFriends = 420;
-    o.friendsPerUser = 4;
-    o.albumsPerUser = 2;
-    o.photosPerAlbum = 4;
-    o.tagsPerPhoto = 2;
-    o.postsPerUser = 3;
-    o.threadsPerUser = 25;
-    o.messagesPerThread = 6;
-    o.friendRequests = 7;
-    return o;
+    return GeneratorOptions{.seed = 7, .users = 3000, .demoFriends = 420, .friendsPerUser = 4, .albumsPerUser = 2,
+                            .photosPerAlbum = 4, .tagsPerPhoto = 2, .postsPerUser = 3, .threadsPerUser = 25,
+                            .messagesPerThread = 6, .friendRequests = 7};
 }
 
 GeneratedStore::GeneratedStore(const GeneratorOptions& options) {

@@ -43,12 +43,5 @@ TEST(RequestLogTest, ListenerSeesEveryEntryThatIsKept) {
     EXPECT_EQ(seen, (std::vector<std::string>{"a", "b"}));
 }
 
-TEST(RequestLogTest, EntriesForMatchesWithAndWithoutPrefix) {
-    RequestLog log;
-    for (const char* m : {"facebook.fql.query", "fql.query", "fql.queryx", "facebook.stream.get", ""}) log.add(entry(m));
-    EXPECT_EQ(log.entriesFor("fql.query").size(), 2u);
-    EXPECT_EQ(log.entriesFor("stream.get").size(), 1u);
-}
-
 }  // namespace
 }  // namespace emu

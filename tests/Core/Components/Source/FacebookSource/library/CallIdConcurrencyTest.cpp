@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <set>
 #include <thread>
 #include <vector>
@@ -38,7 +40,7 @@ TEST_F(CallIdConcurrencyTest, ConcurrentCallsGetDistinctCallIdsAndMatchingSignat
     std::set<unsigned> ids;
     for (auto const& exchange : http.exchanges()) {
         unsigned id = 0;
-        ASSERT_TRUE(exchange.fields.search("call_id")->to(id).ok());
+        ASSERT_OK(exchange.fields.search("call_id")->to(id));
         ids.insert(id);
         String text;
         for (auto const& [key, value] : exchange.fields) {

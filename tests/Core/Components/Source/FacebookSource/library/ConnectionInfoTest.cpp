@@ -25,16 +25,16 @@ TEST_F(ConnectionInfoTest, GettersRefuseUntilTheirValueIsKnownAndLeaveTheOutputA
     Info subject(kTag);
     for (Case const& c : cases) {
         String out = "untouched";
-        EXPECT_EQ((subject.*c.get)(out).code(), c.code);
+        EXPECT_CODE((subject.*c.get)(out), c.code);
         EXPECT_EQ(out, "untouched");
     }
-    ASSERT_TRUE(subject.setAppConfig("key", "secret").ok());
-    ASSERT_TRUE(subject.setSessionConfig("", "ssec", "7", false, false).ok());  // an empty id is a session
+    ASSERT_OK(subject.setAppConfig("key", "secret"));
+    ASSERT_OK(subject.setSessionConfig("", "ssec", "7", false, false));  // an empty id is a session
     String out;
-    EXPECT_EQ(subject.getLogin(out).code(), kNotSet);
-    ASSERT_TRUE(subject.setLoginConfig("me@x.org", "pw").ok());
+    EXPECT_CODE(subject.getLogin(out), kNotSet);
+    ASSERT_OK(subject.setLoginConfig("me@x.org", "pw"));
     for (Case const& c : cases) {
-        EXPECT_TRUE((subject.*c.get)(out).ok());
+        EXPECT_OK((subject.*c.get)(out));
         EXPECT_EQ(out, c.value);
     }
     EXPECT_TRUE(store.records().empty());
@@ -79,7 +79,7 @@ TEST_F(ConnectionInfoTest, SettersSendExactlyTheirStoreMessages) {
         SCOPED_TRACE(c.name);
         store.clearRecords();
         Info subject(kTag);
-        ASSERT_TRUE(c.call(subject).ok());
+        ASSERT_OK(c.call(subject));
         auto records = store.records();
         ASSERT_EQ(records.size(), c.sent.size());
         for (size_t n = 0; n < records.size(); ++n) {
@@ -101,33 +101,33 @@ TEST_F(ConnectionInfoTest, ChangedApplicationDropsSessionAndUser) {
     for (Case const& c : cases) {
         signIn();
         store.clearRecords();
-        ASSERT_TRUE(info->setAppConfig(c.key, c.secret).ok());
+        ASSERT_OK(info->setAppConfig(c.key, c.secret));
         String out;
         EXPECT_EQ(info->getSessionId(out).ok(), c.keeps) << c.key << c.secret;
         EXPECT_EQ(info->getUserId(out).ok(), c.keeps) << c.key << c.secret;
         EXPECT_TRUE(store.records().empty());
-        ASSERT_TRUE(info->setAppConfig("k", "s").ok());
+        ASSERT_OK(info->setAppConfig("k", "s"));
     }
 }
 
 TEST_F(ConnectionInfoTest, DroppingTheSessionAloneKeepsTheUser) {
     signIn("sid", "ssec", "7");
-    ASSERT_TRUE(info->invalidateSessionConfigWithoutUser(false).ok());
+    ASSERT_OK(info->invalidateSessionConfigWithoutUser(false));
     String out;
-    ASSERT_TRUE(info->getUserId(out).ok());
+    ASSERT_OK(info->getUserId(out));
     EXPECT_EQ(out, "7");
-    EXPECT_EQ(info->getSessionId(out).code(), kNotSignedIn);
-    EXPECT_EQ(info->getSessionSecret(out).code(), kNotSignedIn);
+    EXPECT_CODE(info->getSessionId(out), kNotSignedIn);
+    EXPECT_CODE(info->getSessionSecret(out), kNotSignedIn);
 }
 
 // A failed store is reported, memory keeps the change, and the second message is not sent.
 TEST_F(ConnectionInfoTest, FailedStoreIsReportedWhileMemoryKeepsTheChange) {
     store.failType("RuntimeConfigurationMessage");
-    EXPECT_EQ(info->setSessionConfig("sid", "ssec", "7", true, true).code(), kFailure);
+    EXPECT_CODE(info->setSessionConfig("sid", "ssec", "7", true, true), kFailure);
     EXPECT_EQ(store.records().size(), 1u);
     EXPECT_TRUE(info->hasSession());
     store.failType("ResetRuntimeConfigurationMessage");
-    EXPECT_EQ(info->invalidateSessionConfigWithUser(true).code(), kFailure);
+    EXPECT_CODE(info->invalidateSessionConfigWithUser(true), kFailure);
     EXPECT_FALSE(info->hasSession());
 }
 

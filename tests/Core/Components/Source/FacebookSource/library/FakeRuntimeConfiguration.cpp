@@ -13,13 +13,13 @@ void FakeRuntimeConfiguration::failType(String const& type) {
 
 void FakeRuntimeConfiguration::put(String const& tag, String const& key, String const& value) {
     std::lock_guard<std::mutex> lock(mutex_);
-    store_.insert(tag + "/" + key, value);
+    store_[tag + "/" + key] = value;
 }
 
 String FakeRuntimeConfiguration::get(String const& tag, String const& key) const {
     std::lock_guard<std::mutex> lock(mutex_);
-    String const* value = store_.search(tag + "/" + key);
-    return value ? *value : String("<none>");
+    auto const found = store_.find(tag + "/" + key);
+    return found != store_.end() ? found->second : String("<none>");
 }
 
 std::vector<FakeRuntimeConfiguration::Record> FakeRuntimeConfiguration::records() const {
@@ -39,24 +39,26 @@ uError FakeRuntimeConfiguration::handleMessage(IMessage& msg) {
     if (msg.type() == RuntimeConfigurationMessage::kType) {
         auto& m = static_cast<RuntimeConfigurationMessage&>(msg);
         record.tag = m.tag;
-        for (Configuration::Value const& v : m.values) record.values.insert(v.key(), v.value().asString());
+        for (Configuration::Value const& v : m.values) {
+            TRELM_RETURN_IF_ERROR(record.values.insert(v.key(), v.value().asString()));
+        }
         for (auto const& [key, text] : record.values) {
-            if (!fail) store_.insert(m.tag + "/" + key, text);
+            if (!fail) store_[m.tag + "/" + key] = text;
         }
     } else if (msg.type() == ResetRuntimeConfigurationMessage::kType) {
         auto& m = static_cast<ResetRuntimeConfigurationMessage&>(msg);
         record.tag = m.tag;
         record.keys = m.keys;
         for (String const& key : m.keys) {
-            if (!fail) store_.remove(m.tag + "/" + key);
+            if (!fail) store_.erase(m.tag + "/" + key);
         }
     } else if (msg.type() == GetRuntimeConfigurationMessage::kType) {
         auto& m = static_cast<GetRuntimeConfigurationMessage&>(msg);
         record.tag = m.tag;
         for (auto& [key, value] : m.values) {
-            record.keys.insert(key);
-            String const* stored = store_.search(m.tag + "/" + key);
-            if (stored && !fail) value = *stored;
+            TRELM_RETURN_IF_ERROR(record.keys.insert(key));
+            auto const stored = store_.find(m.tag + "/" + key);
+            if (stored != store_.end() && !fail) value = stored->second;
         }
     } else {
         return TRELM_OK();  // a broadcast meant for others

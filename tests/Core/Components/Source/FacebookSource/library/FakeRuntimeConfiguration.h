@@ -1,5 +1,6 @@
 #pragma once
 
+#include <map>
 #include <mutex>
 #include <vector>
 
@@ -38,7 +39,7 @@ protected:
 private:
     mutable std::mutex mutex_;  // guards the fields below
     std::vector<Record> records_;
-    Map<String, String> store_;  // "tag/key" -> value
+    std::map<String, String> store_;  // "tag/key" -> value
     String failType_;
 };
 

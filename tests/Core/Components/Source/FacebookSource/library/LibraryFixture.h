@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <memory>
 #include <string>
 #include <vector>
@@ -29,23 +31,23 @@ protected:
     static constexpr char const* kTag = "fbsource";
 
     void SetUp() override {
-        ASSERT_TRUE(registry.add("HttpRequestFactory", &http).ok());
-        ASSERT_TRUE(registry.add("RuntimeConfiguration", &store).ok());
+        ASSERT_OK(registry.add("HttpRequestFactory", &http));
+        ASSERT_OK(registry.add("RuntimeConfiguration", &store));
         registry.activate();
         info = makeSmart<FacebookLibrary::ConnectionInfo>(kTag);
-        ASSERT_TRUE(info->setAppConfig("k", "s").ok());
-        ASSERT_TRUE(lib->setup(info).ok());
+        ASSERT_OK(info->setAppConfig("k", "s"));
+        ASSERT_OK(lib->setup(info));
     }
 
     // A session in memory only.
     void signIn(String const& session = "SK", String const& secret = "SS", String const& user = "42") {
-        ASSERT_TRUE(info->setSessionConfig(session, secret, user, false, false).ok());
+        ASSERT_OK(info->setSessionConfig(session, secret, user, false, false));
     }
 
     // A component that records wipe, wake-up and status messages into `events`.
     void addRecorder(String const& name, bool fail = false) {
         recorders.push_back(std::make_unique<RecordingComponent>(name, events, fail));
-        ASSERT_TRUE(registry.add(name, recorders.back().get()).ok());
+        ASSERT_OK(registry.add(name, recorders.back().get()));
     }
 
     Map<String, String> lastFields() const {

@@ -22,10 +22,10 @@ class LoginSessionTest : public LibraryFixture {
 protected:
     void SetUp() override {
         LibraryFixture::SetUp();
-        ASSERT_TRUE(info->setLoginConfig("me@example.org", "pw").ok());
+        ASSERT_OK(info->setLoginConfig("me@example.org", "pw"));
         for (char const* name : {"A", "B", "C"}) addRecorder(name);
-        ASSERT_TRUE(info->setWipeComponents({"A", "B"}).ok());
-        ASSERT_TRUE(info->setWakeupComponents({"C"}).ok());
+        ASSERT_OK(info->setWipeComponents({"A", "B"}));
+        ASSERT_OK(info->setWakeupComponents({"C"}));
     }
 
     // The events of one sign-in: wipes and wake-ups first if the user changed, then the status
@@ -42,33 +42,30 @@ protected:
 
 TEST_F(LoginSessionTest, SetupIsOnceOnlyAndKeepsTheFirstSettings) {
     signIn("SK", "SS", "42");
-    EXPECT_EQ(lib->setup(makeSmart<FacebookLibrary::ConnectionInfo>("other")).code(), kInvalid);
-    EXPECT_EQ(lib->setup(SmartPtr<FacebookLibrary::ConnectionInfo>()).code(), kInvalid);
+    EXPECT_CODE(lib->setup(makeSmart<FacebookLibrary::ConnectionInfo>("other")), kInvalid);
+    EXPECT_CODE(lib->setup(SmartPtr<FacebookLibrary::ConnectionInfo>()), kInvalid);
     String user;
-    ASSERT_TRUE(lib->getUserId(user).ok());
+    ASSERT_OK(lib->getUserId(user));
     EXPECT_EQ(user, "42");
 
     FacebookLibrary unset;
-    EXPECT_EQ(unset.getUserId(user).code(), kNotSet);
-    EXPECT_EQ(unset.connect().code(), kNotSet);
-    EXPECT_EQ(unset.resetAccount(true).code(), kNotSet);
+    EXPECT_CODE(unset.getUserId(user), kNotSet);
+    EXPECT_CODE(unset.connect(), kNotSet);
+    EXPECT_CODE(unset.resetAccount(true), kNotSet);
 }
 
 // md5("api_key=kemail=me@example.orgmethod=facebook.auth.loginpassword=pwv=1.0s").
 TEST_F(LoginSessionTest, LoginPostsCredentialsOverHttpsAndStoresTheSession) {
     http.queue(loginAnswer("42"));
     String session, secret, user;
-    ASSERT_TRUE(lib->connectInternal(session, secret, user).ok());
+    ASSERT_OK(lib->connectInternal(session, secret, user));
     EXPECT_EQ(session + "/" + secret + "/" + user, "SK/SS/42");
     auto sent = http.exchanges();
     ASSERT_EQ(sent.size(), 1u);
     EXPECT_EQ(sent[0].url, "https://api.facebook.com/restserver.php");
-    EXPECT_EQ(entries(sent[0].fields), (Fields{{"api_key", "k"},
-                                               {"email", "me@example.org"},
-                                               {"method", "facebook.auth.login"},
-                                               {"password", "pw"},
-                                               {"sig", "5697f76f44ccb154732267ab67afb620"},
-                                               {"v", "1.0"}}));
+    EXPECT_EQ(entries(sent[0].fields), (Fields{{"api_key", "k"}, {"email", "me@example.org"},
+                                               {"method", "facebook.auth.login"}, {"password", "pw"},
+                                               {"sig", "5697f76f44ccb154732267ab67afb620"}, {"v", "1.0"}}));
     for (auto const& [key, value] : Fields{{"facebook_source_session_id", "SK"},
                                            {"facebook_source_session_secret", "SS"},
                                            {"facebook_source_session_user", "42"},
@@ -98,7 +95,7 @@ TEST_F(LoginSessionTest, FailedLoginsAnswerTheirCodeAndChangeNothing) {
         SCOPED_TRACE(c.answer.body);
         http.queue(c.answer);
         String session, secret, user = "-";
-        EXPECT_EQ(lib->connectInternal(session, secret, user).code(), c.code);
+        EXPECT_CODE(lib->connectInternal(session, secret, user), c.code);
         EXPECT_EQ(user, "-");
         EXPECT_FALSE(info->hasSession());
         EXPECT_TRUE(store.records().empty());
@@ -108,10 +105,10 @@ TEST_F(LoginSessionTest, FailedLoginsAnswerTheirCodeAndChangeNothing) {
 TEST_F(LoginSessionTest, LoginWithoutConfiguredCredentialsIsNotSignedInAndSendsNothing) {
     lib = makeSmart<FacebookLibrary>();
     auto noLogin = makeSmart<FacebookLibrary::ConnectionInfo>(kTag);
-    ASSERT_TRUE(noLogin->setAppConfig("k", "s").ok());
-    ASSERT_TRUE(lib->setup(noLogin).ok());
+    ASSERT_OK(noLogin->setAppConfig("k", "s"));
+    ASSERT_OK(lib->setup(noLogin));
     uError err = lib->connect();
-    EXPECT_EQ(err.code(), kNotSignedIn);
+    EXPECT_CODE(err, kNotSignedIn);
     ASSERT_NE(err.cause(), nullptr);
     EXPECT_EQ(err.cause()->code(), kNotSet);
     EXPECT_TRUE(http.exchanges().empty());
@@ -120,9 +117,9 @@ TEST_F(LoginSessionTest, LoginWithoutConfiguredCredentialsIsNotSignedInAndSendsN
 
 TEST_F(LoginSessionTest, SessionWithoutSecretSignsWithTheApplicationSecret) {
     http.queue(loginAnswer("42", false));
-    ASSERT_TRUE(lib->connect().ok());
+    ASSERT_OK(lib->connect());
     http.queue(String("<users_setStatus_response>1</users_setStatus_response>"));
-    ASSERT_TRUE(lib->setStatus("hi", false).ok());
+    ASSERT_OK(lib->setStatus("hi", false));
     auto fields = lastFields();
     ASSERT_TRUE(fields.contains("session_key"));
     String text;
@@ -146,71 +143,71 @@ TEST_F(LoginSessionTest, ConnectWipesAndWakesOnlyWhenAnotherUserSignsIn) {
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
         FakeRuntimeConfiguration fresh;
-        ASSERT_TRUE(registry.remove("RuntimeConfiguration").ok());
-        ASSERT_TRUE(registry.add("RuntimeConfiguration", &fresh).ok());
+        ASSERT_OK(registry.remove("RuntimeConfiguration"));
+        ASSERT_OK(registry.add("RuntimeConfiguration", &fresh));
         if (c.lastUser) fresh.put(kTag, "facebook_source_lastuser", c.lastUser);
         if (c.readFails) fresh.failType("GetRuntimeConfigurationMessage");
         http.queue(loginAnswer("42"));
-        EXPECT_TRUE(lib->connect().ok());
+        EXPECT_OK(lib->connect());
         EXPECT_EQ(takeEvents(), expected(c.wipes, "0", "42"));
         EXPECT_EQ(fresh.get(kTag, "facebook_source_lastuser"), "42");
-        ASSERT_TRUE(registry.remove("RuntimeConfiguration").ok());
-        ASSERT_TRUE(registry.add("RuntimeConfiguration", &store).ok());
+        ASSERT_OK(registry.remove("RuntimeConfiguration"));
+        ASSERT_OK(registry.add("RuntimeConfiguration", &store));
     }
 }
 
 TEST_F(LoginSessionTest, FailedConnectAnnouncesTheCodeWithoutUserAndWipesNothing) {
     store.put(kTag, "facebook_source_lastuser", "7");
     http.queue(errorAnswer("100"));
-    EXPECT_EQ(lib->connect().code(), kNotSignedIn);
+    EXPECT_CODE(lib->connect(), kNotSignedIn);
     EXPECT_EQ(takeEvents(), expected(false, "8000001c", ""));
     EXPECT_EQ(store.get(kTag, "facebook_source_lastuser"), "7");
 }
 
 TEST_F(LoginSessionTest, AppliedSessionStaysInMemoryWhileTheLastUserIsStored) {
     store.put(kTag, "facebook_source_lastuser", "7");
-    ASSERT_TRUE(lib->applySession("SK", "SS", "42").ok());
+    ASSERT_OK(lib->applySession("SK", "SS", "42"));
     auto records = store.records();
     ASSERT_EQ(records.size(), 2u);
     EXPECT_EQ(records[0].type, "GetRuntimeConfigurationMessage");
     EXPECT_EQ(entries(records[1].values), (Fields{{"facebook_source_lastuser", "42"}}));
     EXPECT_EQ(takeEvents(), expected(true, "0", "42"));
     String session;
-    ASSERT_TRUE(info->getSessionId(session).ok());
+    ASSERT_OK(info->getSessionId(session));
     EXPECT_EQ(session, "SK");
 }
 
 // After a log-out the last user is remembered: the same person back wipes nothing, another does.
 TEST_F(LoginSessionTest, ResetForgetsTheSessionButRemembersTheLastUser) {
     http.queue(loginAnswer("42"));
-    ASSERT_TRUE(lib->connect().ok());
+    ASSERT_OK(lib->connect());
     takeEvents();
     store.clearRecords();
 
-    ASSERT_TRUE(lib->resetAccount(true).ok());
+    ASSERT_OK(lib->resetAccount(true));
     auto records = store.records();
     ASSERT_EQ(records.size(), 1u);
     EXPECT_EQ(records[0].keys, (Set<String>{"facebook_source_session_id", "facebook_source_session_secret",
                                             "facebook_source_session_user"}));
     EXPECT_EQ(takeEvents(), expected(true, "8000001c", "", false));  // nobody is woken for a log-out
     String user;
-    EXPECT_EQ(lib->getUserId(user).code(), kNotSignedIn);
+    EXPECT_CODE(lib->getUserId(user), kNotSignedIn);
 
     http.queue(loginAnswer("42"));
-    ASSERT_TRUE(lib->connect().ok());
+    ASSERT_OK(lib->connect());
     EXPECT_EQ(takeEvents(), expected(false, "0", "42"));
 
-    ASSERT_TRUE(lib->resetAccount(false).ok());
+    ASSERT_OK(lib->resetAccount(false));
     takeEvents();
     http.queue(loginAnswer("43"));
-    ASSERT_TRUE(lib->connect().ok());
+    ASSERT_OK(lib->connect());
     EXPECT_EQ(takeEvents(), expected(true, "0", "43"));
 }
 
 TEST_F(LoginSessionTest, ResetWithEmptyListsSendsOnlyTheStatus) {
-    ASSERT_TRUE(info->setWipeComponents({}).ok());
+    ASSERT_OK(info->setWipeComponents({}));
     store.clearRecords();
-    ASSERT_TRUE(lib->resetAccount(false).ok());
+    ASSERT_OK(lib->resetAccount(false));
     EXPECT_EQ(takeEvents(), expected(false, "8000001c", ""));
     EXPECT_TRUE(store.records().empty());
 }
@@ -218,9 +215,9 @@ TEST_F(LoginSessionTest, ResetWithEmptyListsSendsOnlyTheStatus) {
 // One component failing or missing must not spare the others their wipe.
 TEST_F(LoginSessionTest, FailedWipeDoesNotStopTheOthers) {
     addRecorder("Failing", true);
-    ASSERT_TRUE(info->setWipeComponents({"Missing", "Failing", "A"}).ok());
+    ASSERT_OK(info->setWipeComponents({"Missing", "Failing", "A"}));
     uError err = lib->sendWipes(true);
-    EXPECT_EQ(err.code(), kFailure);
+    EXPECT_CODE(err, kFailure);
     ASSERT_NE(err.cause(), nullptr);
     EXPECT_EQ(err.cause()->code(), kNotFound);  // the first failure: the missing component
     EXPECT_EQ(takeEvents(), (Events{"Failing:wipe:fbsource", "A:wipe:fbsource", "C:wakeup:fbsource"}));

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <functional>
 
 #include "MessageParser.h"
@@ -42,29 +44,26 @@ TEST(ResponseParsersTest, RootsAndErrorDocumentsGiveTheirCodes) {
         for (Doc const& d : docs) {
             std::string xml = d.xml;
             for (size_t at; (at = xml.find('@')) != std::string::npos;) xml.replace(at, 1, p.root);
-            EXPECT_EQ(p.parse(String(xml)).code(), d.code) << xml;
+            EXPECT_CODE(p.parse(String(xml)), d.code) << xml;
         }
     }
 }
 
 TEST(ResponseParsersTest, PhotoIdIsThePidElement) {
     String pid;
-    ASSERT_TRUE(PhotoUploadParser(pid)
+    ASSERT_OK(PhotoUploadParser(pid)
                     .parse("<photos_upload_response><pid>100_7</pid><aid>100_1</aid><owner>100</owner>"
-                           "</photos_upload_response>")
-                    .ok());
+                           "</photos_upload_response>"));
     EXPECT_EQ(pid, "100_7");
 }
 
 // Records appended before a broken answer stay, after what the caller already had.
 TEST(ResponseParsersTest, ThreadsAreReadInOrderAndKeptWhenTheAnswerBreaks) {
     Vector<Thread> threads{Thread{"old", "", 1}};
-    EXPECT_EQ(ThreadParser(threads)
+    EXPECT_CODE(ThreadParser(threads)
                   .parse("<mailbox_getInbox_response><thread><tid>1</tid><subject>Hi &amp; bye</subject>"
                          "<last_update>1700000000</last_update><unread>1</unread></thread>"
-                         "<thread><tid>2</tid><last_update>12abc</last_update></thread><thread><tid>3</ti")
-                  .code(),
-              kFailure);
+                         "<thread><tid>2</tid><last_update>12abc</last_update></thread><thread><tid>3</ti"), kFailure);
     ASSERT_EQ(threads.size(), 4u);
     EXPECT_EQ(threads[0].threadId, "old");
     EXPECT_EQ(threads[1].threadId + "|" + threads[1].subject, "1|Hi & bye");
@@ -74,11 +73,10 @@ TEST(ResponseParsersTest, ThreadsAreReadInOrderAndKeptWhenTheAnswerBreaks) {
 
 TEST(ResponseParsersTest, MessagesCarryTheCallersContext) {
     Vector<Message> messages;
-    ASSERT_TRUE(MessageParser(messages, "thread 9")
+    ASSERT_OK(MessageParser(messages, "thread 9")
                     .parse("<mailbox_getThreadMessages_response><message><mid>9_1</mid><tid>9</tid>"
                            "<author>42</author><body>hi <b>x</b>there</body><time_sent>1700000001</time_sent>"
-                           "</message><message><mid>9_2</mid></message></mailbox_getThreadMessages_response>")
-                    .ok());
+                           "</message><message><mid>9_2</mid></message></mailbox_getThreadMessages_response>"));
     ASSERT_EQ(messages.size(), 2u);
     Message const& m = messages[0];
     EXPECT_EQ(m.messageId + "|" + m.threadId + "|" + m.author + "|" + m.body, "9_1|9|42|hi there");
@@ -102,7 +100,7 @@ TEST(ResponseParsersTest, AttachmentFlagFollowsTheTimeSentReadSoFar) {
         Vector<Message> messages;
         String xml = String("<mailbox_getThreadMessages_response><message><time_sent>5</time_sent></message>"
                             "<message>") + c.message + "</message></mailbox_getThreadMessages_response>";
-        ASSERT_TRUE(MessageParser(messages, "").parse(xml).ok());
+        ASSERT_OK(MessageParser(messages, "").parse(xml));
         ASSERT_EQ(messages.size(), 2u);
         EXPECT_EQ(messages[1].hasAttachment, c.flag) << c.message;
     }

@@ -9,39 +9,35 @@ protected:
     uError call(String* response = nullptr) {
         Map<String, String> args;
         String body;
-        EXPECT_TRUE(lib->makeBaseArgs("m", args).ok());
+        EXPECT_OK(lib->makeBaseArgs("m", args));
         uError err = lib->runFacebookRequest(args, SmartPtr<InputDataStream>(), body);
         if (response) *response = body;
         return err;
     }
 };
 
-// md5("api_key=kmethod=mv=1.0s"): pairs in key order, run together, the secret last. An empty
-// session id is no session, so that call is an application call too.
-TEST_F(RequestTest, ApplicationCallIsSignedWithTheApplicationSecret) {
-    Fields const expected{{"api_key", "k"}, {"method", "m"}, {"sig", "8159b22f8566a82474b00cde4c690b69"}, {"v", "1.0"}};
+// Pairs in key order, run together, the secret last. An application call (an empty session id
+// is no session): md5("api_key=kmethod=mv=1.0s"). A session call also carries the session key and
+// a call id: md5("api_key=kcall_id=1method=msession_key=SKv=1.0SS").
+TEST_F(RequestTest, CallsAreSignedWithTheSessionSecretOrElseTheApplicationSecret) {
+    Fields const application{
+        {"api_key", "k"}, {"method", "m"}, {"sig", "8159b22f8566a82474b00cde4c690b69"}, {"v", "1.0"}};
     Map<String, String> args;
-    ASSERT_TRUE(lib->makeBaseArgs("m", args).ok());
-    ASSERT_TRUE(lib->addAuth(args, false).ok());
-    EXPECT_EQ(entries(args), expected);
+    ASSERT_OK(lib->makeBaseArgs("m", args));
+    ASSERT_OK(lib->addAuth(args, false));
+    EXPECT_EQ(entries(args), application);
 
     signIn("", "SS");
-    ASSERT_TRUE(call().ok());
-    EXPECT_EQ(entries(lastFields()), expected);
-}
+    ASSERT_OK(call());
+    EXPECT_EQ(entries(lastFields()), application);
 
-// md5("api_key=kcall_id=1method=msession_key=SKv=1.0SS").
-TEST_F(RequestTest, SessionCallCarriesSessionKeyAndCallIdAndIsSignedWithTheSessionSecret) {
     signIn("SK", "SS");
-    ASSERT_TRUE(call().ok());
+    ASSERT_OK(call());
     auto sent = http.exchanges();
-    ASSERT_EQ(sent.size(), 1u);
-    EXPECT_EQ(sent[0].url, "http://api.facebook.com/restserver.php");
-    EXPECT_EQ(entries(sent[0].fields), (Fields{{"api_key", "k"},
-                                               {"call_id", "1"},
-                                               {"method", "m"},
-                                               {"session_key", "SK"},
-                                               {"sig", "0f8286907dce2e0d651ddbb0516239ba"},
+    ASSERT_EQ(sent.size(), 2u);
+    EXPECT_EQ(sent[1].url, "http://api.facebook.com/restserver.php");
+    EXPECT_EQ(entries(sent[1].fields), (Fields{{"api_key", "k"}, {"call_id", "1"}, {"method", "m"},
+                                               {"session_key", "SK"}, {"sig", "0f8286907dce2e0d651ddbb0516239ba"},
                                                {"v", "1.0"}}));
 }
 
@@ -52,24 +48,24 @@ TEST_F(RequestTest, CallIdCountsSessionCallsOverTheClientsLife) {
     for (int n = 0; n < 4; ++n) {
         if (n == 2) {
             Map<String, String> app;
-            ASSERT_TRUE(lib->addAuth(app, false).ok());
+            ASSERT_OK(lib->addAuth(app, false));
             signIn("SK2", "SS2");
         }
-        ASSERT_TRUE(call().ok());
+        ASSERT_OK(call());
         ids.push_back(lastFields().search("call_id")->str());
     }
     EXPECT_EQ(ids, (std::vector<std::string>{"1", "2", "3", "4"}));
 }
 
 TEST_F(RequestTest, CallsThatCannotAuthenticateAnswerNotSignedInWithoutARequest) {
-    EXPECT_EQ(call().code(), kNotSignedIn);  // no session
+    EXPECT_CODE(call(), kNotSignedIn);  // no session
     auto noApp = makeSmart<FacebookLibrary::ConnectionInfo>(kTag);
-    ASSERT_TRUE(noApp->setSessionConfig("SK", "SS", "1", false, false).ok());
+    ASSERT_OK(noApp->setSessionConfig("SK", "SS", "1", false, false));
     lib = makeSmart<FacebookLibrary>();
-    ASSERT_TRUE(lib->setup(noApp).ok());
-    EXPECT_EQ(call().code(), kNotSignedIn);  // no application data
+    ASSERT_OK(lib->setup(noApp));
+    EXPECT_CODE(call(), kNotSignedIn);  // no application data
     lib = makeSmart<FacebookLibrary>();
-    EXPECT_EQ(call().code(), kNotSignedIn);  // no settings
+    EXPECT_CODE(call(), kNotSignedIn);  // no settings
     EXPECT_TRUE(http.exchanges().empty());
 }
 
@@ -79,7 +75,7 @@ TEST_F(RequestTest, OnlyStatus200To299IsSuccess) {
         bool const ok = status >= 200 && status <= 299;
         http.queue({status, "<ok/>", {}});
         String response = "before";
-        EXPECT_EQ(call(&response).code(), ok ? kSuccess : kFailure) << status;
+        EXPECT_CODE(call(&response), ok ? kSuccess : kFailure) << status;
         EXPECT_EQ(response, ok ? "<ok/>" : "") << status;
     }
 }
@@ -87,11 +83,11 @@ TEST_F(RequestTest, OnlyStatus200To299IsSuccess) {
 TEST_F(RequestTest, TransportFailuresAreFailures) {
     signIn();
     http.queue({0, "", TRELM_ERROR(kFailure)});
-    EXPECT_EQ(call().code(), kFailure);
+    EXPECT_CODE(call(), kFailure);
     http.refuseRequests(true);
-    EXPECT_EQ(call().code(), kFailure);
-    ASSERT_TRUE(registry.remove("HttpRequestFactory").ok());
-    EXPECT_EQ(call().code(), kFailure);
+    EXPECT_CODE(call(), kFailure);
+    ASSERT_OK(registry.remove("HttpRequestFactory"));
+    EXPECT_CODE(call(), kFailure);
 }
 
 // The service's error codes, and which of them drop the session (in memory and in the store)
@@ -108,17 +104,17 @@ TEST_F(RequestTest, ServiceErrorsTranslateAndSessionErrorsDropTheSession) {
     };
     for (Case const& c : cases) {
         SCOPED_TRACE(std::string("service code '") + c.serviceCode + "'");
-        EXPECT_EQ(FacebookLibrary::resolveBaseFacebookErrorCode(c.serviceCode).code(), c.code);
+        EXPECT_CODE(FacebookLibrary::resolveBaseFacebookErrorCode(c.serviceCode), c.code);
         signIn("SK", "SS", "42");
         store.clearRecords();
         http.queue(String("<error_response><error_code>") + c.serviceCode +
                    "</error_code><error_msg>m</error_msg></error_response>");
-        EXPECT_EQ(call().code(), c.code);
+        EXPECT_CODE(call(), c.code);
 
         bool const drops = c.code == kNotSignedIn;
         String user;
         EXPECT_EQ(info->hasSession(), !drops);
-        ASSERT_TRUE(info->getUserId(user).ok());
+        ASSERT_OK(info->getUserId(user));
         EXPECT_EQ(user, "42");
         auto records = store.records();
         ASSERT_EQ(records.size(), drops ? 1u : 0u);
@@ -133,8 +129,8 @@ TEST_F(RequestTest, ServiceErrorsTranslateAndSessionErrorsDropTheSession) {
 TEST_F(RequestTest, RefusedSessionFailsTheNextCallLocally) {
     signIn();
     http.queue(String("<error_response><error_code>102</error_code></error_response>"));
-    EXPECT_EQ(call().code(), kNotSignedIn);
-    EXPECT_EQ(call().code(), kNotSignedIn);
+    EXPECT_CODE(call(), kNotSignedIn);
+    EXPECT_CODE(call(), kNotSignedIn);
     EXPECT_EQ(http.exchanges().size(), 1u);
 }
 

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <cstdio>
 #include <mutex>
 #include <string>
@@ -146,12 +148,12 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
         SCOPED_TRACE(c.name);
         String const name("change" + std::to_string(n++));
         Configuration::Group group = host->demoGroup(name, c.configuredSession);
-        group.set("haveExtendedApi", Variant(c.extendedApi));
-        group.set("wipeComponents", Variant(Vector<String>{"observer"}));
-        group.set("wakeupComponents", Variant(Vector<String>{"observer"}));
+        ASSERT_OK(group.set("haveExtendedApi", Variant(c.extendedApi)));
+        ASSERT_OK(group.set("wipeComponents", Variant(Vector<String>{"observer"})));
+        ASSERT_OK(group.set("wakeupComponents", Variant(Vector<String>{"observer"})));
         if (c.configuredLogin) {
-            group.set(kLogin, Variant(emu::DemoAccount::email));
-            group.set(kPassword, Variant(emu::DemoAccount::password));
+            ASSERT_OK(group.set(kLogin, Variant(emu::DemoAccount::email)));
+            ASSERT_OK(group.set(kPassword, Variant(emu::DemoAccount::password)));
         }
         FacebookSource& source = host->addSource(group);
 
@@ -159,17 +161,17 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
         Set<Configuration::Value> values;
         for (auto const& [key, value] : c.stored) {
             std::string const text = value == "$session" ? fresh.key : value == "$secret" ? fresh.secret : value;
-            values.insert(Configuration::Value(key, Variant(String(text))));
+            ASSERT_OK(values.insert(Configuration::Value(key, Variant(String(text)))));
         }
-        ASSERT_EQ(host->runtime().store(name, values).code(), kSuccess);
+        ASSERT_OK(host->runtime().store(name, values));
         observer->clear();
         host->emulator().log().clear();
 
         Set<String> changed;
-        for (char const* key : c.changed) changed.insert(key);
+        for (char const* key : c.changed) ASSERT_OK(changed.insert(key));
         ConfigurationChangedMessage msg(changed);
         uError err = source.onMessage(msg);
-        EXPECT_EQ(err.code(), kSuccess) << err;
+        EXPECT_OK(err);
 
         EXPECT_EQ(observer->events(), c.events);
         auto logins = host->emulator().log().entriesFor("auth.login");
@@ -177,7 +179,7 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
         for (auto const& login : logins) EXPECT_TRUE(login.https);
 
         IServiceSource::GetUserSidMessage sid;
-        EXPECT_EQ(source.onMessage(sid).code(), c.userCode);
+        EXPECT_CODE(source.onMessage(sid), c.userCode);
         if (c.userCode == kSuccess) {
             EXPECT_EQ(sid.result.str(), kDemoUid);
         }
@@ -186,24 +188,24 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
             Vector<IQueryItems::Column>(),
             Vector<IQueryItems::Constraint>{IQueryItems::Constraint{
                 Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), IQueryItems::Constraint::Equal}});
-        ASSERT_EQ(source.onMessage(query).code(), kSuccess);
+        ASSERT_OK(source.onMessage(query));
         SmartPtr<Map<String, Variant>> row;
-        EXPECT_EQ(query.cursor->getRow(row).code(), c.queryCode);
+        EXPECT_CODE(query.cursor->getRow(row), c.queryCode);
     }
 }
 
 TEST_F(ConfigurationChangeTest, ChangesBeforeStartupFailClearlyWhenTheyNeedTheClient) {
     FacebookSource& source = host->addBareSource("unstarted");
     ConfigurationChangedMessage login(Set<String>{kLogin});
-    EXPECT_EQ(source.onMessage(login).code(), kNotSet) << "no settings yet";
+    EXPECT_CODE(source.onMessage(login), kNotSet) << "no settings yet";
 
     Configuration::Group group = host->demoGroup("unstarted", false);
-    group.set("haveExtendedApi", Variant(false));
-    ASSERT_EQ(source.sendConfig(group).code(), kSuccess);
+    ASSERT_OK(group.set("haveExtendedApi", Variant(false)));
+    ASSERT_OK(source.sendConfig(group));
     ConfigurationChangedMessage session(Set<String>{kSessionId});
-    EXPECT_EQ(source.onMessage(session).code(), kNotSet) << "no client yet";
+    EXPECT_CODE(source.onMessage(session), kNotSet) << "no client yet";
     ConfigurationChangedMessage unrelated(Set<String>{"wipeComponents"});
-    EXPECT_EQ(source.onMessage(unrelated).code(), kSuccess);
+    EXPECT_OK(source.onMessage(unrelated));
 }
 
 }  // namespace

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <algorithm>
 #include <memory>
 #include <set>
@@ -39,16 +41,9 @@ std::string pageBefore(std::string const& uid) {
 class ContactCursorTest : public ::testing::Test {
 protected:
     static void SetUpTestSuite() {
-        emu::GeneratorOptions generator;
-        generator.users = kFriends + 200;
-        generator.demoFriends = kFriends;
-        generator.friendsPerUser = 2;
-        generator.albumsPerUser = 1;
-        generator.photosPerAlbum = 1;
-        generator.postsPerUser = 1;
-        generator.threadsPerUser = 1;
-        generator.messagesPerThread = 1;
-        host = new EmulatorHost(generator);
+        host = new EmulatorHost(emu::GeneratorOptions{.users = kFriends + 200, .demoFriends = kFriends,
+                                                      .friendsPerUser = 2, .albumsPerUser = 1, .photosPerAlbum = 1,
+                                                      .postsPerUser = 1, .threadsPerUser = 1, .messagesPerThread = 1});
         std::string error;
         ASSERT_TRUE(host->start(error)) << error;
         source = &host->addSource(host->demoGroup(kSourceName, true));
@@ -78,17 +73,17 @@ protected:
     static Cursor open(std::vector<Constraint> extra = {}) {
         Vector<Constraint> constraints{
             Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), Constraint::Equal}};
-        for (Constraint const& c : extra) constraints.pushBack(c);
+        for (Constraint const& c : extra) EXPECT_OK(constraints.pushBack(c));
         IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints);
         uError err = source->onMessage(msg);
-        EXPECT_EQ(err.code(), kSuccess) << err;
+        EXPECT_CODE(err, kSuccess);
         return msg.cursor;
     }
 
     static std::string uidAt(Cursor const& cursor) {
         SmartPtr<Map<String, Variant>> row;
         uError err = cursor->getRow(row);
-        EXPECT_EQ(err.code(), kSuccess) << err;
+        EXPECT_CODE(err, kSuccess);
         if (!row) return "";
         Variant const* uid = row->search("core_contact_service_id");
         return uid ? uid->asString().str() : "";
@@ -96,7 +91,7 @@ protected:
 
     static GUID guidAt(Cursor const& cursor) {
         SmartPtr<Map<String, Variant>> row;
-        EXPECT_EQ(cursor->getRow(row).code(), kSuccess);
+        EXPECT_CODE(cursor->getRow(row), kSuccess);
         return row ? row->search("core_object_id")->asGUID() : GUID();
     }
 
@@ -109,49 +104,41 @@ EmulatorHost* ContactCursorTest::host = nullptr;
 FacebookSource* ContactCursorTest::source = nullptr;
 std::vector<std::string>* ContactCursorTest::expected = nullptr;
 
-TEST_F(ContactCursorTest, ForwardSeeksVisitEveryFriendOnceInOrderWithOneStatementPerPage) {
-    Cursor cursor = open();
-    ASSERT_TRUE(cursor);
-    std::vector<std::string> seen;
-    std::set<GUID> guids;
-    int moved = 1;
-    while (moved != 0) {
-        SmartPtr<Map<String, Variant>> row;
-        ASSERT_EQ(cursor->getRow(row).code(), kSuccess);
-        seen.push_back(row->search("core_contact_service_id")->asString().str());
-        guids.insert(row->search("core_object_id")->asGUID());
-        ASSERT_EQ(cursor->seek(1, moved).code(), seen.size() == size_t(kFriends) ? unsigned(kNoData) : kSuccess);
-    }
-    EXPECT_EQ(seen, *expected);
-    EXPECT_EQ(guids.size(), size_t(kFriends)) << "every friend has a GUID of its own";
+// Forward from the first friend and backward from the last, one row at a time: every friend once,
+// each with a GUID of its own, with the first page, one page past the edge row of each window, and
+// one more that finds the end.
+TEST_F(ContactCursorTest, SingleStepsEitherWayVisitEveryFriendOnceWithOneStatementPerPage) {
+    for (int step : {1, -1}) {
+        SCOPED_TRACE(step > 0 ? "forward" : "backward");
+        host->emulator().log().clear();
+        Cursor cursor = open();
+        ASSERT_TRUE(cursor);
+        if (step < 0) {
+            ASSERT_CODE(cursor->jumpEnd(), kSuccess);
+        }
+        std::vector<std::string> seen;
+        std::set<GUID> guids;
+        for (int moved = step; moved != 0;) {
+            SmartPtr<Map<String, Variant>> row;
+            ASSERT_CODE(cursor->getRow(row), kSuccess);
+            seen.push_back(row->search("core_contact_service_id")->asString().str());
+            guids.insert(row->search("core_object_id")->asGUID());
+            ASSERT_CODE(cursor->seek(step, moved), seen.size() == size_t(kFriends) ? unsigned(kNoData) : kSuccess);
+        }
+        if (step < 0) std::reverse(seen.begin(), seen.end());
+        EXPECT_EQ(seen, *expected);
+        EXPECT_EQ(guids.size(), size_t(kFriends));
 
-    // The first page, one page after the last row of each window, and one more that finds the end.
-    std::vector<std::string> statements = host->fqlStatements();
-    ASSERT_EQ(statements.size(), size_t(kFriends / kWindow + 1));
-    EXPECT_EQ(statements[0], firstPage());
-    for (size_t k = 1; k < statements.size(); ++k) {
-        EXPECT_EQ(statements[k], pageAfter((*expected)[k * kWindow - 1])) << "page " << k;
-    }
-}
-
-TEST_F(ContactCursorTest, BackwardSeeksFromTheEndVisitEveryFriendInReverse) {
-    Cursor cursor = open();
-    ASSERT_EQ(cursor->jumpEnd().code(), kSuccess);
-    std::vector<std::string> seen;
-    int moved = -1;
-    while (moved != 0) {
-        seen.push_back(uidAt(cursor));
-        ASSERT_TRUE(cursor->seek(-1, moved).ok());
-    }
-    std::reverse(seen.begin(), seen.end());
-    EXPECT_EQ(seen, *expected);
-
-    std::vector<std::string> statements = host->fqlStatements();
-    ASSERT_EQ(statements.size(), size_t(kFriends / kWindow + 1));
-    EXPECT_EQ(statements[0], "select uid,name,pic_big from user where " + kFriendCondition +
-                                 " order by concat(uid,' ') desc limit 150");
-    for (size_t k = 1; k < statements.size(); ++k) {
-        EXPECT_EQ(statements[k], pageBefore((*expected)[kFriends - k * kWindow])) << "page " << k;
+        std::vector<std::string> statements = host->fqlStatements();
+        ASSERT_EQ(statements.size(), size_t(kFriends / kWindow + 1));
+        EXPECT_EQ(statements[0], step > 0 ? firstPage()
+                                          : "select uid,name,pic_big from user where " + kFriendCondition +
+                                                " order by concat(uid,' ') desc limit 150");
+        for (size_t k = 1; k < statements.size(); ++k) {
+            EXPECT_EQ(statements[k], step > 0 ? pageAfter((*expected)[k * kWindow - 1])
+                                              : pageBefore((*expected)[kFriends - k * kWindow]))
+                << "page " << k;
+        }
     }
 }
 
@@ -176,6 +163,8 @@ TEST_F(ContactCursorTest, JumpsAndLongSeeksLandOnTheRightFriendAndKnowTheirIndex
         {Move::Jump, kFriends, kNoData, 2999, 0},
         {Move::Jump, 149, kSuccess, 149, 0},
         {Move::Jump, 150, kSuccess, 150, 0},
+        {Move::Seek, -100, kSuccess, 50, -100},     // a short backward window: rows 0..50
+        {Move::Seek, 1, kSuccess, 51, 1},           // off its last row: the next page, not the end
         {Move::End, 0, kSuccess, 2999, 0},
         {Move::Seek, -150, kSuccess, 2849, -150},
         {Move::Beginning, 0, kSuccess, 0, 0},
@@ -191,13 +180,13 @@ TEST_F(ContactCursorTest, JumpsAndLongSeeksLandOnTheRightFriendAndKnowTheirIndex
             case Move::Beginning: err = cursor->jumpBeginning(); break;
             case Move::End: err = cursor->jumpEnd(); break;
         }
-        ASSERT_EQ(err.code(), m.code) << err;
+        ASSERT_CODE(err, m.code);
         if (m.op == Move::Seek) {
             EXPECT_EQ(moved, m.moved);
         }
         EXPECT_EQ(uidAt(cursor), (*expected)[m.index]);
         unsigned index = 0;
-        ASSERT_EQ(cursor->curRow(index).code(), kSuccess);
+        ASSERT_CODE(cursor->curRow(index), kSuccess);
         EXPECT_EQ(index, unsigned(m.index));
     }
     // The cursor keeps the GUIDs it gave out across refills.
@@ -207,14 +196,14 @@ TEST_F(ContactCursorTest, JumpsAndLongSeeksLandOnTheRightFriendAndKnowTheirIndex
 TEST_F(ContactCursorTest, CountingAndPositionStatementsAskForTinyRowsWithoutOrdering) {
     Cursor cursor = open();
     unsigned count = 0;
-    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);
+    ASSERT_CODE(cursor->numRows(count), kSuccess);
     EXPECT_EQ(count, unsigned(kFriends));
-    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);  // from memory
+    ASSERT_CODE(cursor->numRows(count), kSuccess);  // from memory
     EXPECT_EQ(count, unsigned(kFriends));
 
-    ASSERT_EQ(cursor->jump(200).code(), kSuccess);
+    ASSERT_CODE(cursor->jump(200), kSuccess);
     unsigned index = 0;
-    ASSERT_EQ(cursor->curRow(index).code(), kSuccess);
+    ASSERT_CODE(cursor->curRow(index), kSuccess);
     EXPECT_EQ(index, 200u);
 
     std::string const& at200 = (*expected)[200];
@@ -234,14 +223,14 @@ TEST_F(ContactCursorTest, ShortFirstPageGivesTheCountAndRepeatedJumpsAskNothing)
     Cursor cursor = open({Constraint{Metadata::Key("core_contact_service_id", TRELM_TYPES::STRING),
                                      Variant(Vector<String>{String(e[20]), String(e[5]), String(e[10])}),
                                      Constraint::InList}});
-    ASSERT_EQ(cursor->jumpBeginning().code(), kSuccess);
-    ASSERT_EQ(cursor->jumpBeginning().code(), kSuccess);
+    ASSERT_CODE(cursor->jumpBeginning(), kSuccess);
+    ASSERT_CODE(cursor->jumpBeginning(), kSuccess);
     unsigned count = 0;
-    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);
+    ASSERT_CODE(cursor->numRows(count), kSuccess);
     EXPECT_EQ(count, 3u);
     EXPECT_EQ(uidAt(cursor), e[5]);
     int moved = 0;
-    EXPECT_EQ(cursor->seek(10, moved).code(), kSuccess);  // the window holds the whole result
+    EXPECT_CODE(cursor->seek(10, moved), kSuccess);  // the window holds the whole result
     EXPECT_EQ(moved, 2);
     EXPECT_EQ(uidAt(cursor), e[20]);
 
@@ -254,24 +243,24 @@ TEST_F(ContactCursorTest, QueryThatCannotMatchAnswersNothingWithoutAsking) {
     Cursor cursor = open({Constraint{Metadata::Key("core_contact_service", TRELM_TYPES::STRING), Variant("Other"),
                                      Constraint::Equal}});
     SmartPtr<Map<String, Variant>> row = makeSmart<Map<String, Variant>>();
-    EXPECT_EQ(cursor->getRow(row).code(), kNoData);
+    EXPECT_CODE(cursor->getRow(row), kNoData);
     EXPECT_FALSE(row);
     unsigned count = 7;
-    ASSERT_EQ(cursor->numRows(count).code(), kSuccess);
+    ASSERT_CODE(cursor->numRows(count), kSuccess);
     EXPECT_EQ(count, 0u);
-    EXPECT_EQ(cursor->jumpEnd().code(), kNoData);
+    EXPECT_CODE(cursor->jumpEnd(), kNoData);
     int moved = 5;
-    EXPECT_EQ(cursor->seek(3, moved).code(), kSuccess);
+    EXPECT_CODE(cursor->seek(3, moved), kSuccess);
     EXPECT_EQ(moved, 0);
     Vector<SmartPtr<Map<String, Variant>>> rows;
-    EXPECT_EQ(cursor->getRows(10, rows).code(), kNotSupported);
+    EXPECT_CODE(cursor->getRows(10, rows), kNotSupported);
     EXPECT_TRUE(host->fqlStatements().empty());
 }
 
 TEST_F(ContactCursorTest, RecordsCarryContactFieldsAndTheSourcesIdentityAsACopy) {
     Cursor cursor = open();
     SmartPtr<Map<String, Variant>> row;
-    ASSERT_EQ(cursor->getRow(row).code(), kSuccess);
+    ASSERT_CODE(cursor->getRow(row), kSuccess);
     std::vector<std::pair<char const*, Variant>> const wanted = {
         {"core_object_type", Variant(2)},
         {"core_contact_service", Variant("Facebook")},
@@ -289,9 +278,9 @@ TEST_F(ContactCursorTest, RecordsCarryContactFieldsAndTheSourcesIdentityAsACopy)
     EXPECT_EQ(*row->search("core_contact_name"), *row->search("core_contact_display_name"));
     EXPECT_EQ(row->search("core_contact_profile_url"), nullptr) << "not in the field list";
 
-    row->insert("core_contact_name", Variant("changed"));
+    ASSERT_OK(row->insert("core_contact_name", Variant("changed")));
     SmartPtr<Map<String, Variant>> again;
-    ASSERT_EQ(cursor->getRow(again).code(), kSuccess);
+    ASSERT_CODE(cursor->getRow(again), kSuccess);
     EXPECT_NE(again->search("core_contact_name")->asString(), "changed");
 }
 

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <algorithm>
 #include <cstdlib>
 #include <filesystem>
@@ -49,7 +51,7 @@ protected:
             Vector<IQueryItems::Column>(),
             Vector<IQueryItems::Constraint>{IQueryItems::Constraint{
                 Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), IQueryItems::Constraint::Equal}});
-        EXPECT_EQ(source->onMessage(msg).code(), kSuccess);
+        EXPECT_OK(source->onMessage(msg));
         return msg.cursor;
     }
 
@@ -66,11 +68,9 @@ std::string* DataOperationsIntegrationTest::photo = nullptr;
 
 TEST_F(DataOperationsIntegrationTest, InsertedStatusIsPostedAndAppearsInTheStream) {
     std::string const text = "reading about keyset paging";
-    Record status;
-    status.insert("core_object_type", Variant(4));
-    status.insert("core_event_text", Variant(text.c_str()));
+    Record status{{"core_object_type", Variant(4)}, {"core_event_text", Variant(text.c_str())}};
     uError err = source->insert(status);
-    ASSERT_EQ(err.code(), kSuccess) << err;
+    ASSERT_OK(err);
 
     auto calls = host->emulator().log().entriesFor("users.setStatus");
     ASSERT_EQ(calls.size(), 1u);
@@ -103,13 +103,15 @@ TEST_F(DataOperationsIntegrationTest, InsertedPhotoIsUploadedAndItsIdWrittenBack
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
         host->emulator().log().clear();
-        Record media;
-        media.insert("core_object_type", Variant(9));
-        media.insert("media_uri", Variant(String("file://" + *photo)));
-        if (c.caption != nullptr) media.insert("media_notes", Variant(c.caption));
-        if (c.intoAlbum) media.insert("facebook_media_album_service_id", Variant(String(albums[0])));
+        Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String("file://" + *photo))}};
+        if (c.caption != nullptr) {
+            ASSERT_OK(media.insert("media_notes", Variant(c.caption)));
+        }
+        if (c.intoAlbum) {
+            ASSERT_OK(media.insert("facebook_media_album_service_id", Variant(String(albums[0]))));
+        }
         uError err = source->insert(media);
-        ASSERT_EQ(err.code(), kSuccess) << err;
+        ASSERT_OK(err);
 
         auto uploads = host->emulator().log().entriesFor("photos.upload");
         ASSERT_EQ(uploads.size(), 1u);
@@ -135,10 +137,8 @@ TEST_F(DataOperationsIntegrationTest, FailedUploadLeavesTheRecordWithoutServiceI
     emu::FaultRule unavailable;
     unavailable.errorCode = 2;
     host->emulator().faults().set("photos.upload", unavailable);
-    Record media;
-    media.insert("core_object_type", Variant(9));
-    media.insert("media_uri", Variant(String(*photo)));
-    EXPECT_EQ(source->insert(media).code(), kServiceUnavailable);
+    Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String(*photo))}};
+    EXPECT_CODE(source->insert(media), kServiceUnavailable);
     EXPECT_EQ(media.search("core_service_id"), nullptr);
 }
 
@@ -147,26 +147,25 @@ TEST_F(DataOperationsIntegrationTest, RetrieveFindsListedRecordsUntilTheLastCurs
     SmartPtr<IQueryItems::ICursor> first = openContacts();
     SmartPtr<IQueryItems::ICursor> second = openContacts();
     SmartPtr<Record> row;
-    ASSERT_EQ(first->getRow(row).code(), kSuccess);
+    ASSERT_OK(first->getRow(row));
     SmartPtr<Record> same;
-    ASSERT_EQ(second->getRow(same).code(), kSuccess);
+    ASSERT_OK(second->getRow(same));
     GUID const guid = row->search("core_object_id")->asGUID();
     ASSERT_EQ(same->search("core_object_id")->asGUID(), guid) << "one GUID per friend while both cursors live";
 
-    Record out;
-    out.insert("caller_key", Variant("kept"));
+    Record out{{"caller_key", Variant("kept")}};
     uError err = source->retrieve(guid, out, false);
-    ASSERT_EQ(err.code(), kSuccess) << err;
+    ASSERT_OK(err);
     for (auto const& [key, value] : *row) EXPECT_EQ(*out.search(key), value) << key;
     EXPECT_EQ(out.search("caller_key")->asString(), "kept");
     EXPECT_EQ(out.size(), row->size() + 1);
 
     first.reset();
     Record again;
-    EXPECT_EQ(source->retrieve(guid, again, false).code(), kSuccess) << "the second cursor still holds it";
+    EXPECT_OK(source->retrieve(guid, again, false)) << "the second cursor still holds it";
     second.reset();
     Record gone;
-    EXPECT_EQ(source->retrieve(guid, gone, false).code(), kNotFound);
+    EXPECT_CODE(source->retrieve(guid, gone, false), kNotFound);
     EXPECT_TRUE(gone.empty());
 }
 

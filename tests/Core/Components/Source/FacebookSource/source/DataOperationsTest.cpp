@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <functional>
 #include <string>
 #include <vector>
@@ -25,18 +27,16 @@ public:
 };
 
 Configuration::Group configuredGroup() {
-    Configuration::Group group(kSourceName);
-    group.set("facebook_source_appkey", Variant("key"));
-    group.set("facebook_source_appsecret", Variant("secret"));
-    group.set("facebook_source_session_user", Variant("100000001"));
-    group.set("facebook_source_session_id", Variant("session"));
-    group.set("facebook_source_session_secret", Variant("session-secret"));
-    return group;
+    return Configuration::Group(kSourceName, {{"facebook_source_appkey", Variant("key")},
+                                              {"facebook_source_appsecret", Variant("secret")},
+                                              {"facebook_source_session_user", Variant("100000001")},
+                                              {"facebook_source_session_id", Variant("session")},
+                                              {"facebook_source_session_secret", Variant("session-secret")}});
 }
 
 Record record(std::initializer_list<std::pair<char const*, Variant>> entries) {
     Record r;
-    for (auto const& [key, value] : entries) r.insert(key, value);
+    for (auto const& [key, value] : entries) EXPECT_OK(r.insert(key, value));
     return r;
 }
 
@@ -44,8 +44,8 @@ Record record(std::initializer_list<std::pair<char const*, Variant>> entries) {
 // (no HTTP factory is registered, so a request would fail with another code).
 TEST(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
     CheckableSource source(kSourceName);
-    ASSERT_EQ(source.sendConfig(configuredGroup()).code(), kSuccess);
-    ASSERT_EQ(source.startup().code(), kSuccess);
+    ASSERT_OK(source.sendConfig(configuredGroup()));
+    ASSERT_OK(source.startup());
 
     struct Case {
         char const* name;
@@ -75,7 +75,7 @@ TEST(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
     };
     for (Case const& c : cases) {
         uError err = c.run();
-        EXPECT_EQ(err.code(), c.code) << c.name << ": " << err;
+        EXPECT_CODE(err, c.code) << c.name << ": " << err;
     }
     EXPECT_TRUE(scratch.empty());
 }
@@ -99,20 +99,28 @@ TEST(DataOperationsTest, InputCheckAcceptsOnlyCompleteStatusAndPhotoRecords) {
         {"flag set", record({{"core_object_type", 4}, {"core_event_text", "hi"}}), true, kDataOpNotSupported},
     };
     for (Case const& c : cases) {
-        EXPECT_EQ(source.manageInputDataImpl(static_cast<Record const&>(c.input), c.flag).code(), c.code) << c.name;
+        EXPECT_CODE(source.manageInputDataImpl(static_cast<Record const&>(c.input), c.flag), c.code) << c.name;
     }
 }
 
 TEST(DataOperationsTest, OperationsBeforeStartupFailWithNotSet) {
     FacebookSource source(kSourceName);
     Record status = record({{"core_object_type", 4}, {"core_event_text", "hi"}});
-    EXPECT_EQ(source.insert(status).code(), kNotSet);
+    EXPECT_CODE(source.insert(status), kNotSet);
     Record out;
-    EXPECT_EQ(source.retrieve(GUID::generate(), out, false).code(), kNotSet);
+    EXPECT_CODE(source.retrieve(GUID::generate(), out, false), kNotSet);
     IServiceSource::GetUserSidMessage sid;
-    EXPECT_EQ(source.onMessage(sid).code(), kNotSet);
+    EXPECT_CODE(source.onMessage(sid), kNotSet);
+    // A query gets no cursor without a client, before and after a configuration.
+    IQueryItems::StartQueryMessage query(Vector<IQueryItems::Column>(), Vector<IQueryItems::Constraint>{
+        IQueryItems::Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2),
+                                IQueryItems::Constraint::Equal}});
+    EXPECT_CODE(source.onMessage(query), kNotSet);
     // Starting without a configuration is refused too, rather than making a client without settings.
-    EXPECT_EQ(source.startup().code(), kNotSet);
+    EXPECT_CODE(source.startup(), kNotSet);
+    ASSERT_OK(source.sendConfig(Configuration::Group(kSourceName)));
+    EXPECT_CODE(source.onMessage(query), kNotSet);
+    EXPECT_FALSE(query.cursor);
 }
 
 // The dump pads every key to 30 columns; a longer key gets (length - 30) spaces instead.

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 namespace trelm::test {
 
 EmulatorHost::EmulatorHost(emu::GeneratorOptions const& generator) {
@@ -11,7 +13,8 @@ EmulatorHost::EmulatorHost(emu::GeneratorOptions const& generator) {
 }
 
 EmulatorHost::~EmulatorHost() {
-    for (String const& name : registered_) registry_.remove(name);
+    // Teardown: a name that is already gone needs nothing more.
+    for (String const& name : registered_) registry_.remove(name).ignore();
     registry_.deactivate();
     sources_.clear();
     emulator_->stop();
@@ -31,16 +34,15 @@ bool EmulatorHost::start(std::string& error) {
 }
 
 Configuration::Group EmulatorHost::demoGroup(String const& name, bool session) {
-    Configuration::Group group(name);
-    group.set("facebook_source_appkey", Variant(emu::DemoAccount::apiKey));
-    group.set("facebook_source_appsecret", Variant(emu::DemoAccount::appSecret));
+    Map<String, Variant> values{{"facebook_source_appkey", Variant(emu::DemoAccount::apiKey)},
+                                {"facebook_source_appsecret", Variant(emu::DemoAccount::appSecret)}};
     if (session) {
         emu::Session s = emulator_->loginDemo();
-        group.set("facebook_source_session_user", Variant(String::from(static_cast<long long>(s.uid))));
-        group.set("facebook_source_session_id", Variant(String(s.key)));
-        group.set("facebook_source_session_secret", Variant(String(s.secret)));
+        EXPECT_OK(values.insert("facebook_source_session_user", Variant(String::from(static_cast<long long>(s.uid)))));
+        EXPECT_OK(values.insert("facebook_source_session_id", Variant(String(s.key))));
+        EXPECT_OK(values.insert("facebook_source_session_secret", Variant(String(s.secret))));
     }
-    return group;
+    return Configuration::Group(name, values);
 }
 
 FacebookSource& EmulatorHost::addBareSource(String const& name) {
@@ -51,26 +53,24 @@ FacebookSource& EmulatorHost::addBareSource(String const& name) {
 
 FacebookSource& EmulatorHost::addSource(Configuration::Group const& group) {
     FacebookSource& source = addBareSource(group.name());
-    EXPECT_EQ(source.sendConfig(group).code(), kSuccess);
-    EXPECT_EQ(source.startup().code(), kSuccess);
+    EXPECT_OK(source.sendConfig(group));
+    EXPECT_OK(source.startup());
     return source;
 }
 
 void EmulatorHost::addComponent(String const& name, Component& component) {
-    EXPECT_EQ(registry_.add(name, &component).code(), kSuccess);
+    EXPECT_OK(registry_.add(name, &component));
     registered_.push_back(name);
 }
 
 SmartPtr<FacebookLibrary> EmulatorHost::demoClient() {
     emu::Session session = emulator_->loginDemo();
     auto info = makeSmart<FacebookLibrary::ConnectionInfo>("reference");
-    EXPECT_EQ(info->setAppConfig(emu::DemoAccount::apiKey, emu::DemoAccount::appSecret).code(), kSuccess);
-    EXPECT_EQ(info->setSessionConfig(String(session.key), String(session.secret),
-                                     String::from(static_cast<long long>(session.uid)), false, false)
-                  .code(),
-              kSuccess);
+    EXPECT_OK(info->setAppConfig(emu::DemoAccount::apiKey, emu::DemoAccount::appSecret));
+    EXPECT_OK(info->setSessionConfig(String(session.key), String(session.secret),
+                                     String::from(static_cast<long long>(session.uid)), false, false));
     auto lib = makeSmart<FacebookLibrary>();
-    EXPECT_EQ(lib->setup(info).code(), kSuccess);
+    EXPECT_OK(lib->setup(info));
     return lib;
 }
 
@@ -79,7 +79,7 @@ std::vector<std::string> EmulatorHost::fqlColumn(std::string const& query, std::
     Vector<Map<String, String>> rows;
     unsigned count = 0;
     uError err = demoClient()->runFqlQuery(String(query), String(table), rows, 0, count);
-    EXPECT_EQ(err.code(), kSuccess) << err;
+    EXPECT_OK(err);
     std::vector<std::string> out;
     for (auto const& row : rows) {
         String const* value = row.search(String(field));

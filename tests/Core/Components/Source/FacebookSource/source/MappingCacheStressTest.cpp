@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <atomic>
 #include <chrono>
 #include <random>
@@ -23,7 +25,7 @@ Metadata::Key const kKey("core_contact_service_id", TRELM_TYPES::STRING);
 // for the whole run must keep its GUIDs whoever maps them.
 TEST(MappingCacheStressTest, CursorsOnSeveralThreadsKeepCountsAndGuidsConsistent) {
     Cache cache;
-    ASSERT_EQ(cache.setup().code(), kSuccess);
+    ASSERT_OK(cache.setup());
 
     constexpr int kThreads = 4;
     constexpr int kCursorsPerThread = 30;
@@ -33,10 +35,10 @@ TEST(MappingCacheStressTest, CursorsOnSeveralThreadsKeepCountsAndGuidsConsistent
     constexpr int kPinned = 20;
 
     String pinTag;
-    ASSERT_EQ(cache.getTag(pinTag).code(), kSuccess);
+    ASSERT_OK(cache.getTag(pinTag));
     std::vector<GUID> pinned(kPinned);
     for (int i = 0; i < kPinned; ++i) {
-        ASSERT_EQ(cache.getGuid(pinTag, Cache::SidMapKey(kKey, String::from(i)), true, pinned[i]).code(), kSuccess);
+        ASSERT_OK(cache.getGuid(pinTag, Cache::SidMapKey(kKey, String::from(i)), true, pinned[i]));
     }
 
     std::atomic<int> failures{0};
@@ -64,9 +66,8 @@ TEST(MappingCacheStressTest, CursorsOnSeveralThreadsKeepCountsAndGuidsConsistent
                         ++failures;
                         ADD_FAILURE() << "pinned id " << id << " got another GUID";
                     }
-                    auto record = makeSmart<Record>();
-                    record->insert("core_object_id", Variant(g));
-                    record->insert("sid", Variant(String::from(id)));
+                    auto record = makeSmart<Record>(
+                        Record{{"core_object_id", Variant(g)}, {"sid", Variant(String::from(id))}});
                     if (uError e = cache.setItem(tag, kKey, record); e.failed()) return fail("setItem", e);
 
                     // Whatever record another cursor stored under a GUID must carry that GUID.
@@ -102,15 +103,15 @@ TEST(MappingCacheStressTest, CursorsOnSeveralThreadsKeepCountsAndGuidsConsistent
 
     Cache::Snapshot snapshot;
     uError inv = cache.checkInvariants(&snapshot);
-    ASSERT_TRUE(inv.ok()) << inv;
+    ASSERT_OK(inv);
     // Only the pinned tag still holds anything: its mappings, and no records.
     EXPECT_EQ(snapshot.sidEntries, unsigned(kPinned));
     EXPECT_EQ(snapshot.sidTags, 1u);
     EXPECT_EQ(snapshot.objEntries, 0u);
     EXPECT_EQ(snapshot.objTags, 0u);
 
-    ASSERT_EQ(cache.clearMapping(pinTag).code(), kSuccess);
-    ASSERT_TRUE(cache.checkInvariants(&snapshot).ok());
+    ASSERT_OK(cache.clearMapping(pinTag));
+    ASSERT_OK(cache.checkInvariants(&snapshot));
     EXPECT_EQ(snapshot.sidEntries, 0u);
     EXPECT_EQ(snapshot.sidTags, 0u);
 }

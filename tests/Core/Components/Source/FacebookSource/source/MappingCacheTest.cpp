@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <map>
 #include <string>
 #include <vector>
@@ -52,7 +54,7 @@ class MappingCacheScenario : public ::testing::TestWithParam<Scenario> {};
 
 TEST_P(MappingCacheScenario, AnswersExactCodesAndKeepsItsInvariants) {
     Cache cache;
-    ASSERT_EQ(cache.setup().code(), kSuccess);
+    ASSERT_OK(cache.setup());
     std::map<std::string, GUID> labels;
     std::map<int, SmartPtr<Record>> stored;
     for (size_t i = 0; i < GetParam().steps.size(); ++i) {
@@ -70,7 +72,7 @@ TEST_P(MappingCacheScenario, AnswersExactCodesAndKeepsItsInvariants) {
             }
         } else if (s.op == Step::Store) {
             auto record = makeSmart<Record>();
-            record->insert("core_object_id", s.label ? Variant(labels.at(s.label)) : Variant(5));
+            ASSERT_OK(record->insert("core_object_id", s.label ? Variant(labels.at(s.label)) : Variant(5)));
             err = cache.setItem(s.tag, Metadata::Key(), record);
             if (err.ok()) stored[s.version] = record;
         } else if (s.op == Step::Fetch) {
@@ -80,9 +82,9 @@ TEST_P(MappingCacheScenario, AnswersExactCodesAndKeepsItsInvariants) {
         } else {
             err = s.op == Step::ClearMap ? cache.clearMapping(s.tag) : cache.clearItems(s.tag);
         }
-        EXPECT_EQ(err.code(), s.code) << err;
+        EXPECT_CODE(err, s.code);
         uError inv = cache.checkInvariants();
-        EXPECT_TRUE(inv.ok()) << inv;
+        EXPECT_OK(inv);
     }
 }
 
@@ -148,12 +150,12 @@ TEST(MappingCacheTest, ServiceIdKeysOrderByNameThenIdIgnoringTheTypeCode) {
 TEST(MappingCacheTest, TagsCountFromZeroAndNothingRunsBeforeSetup) {
     Cache cache;
     String tag;
-    EXPECT_EQ(cache.getTag(tag).code(), kNotSet);
-    ASSERT_EQ(cache.setup().code(), kSuccess);
-    EXPECT_EQ(cache.setup().code(), kInvalid);
-    ASSERT_EQ(cache.getTag(tag).code(), kSuccess);
+    EXPECT_CODE(cache.getTag(tag), kNotSet);
+    ASSERT_OK(cache.setup());
+    EXPECT_CODE(cache.setup(), kInvalid);
+    ASSERT_OK(cache.getTag(tag));
     EXPECT_EQ(tag, "0");
-    ASSERT_EQ(cache.getTag(tag).code(), kSuccess);
+    ASSERT_OK(cache.getTag(tag));
     EXPECT_EQ(tag, "1");
 }
 

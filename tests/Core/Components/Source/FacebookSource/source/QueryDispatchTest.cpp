@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "ErrorAssertions.h"
+
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -42,14 +44,14 @@ Constraint other() {
 class QueryDispatchTest : public ::testing::Test {
 protected:
     void SetUp() override {
-        Configuration::Group group(kSourceName);
-        group.set("facebook_source_appkey", Variant("key"));
-        group.set("facebook_source_appsecret", Variant("secret"));
-        group.set("facebook_source_session_user", Variant("100000001"));
-        group.set("facebook_source_session_id", Variant("session"));
-        group.set("facebook_source_session_secret", Variant("session-secret"));
-        ASSERT_EQ(source.sendConfig(group).code(), kSuccess);
-        ASSERT_EQ(source.startup().code(), kSuccess);
+        Configuration::Group const group(kSourceName,
+                                         {{"facebook_source_appkey", Variant("key")},
+                                          {"facebook_source_appsecret", Variant("secret")},
+                                          {"facebook_source_session_user", Variant("100000001")},
+                                          {"facebook_source_session_id", Variant("session")},
+                                          {"facebook_source_session_secret", Variant("session-secret")}});
+        ASSERT_CODE(source.sendConfig(group), kSuccess);
+        ASSERT_CODE(source.startup(), kSuccess);
     }
 
     FacebookSource source{kSourceName};
@@ -113,7 +115,7 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
         Vector<Constraint> constraints{std::vector<Constraint>(c.constraints)};
         int type = kNone;
         uError err = FacebookSource::selectObjectType(constraints, c.position, c.flag, kSourceName, type);
-        EXPECT_EQ(err.code(), c.code) << err;
+        EXPECT_CODE(err, c.code);
         if (c.code == kSuccess) {
             EXPECT_EQ(type, c.type);
         }
@@ -122,10 +124,10 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
         msg.interactive = c.flag;
         uError started = source.onMessage(msg);
         if (c.type == kNone) {
-            EXPECT_EQ(started.code(), c.code) << started;
+            EXPECT_CODE(started, c.code);
             EXPECT_FALSE(msg.cursor);
         } else if (c.type == FacebookSource::kContact) {
-            EXPECT_EQ(started.code(), kSuccess) << started;
+            EXPECT_CODE(started, kSuccess);
             EXPECT_NE(dynamic_cast<ContactCursor*>(msg.cursor.get()), nullptr);
         } else if (c.type == FacebookSource::kFriendRequest) {
             // The message gives no columns, so the cursor refuses to start without its ordering.
@@ -143,33 +145,22 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
             EXPECT_EQ(started.code(), kInvalid) << started;
             EXPECT_FALSE(msg.cursor);
         } else {
-            EXPECT_EQ(started.code(), kNotSupported) << started;
+            EXPECT_CODE(started, kNotSupported);
             EXPECT_FALSE(msg.cursor);
         }
     }
 }
 
-TEST(QueryBeforeStartupTest, FailsWithNotSetInsteadOfHandingOutACursorWithoutClient) {
-    FacebookSource source(kSourceName);
-    IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), Vector<Constraint>{typeIs(2)});
-    EXPECT_EQ(source.onMessage(msg).code(), kNotSet);
-    EXPECT_FALSE(msg.cursor);
-
-    ASSERT_EQ(source.sendConfig(Configuration::Group(kSourceName)).code(), kSuccess);
-    EXPECT_EQ(source.onMessage(msg).code(), kNotSet);
-    EXPECT_FALSE(msg.cursor);
-}
-
 TEST_F(QueryDispatchTest, ContactConstraintTheCursorCannotReadFailsTheQuery) {
     Vector<Constraint> constraints{typeIs(2), other()};
     IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints);
-    EXPECT_EQ(source.onMessage(msg).code(), kNotSupported);
+    EXPECT_CODE(source.onMessage(msg), kNotSupported);
     EXPECT_FALSE(msg.cursor);
 
     Constraint badId{Metadata::Key("core_contact_service_id", TRELM_TYPES::STRING), Variant("1 or 1=1"),
                      Constraint::Equal};
     IQueryItems::StartQueryMessage injected(Vector<IQueryItems::Column>(), Vector<Constraint>{typeIs(2), badId});
-    EXPECT_EQ(source.onMessage(injected).code(), kInvalid);
+    EXPECT_CODE(source.onMessage(injected), kInvalid);
     EXPECT_FALSE(injected.cursor);
 }
 
