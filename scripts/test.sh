@@ -21,7 +21,7 @@ cmake -S "$root" -B "$root/build/clang" -G Ninja -DCMAKE_BUILD_TYPE=Debug -DCMAK
 cmake --build "$root/build/clang" -j "$jobs" --target trelm trelmfacebook
 echo "thread-safety analysis: clean"
 
-cmake -S "$root" -B "$root/build/asan" -G Ninja -DTRELM_SANITIZE=address -DCMAKE_BUILD_TYPE=Debug "${launcher[@]}" >/dev/null
+cmake -S "$root" -B "$root/build/asan" -G Ninja -DTRELM_SANITIZE=address -DTRELM_WERROR=ON -DCMAKE_BUILD_TYPE=Debug "${launcher[@]}" >/dev/null
 cmake --build "$root/build/asan" -j "$jobs"
 export ASAN_OPTIONS=detect_leaks=1:abort_on_error=1
 export UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1

@@ -124,8 +124,12 @@ TEST_F(ConnectionInfoTest, DroppingTheSessionAloneKeepsTheUser) {
 TEST_F(ConnectionInfoTest, FailedStoreIsReportedWhileMemoryKeepsTheChange) {
     store.failType("RuntimeConfigurationMessage");
     EXPECT_CODE(info->setSessionConfig("sid", "ssec", "7", true, true), kFailure);
-    EXPECT_EQ(store.records().size(), 1u);
+    EXPECT_EQ(store.records().size(), 1u) << "a session that could not be stored stops there";
     EXPECT_TRUE(info->hasSession());
+    // The user is another matter: the last user is what tells a change of person later, so it is
+    // stored even when storing the session's user failed, and the first failure is reported.
+    EXPECT_CODE(info->setUserConfig("8", true, true), kFailure);
+    EXPECT_EQ(store.records().size(), 3u) << "both stores are tried";
     store.failType("ResetRuntimeConfigurationMessage");
     EXPECT_CODE(info->invalidateSessionConfigWithUser(true), kFailure);
     EXPECT_FALSE(info->hasSession());
