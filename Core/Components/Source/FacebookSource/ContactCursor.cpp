@@ -8,10 +8,10 @@ namespace trelm {
 
 namespace {
 
-char const* const kServiceIdKey = "core_contact_service_id";
-char const* const kServiceName = "Facebook";
-char const* const kOrderExpression = "concat(uid,' ')";
-char const* const kFriendCondition = "uid in (select uid2 from friend where uid1='";
+constexpr char const* kServiceIdKey = "core_contact_service_id";
+constexpr char const* kServiceName = "Facebook";
+constexpr char const* kOrderExpression = "concat(uid,' ')";
+constexpr char const* kFriendCondition = "uid in (select uid2 from friend where uid1='";
 
 // Answer fields copied into the record. "profile_url" and "current_location.city" are not in the
 // field list this cursor asks for; they are kept so that a wider field list fills them too.

@@ -6,7 +6,7 @@ namespace trelm {
 
 namespace {
 
-char const* const kContactIdKey = "core_event_contactid";
+constexpr char const* kContactIdKey = "core_event_contactid";
 
 }  // namespace
 

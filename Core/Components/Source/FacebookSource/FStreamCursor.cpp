@@ -11,9 +11,9 @@ namespace trelm {
 
 namespace {
 
-char const* const kTimeKey = "core_object_time";
-char const* const kServiceIdKey = "core_event_serviceid";
-char const* const kServiceName = "Facebook";
+constexpr char const* kTimeKey = "core_object_time";
+constexpr char const* kServiceIdKey = "core_event_serviceid";
+constexpr char const* kServiceName = "Facebook";
 
 // A stream row's field, the record key it goes to, and that key's type.
 struct EventField {

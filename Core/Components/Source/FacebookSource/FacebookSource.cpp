@@ -25,18 +25,18 @@ namespace trelm {
 namespace {
 
 // Configuration keys of the source's group (and of its runtime configuration).
-char const* const kAppKey = "facebook_source_appkey";
-char const* const kAppSecret = "facebook_source_appsecret";
-char const* const kLogin = "facebook_source_login";
-char const* const kPassword = "facebook_source_password";
-char const* const kSessionUser = "facebook_source_session_user";
-char const* const kSessionId = "facebook_source_session_id";
-char const* const kSessionSecret = "facebook_source_session_secret";
-char const* const kWipeComponents = "wipeComponents";
-char const* const kWakeupComponents = "wakeupComponents";
-char const* const kHaveExtendedApi = "haveExtendedApi";
+constexpr char const* kAppKey = "facebook_source_appkey";
+constexpr char const* kAppSecret = "facebook_source_appsecret";
+constexpr char const* kLogin = "facebook_source_login";
+constexpr char const* kPassword = "facebook_source_password";
+constexpr char const* kSessionUser = "facebook_source_session_user";
+constexpr char const* kSessionId = "facebook_source_session_id";
+constexpr char const* kSessionSecret = "facebook_source_session_secret";
+constexpr char const* kWipeComponents = "wipeComponents";
+constexpr char const* kWakeupComponents = "wakeupComponents";
+constexpr char const* kHaveExtendedApi = "haveExtendedApi";
 
-char const* const kRuntimeConfiguration = "RuntimeConfiguration";
+constexpr char const* kRuntimeConfiguration = "RuntimeConfiguration";
 
 // Reports an error that the source cannot act on, one trace line per level of its chain.
 void traceError(char const* what, uError const& err) { ::trelm::traceError("FacebookSource", what, err); }

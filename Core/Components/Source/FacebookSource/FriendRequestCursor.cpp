@@ -7,9 +7,9 @@ namespace trelm {
 
 namespace {
 
-char const* const kServiceKey = "core_event_service";
-char const* const kServiceIdKey = "core_event_serviceid";
-char const* const kContactIdKey = "core_event_contactid";
+constexpr char const* kServiceKey = "core_event_service";
+constexpr char const* kServiceIdKey = "core_event_serviceid";
+constexpr char const* kContactIdKey = "core_event_contactid";
 
 }  // namespace
 

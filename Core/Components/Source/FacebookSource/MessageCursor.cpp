@@ -12,12 +12,12 @@ namespace trelm {
 
 namespace {
 
-char const* const kTimeKey = "core_object_time";
-char const* const kServiceKey = "core_event_service";
-char const* const kServiceIdKey = "core_event_serviceid";
-char const* const kContactIdKey = "core_event_contactid";
-char const* const kContactNameKey = "core_event_contactname";
-char const* const kServiceName = "Facebook";
+constexpr char const* kTimeKey = "core_object_time";
+constexpr char const* kServiceKey = "core_event_service";
+constexpr char const* kServiceIdKey = "core_event_serviceid";
+constexpr char const* kContactIdKey = "core_event_contactid";
+constexpr char const* kContactNameKey = "core_event_contactname";
+constexpr char const* kServiceName = "Facebook";
 
 // The ordering the cursor serves: newest first, then by service and service id.
 Vector<IQueryItems::Column> const& fixedOrdering() {

@@ -9,8 +9,8 @@ namespace trelm {
 
 namespace {
 
-char const* const kTimeKey = "core_object_time";
-char const* const kServiceIdKey = "core_event_serviceid";
+constexpr char const* kTimeKey = "core_object_time";
+constexpr char const* kServiceIdKey = "core_event_serviceid";
 
 struct PhotoField {
     char const* rowField;

@@ -7,8 +7,8 @@ namespace trelm {
 
 namespace {
 
-char const* const kServiceName = "Facebook";
-char const* const kTimeKey = "core_object_time";
+constexpr char const* kServiceName = "Facebook";
+constexpr char const* kTimeKey = "core_object_time";
 
 bool isDecimal(String const& text) {
     if (text.empty()) return false;
