@@ -63,8 +63,10 @@ install(FILES ${PROJECT_BINARY_DIR}/trelm.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}
   COMPONENT Development)
 
 # Copyright and changelog, where Debian looks for them.
-configure_file(${CMAKE_CURRENT_LIST_DIR}/debian-copyright.in ${PROJECT_BINARY_DIR}/doc/copyright @ONLY)
-configure_file(${CMAKE_CURRENT_LIST_DIR}/debian-changelog.in ${PROJECT_BINARY_DIR}/doc/changelog.Debian @ONLY)
+set(TRELM_DEB_RELEASE 1)
+set(TRELM_DEB_VERSION ${PROJECT_VERSION}-${TRELM_DEB_RELEASE})
+configure_file(${CMAKE_CURRENT_LIST_DIR}/debian/copyright.in ${PROJECT_BINARY_DIR}/doc/copyright @ONLY)
+configure_file(${CMAKE_CURRENT_LIST_DIR}/debian/changelog.in ${PROJECT_BINARY_DIR}/doc/changelog.Debian @ONLY)
 find_program(TRELM_GZIP gzip REQUIRED)
 execute_process(COMMAND ${TRELM_GZIP} -9nkf ${PROJECT_BINARY_DIR}/doc/changelog.Debian
   COMMAND_ERROR_IS_FATAL ANY)
@@ -81,19 +83,27 @@ set(CPACK_PACKAGE_VENDOR "the trelm developers")
 set(CPACK_PACKAGE_CONTACT "trelm developers <dev@trelm.example>")
 set(CPACK_PACKAGE_DESCRIPTION_SUMMARY "component host framework and Facebook REST plug-in")
 set(CPACK_PACKAGE_DESCRIPTION
-  "libtrelm is a framework for component hosts: value types, errors, messaging between\
- named components, data sources and connectors, HTTP, XML and a runtime configuration\
- store. The package also holds the plug-in libtrelmfacebook, which connects a device\
- to the Facebook REST service, the command-line host trelm-host and the service\
- emulator trelm-emulator, with the headers, CMake package and pkg-config file for\
- building hosts and plug-ins.")
+  "libtrelm is a framework for component hosts: value types, errors, messaging
+between named components, data sources and connectors, HTTP, XML and a runtime
+configuration store. The package also holds the plug-in libtrelmfacebook, which
+connects a device to the Facebook REST service, the command-line host
+trelm-host and the service emulator trelm-emulator, with the headers, CMake
+package and pkg-config file for building hosts and plug-ins.")
 set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
 set(CPACK_STRIP_FILES ON)
 set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
+set(CPACK_DEBIAN_PACKAGE_RELEASE ${TRELM_DEB_RELEASE})
 set(CPACK_DEBIAN_PACKAGE_SECTION libs)
 set(CPACK_DEBIAN_PACKAGE_PRIORITY optional)
 set(CPACK_DEBIAN_PACKAGE_HOMEPAGE ${PROJECT_HOMEPAGE_URL})
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
 set(CPACK_DEBIAN_PACKAGE_GENERATE_SHLIBS ON)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${PROJECT_BINARY_DIR}/lib)
+# libtrelm in /usr/lib: the library cache is refreshed by dpkg's ldconfig trigger, and the
+# maintainer scripts that would otherwise call ldconfig are replaced by ones that do nothing.
+set(CPACK_DEBIAN_PACKAGE_CONTROL_EXTRA
+  ${CMAKE_CURRENT_LIST_DIR}/debian/triggers
+  ${CMAKE_CURRENT_LIST_DIR}/debian/postinst
+  ${CMAKE_CURRENT_LIST_DIR}/debian/postrm)
+set(CPACK_DEBIAN_PACKAGE_CONTROL_STRICT_PERMISSION ON)
 include(CPack)
