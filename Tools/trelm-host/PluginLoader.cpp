@@ -75,7 +75,11 @@ std::string PluginLoader::defaultPluginPath() {
     std::error_code ec;
     std::filesystem::path program = std::filesystem::read_symlink("/proc/self/exe", ec);
     if (ec) return "libtrelmfacebook.so";  // left to the dynamic loader's search path
-    return (program.parent_path().parent_path() / "lib" / "libtrelmfacebook.so").string();
+    std::filesystem::path bin = program.parent_path();
+    std::filesystem::path installed =
+        (bin / TRELM_HOST_PLUGIN_DIR / "libtrelmfacebook.so").lexically_normal();
+    if (std::filesystem::exists(installed, ec)) return installed.string();
+    return (bin.parent_path() / "lib" / "libtrelmfacebook.so").string();
 }
 
 }  // namespace host

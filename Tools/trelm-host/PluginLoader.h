@@ -53,8 +53,10 @@ public:
     // The loaded plug-ins, in load order.
     std::vector<Plugin> const& plugins() const noexcept { return plugins_; }
 
-    // libtrelmfacebook.so in the library folder beside the running program's folder
-    // (<prefix>/bin/trelm-host -> <prefix>/lib/libtrelmfacebook.so).
+    // libtrelmfacebook.so in the installed plug-in folder (<prefix>/bin/trelm-host ->
+    // <prefix>/lib/trelm/plugins/libtrelmfacebook.so) when it is there; otherwise the one in the
+    // library folder beside the running program's folder, as in the build tree
+    // (<build>/bin/trelm-host -> <build>/lib/libtrelmfacebook.so).
     static std::string defaultPluginPath();
 
 private:
