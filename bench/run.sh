@@ -137,7 +137,9 @@ report cursor/contacts_walk/real_time curl/contacts_replay/real_time page
 report cursor/contacts_walk/real_time curl/contacts_replay/real_time pagecpu
 report engine/contact_page sqlite_xml/contact_page cpu
 report engine/count sqlite_xml/count cpu
-report http/contact_page engine/contact_page wall
+report http/contact_page/process_time/real_time engine/contact_page wall
+report http/contact_page/process_time/real_time sqlite/contact_page wall
+report http/contact_page/process_time/real_time sqlite/contact_page cpu
 
 if [ ${#failed[@]} -gt 0 ]; then
   echo "run.sh: failed: ${failed[*]}" >&2

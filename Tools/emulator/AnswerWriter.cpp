@@ -6,14 +6,14 @@ namespace emu {
 
 void AnswerWriter::number(std::string_view name, std::int64_t value) { leaf(name, std::to_string(value)); }
 
-void AnswerWriter::write(const XmlNode& node) {
+void AnswerWriter::write(XmlNode const& node) {
     if (node.nil) {
         nil(node.name);
     } else if (node.children.empty() && !node.list) {
         leaf(node.name, node.text);
     } else {
         open(node.name, node.list);
-        for (const XmlNode& child : node.children) write(child);
+        for (XmlNode const& child : node.children) write(child);
         close();
     }
 }

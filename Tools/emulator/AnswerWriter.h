@@ -31,7 +31,7 @@ public:
     // Writes `node` and everything under it: a nil node as nil, a node without children that is
     // not a list as a leaf, any other as an element with its children (its text, which such a node
     // does not have, is left out).
-    void write(const XmlNode& node);
+    void write(XmlNode const& node);
 };
 
 }  // namespace emu

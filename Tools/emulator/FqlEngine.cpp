@@ -46,6 +46,19 @@ Status FqlEngine::run(std::int64_t viewer, std::int64_t now, const std::string& 
 
 Status FqlEngine::execute(const FqlPlan& plan, AnswerWriter& out) {
     std::string error;
+    if (!plan.countSql.empty()) {
+        sqlite3_stmt* raw = db_.prepareCached(plan.countSql, error);
+        if (!raw || !sqlite3_stmt_readonly(raw)) return unknownError();
+        SqliteStatement count(raw);
+        for (std::size_t i = 0; i < plan.params.size(); ++i) count.bind(static_cast<int>(i + 1), plan.params[i]);
+        if (!count.step()) return unknownError();
+        for (std::int64_t n = count.getInt(0); n > 0; --n) {
+            out.open(plan.rowElement, false);
+            for (std::size_t i = 0; i < plan.outputs.size(); ++i) out.leaf(plan.outputs[i].element, plan.constantRow[i]);
+            out.close();
+        }
+        return std::nullopt;
+    }
     sqlite3_stmt* raw = db_.prepareCached(plan.sql, error);
     if (!raw || !sqlite3_stmt_readonly(raw)) return unknownError();
     SqliteStatement row(raw);

@@ -17,7 +17,7 @@ std::string decode(std::string_view text) {
     std::string out;
     out.reserve(text.size());
     for (std::size_t i = 0; i < text.size(); ++i) {
-        const char c = text[i];
+        char const c = text[i];
         if (c == '+') {
             out += ' ';
         } else if (c == '%' && i + 2 < text.size() && hexValue(text[i + 1]) >= 0 && hexValue(text[i + 2]) >= 0) {
@@ -167,7 +167,7 @@ bool RequestParser::addMultipart(std::string_view body, std::string_view boundar
         at = end + 1;
 
         if (!haveDisposition) continue;
-        const auto& params = disposition.params;
+        auto const& params = disposition.params;
         if (params.count("filename") != 0 || params.count("filename*") != 0) {
             if (!parsed.haveFile) {
                 parsed.file = std::string(content);

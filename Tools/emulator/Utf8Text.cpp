@@ -20,19 +20,27 @@ constexpr std::array<bool, 256> kStop = [] {
 // The length of the allowed character at `at` (1 to 4), or 0 when the bytes there must be
 // replaced. REQUIRES: at < text.size().
 std::size_t allowedLength(std::string_view text, std::size_t at) {
-    const auto byte = [&](std::size_t i) { return static_cast<unsigned char>(text[i]); };
-    const unsigned char b = byte(at);
+    auto const byte = [&](std::size_t i) { return static_cast<unsigned char>(text[i]); };
+    unsigned char const b = byte(at);
     if (b < 0x80) return b >= 0x20 || b == '\t' || b == '\n' || b == '\r' ? 1 : 0;
     std::size_t length = 0;
     unsigned char low = 0x80, high = 0xBF;  // the range of the second byte
-    if (b >= 0xC2 && b <= 0xDF) length = 2;
-    else if (b == 0xE0) length = 3, low = 0xA0;
-    else if (b == 0xED) length = 3, high = 0x9F;  // no surrogates
-    else if (b >= 0xE1 && b <= 0xEF) length = 3;
-    else if (b == 0xF0) length = 4, low = 0x90;
-    else if (b >= 0xF1 && b <= 0xF3) length = 4;
-    else if (b == 0xF4) length = 4, high = 0x8F;
-    else return 0;
+    if (b >= 0xC2 && b <= 0xDF)
+        length = 2;
+    else if (b == 0xE0)
+        length = 3, low = 0xA0;
+    else if (b == 0xED)
+        length = 3, high = 0x9F;  // no surrogates
+    else if (b >= 0xE1 && b <= 0xEF)
+        length = 3;
+    else if (b == 0xF0)
+        length = 4, low = 0x90;
+    else if (b >= 0xF1 && b <= 0xF3)
+        length = 4;
+    else if (b == 0xF4)
+        length = 4, high = 0x8F;
+    else
+        return 0;
     if (at + length > text.size()) return 0;
     if (byte(at + 1) < low || byte(at + 1) > high) return 0;
     for (std::size_t i = 2; i < length; ++i)
@@ -92,12 +100,24 @@ std::string Utf8Text::clean(std::string_view text) {
 void Utf8Text::appendXml(std::string& out, std::string_view text) {
     copyClean(out, text, [](std::string& o, char c) {
         switch (c) {
-            case '&': o += "&amp;"; break;
-            case '<': o += "&lt;"; break;
-            case '>': o += "&gt;"; break;
-            case '"': o += "&quot;"; break;
-            case '\'': o += "&apos;"; break;
-            default: o += c; break;
+            case '&':
+                o += "&amp;";
+                break;
+            case '<':
+                o += "&lt;";
+                break;
+            case '>':
+                o += "&gt;";
+                break;
+            case '"':
+                o += "&quot;";
+                break;
+            case '\'':
+                o += "&apos;";
+                break;
+            default:
+                o += c;
+                break;
         }
     });
 }
@@ -105,13 +125,27 @@ void Utf8Text::appendXml(std::string& out, std::string_view text) {
 void Utf8Text::appendJson(std::string& out, std::string_view text) {
     copyClean(out, text, [](std::string& o, char c) {
         switch (c) {
-            case '"': o += "\\\""; break;
-            case '\\': o += "\\\\"; break;
-            case '\t': o += "\\t"; break;
-            case '\n': o += "\\n"; break;
-            case '\r': o += "\\r"; break;
-            case '\x7f': o += "\\u007f"; break;
-            default: o += c; break;
+            case '"':
+                o += "\\\"";
+                break;
+            case '\\':
+                o += "\\\\";
+                break;
+            case '\t':
+                o += "\\t";
+                break;
+            case '\n':
+                o += "\\n";
+                break;
+            case '\r':
+                o += "\\r";
+                break;
+            case '\x7f':
+                o += "\\u007f";
+                break;
+            default:
+                o += c;
+                break;
         }
     });
 }

@@ -35,7 +35,7 @@ void XmlAnswerWriter::open(std::string_view name, bool list) {
 }
 
 void XmlAnswerWriter::close() {
-    const std::string& name = open_[--depth_];
+    std::string const& name = open_[--depth_];
     if (pending_) {
         out_ += "/>";
         pending_ = false;

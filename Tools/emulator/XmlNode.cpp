@@ -6,15 +6,15 @@ namespace emu {
 namespace {
 
 // About the size of `node` rendered (before escaping), to size the output once.
-std::size_t renderedSizeHint(const XmlNode& node) {
+std::size_t renderedSizeHint(XmlNode const& node) {
     std::size_t size = 2 * node.name.size() + node.text.size() + 24;
-    for (const XmlNode& c : node.children) size += renderedSizeHint(c);
+    for (XmlNode const& c : node.children) size += renderedSizeHint(c);
     return size;
 }
 
 }  // namespace
 
-std::string renderDocument(const XmlNode& root) {
+std::string renderDocument(XmlNode const& root) {
     XmlAnswerWriter writer(renderedSizeHint(root));
     writer.write(root);
     return writer.take();

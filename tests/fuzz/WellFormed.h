@@ -12,9 +12,9 @@
 namespace fuzz {
 
 // Stops the run (a finding) when `document` is not well-formed XML.
-inline void requireXml(const std::string& document) {
+inline void requireXml(std::string const& document) {
     XML_Parser p = XML_ParserCreate(nullptr);
-    const bool ok = XML_Parse(p, document.data(), static_cast<int>(document.size()), 1) == XML_STATUS_OK;
+    bool const ok = XML_Parse(p, document.data(), static_cast<int>(document.size()), 1) == XML_STATUS_OK;
     if (!ok) {
         std::fprintf(stderr, "not well-formed (%s at %lu): %s\n", XML_ErrorString(XML_GetErrorCode(p)),
                      static_cast<unsigned long>(XML_GetCurrentByteIndex(p)), document.c_str());
@@ -24,7 +24,7 @@ inline void requireXml(const std::string& document) {
 }
 
 // Stops the run when `value` is not valid JSON.
-inline void requireJson(const std::string& value) {
+inline void requireJson(std::string const& value) {
     if (!nlohmann::json::accept(value)) {
         std::fprintf(stderr, "not valid JSON: %s\n", value.c_str());
         std::abort();

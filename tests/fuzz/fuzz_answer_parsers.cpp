@@ -16,8 +16,8 @@
 
 using namespace trelm;
 
-extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    const String xml(std::string(reinterpret_cast<const char*>(data), size));
+extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const* data, std::size_t size) {
+    const String xml(std::string(reinterpret_cast<char const*>(data), size));
     // Results are dropped on purpose: a refused document is an expected outcome here.
     {
         Vector<Map<String, String>> rows;

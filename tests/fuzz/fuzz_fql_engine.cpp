@@ -31,7 +31,7 @@ emu::SqliteStore& store() {
 }
 
 template <typename Writer>
-std::string answer(const std::string& query, emu::Protocol::Format format) {
+std::string answer(std::string const& query, emu::Protocol::Format format) {
     Writer w;
     w.open("fql_query_response", true);
     const emu::Status s = store().fqlQuery(emu::DemoAccount::uid, query, w);
@@ -42,9 +42,9 @@ std::string answer(const std::string& query, emu::Protocol::Format format) {
 
 }  // namespace
 
-extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const* data, std::size_t size) {
     if (size > 4096) return 0;  // statements of the client are a few hundred bytes
-    const std::string query(reinterpret_cast<const char*>(data), size);
+    const std::string query(reinterpret_cast<char const*>(data), size);
     fuzz::requireXml(answer<emu::XmlAnswerWriter>(query, emu::Protocol::Format::Xml));
     fuzz::requireJson(answer<emu::JsonAnswerWriter>(query, emu::Protocol::Format::Json));
     return 0;

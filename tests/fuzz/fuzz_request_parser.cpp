@@ -9,8 +9,8 @@
 #include "RequestParser.h"
 #include "WellFormed.h"
 
-extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-    std::string_view input(reinterpret_cast<const char*>(data), size);
+extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const* data, std::size_t size) {
+    std::string_view input(reinterpret_cast<char const*>(data), size);
     auto line = [&input] {
         const std::size_t end = input.find('\n');
         const std::string_view first = input.substr(0, end);
@@ -22,7 +22,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
 
     emu::HttpCall call;
     emu::RequestParser::addUrlEncoded(query, call);
-    const bool read = emu::RequestParser::addBody(contentType, input, call);
+    bool const read = emu::RequestParser::addBody(contentType, input, call);
     if (!call.haveFile && !call.file.empty()) __builtin_trap();  // a file only comes with its flag
     (void)read;
     const emu::ServiceError error{104, "Incorrect signature"};

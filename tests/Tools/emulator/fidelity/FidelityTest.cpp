@@ -22,7 +22,7 @@ std::size_t collect(char* data, std::size_t size, std::size_t count, void* out) 
 
 // A POST of `body` as it is, with `contentType`: the way the era's clients sent what they had
 // assembled by hand.
-Reply postRaw(const std::string& url, const std::string& contentType, const std::string& body) {
+Reply postRaw(std::string const& url, std::string const& contentType, std::string const& body) {
     Reply reply;
     CURL* curl = curl_easy_init();
     curl_slist* headers = curl_slist_append(nullptr, ("Content-Type: " + contentType).c_str());
@@ -49,11 +49,11 @@ struct Part {
     std::string content;
 };
 
-std::string multipart(const Fields& fields, const std::vector<Part>& extra) {
+std::string multipart(Fields const& fields, std::vector<Part> const& extra) {
     std::string body;
-    for (const auto& [key, value] : fields)
+    for (auto const& [key, value] : fields)
         body += "--" + kBoundary + "\r\nContent-Disposition: form-data; name=\"" + key + "\"\r\n\r\n" + value + "\r\n";
-    for (const Part& p : extra)
+    for (Part const& p : extra)
         body += "--" + kBoundary + "\r\nContent-Disposition: form-data; " + p.disposition +
                 "\r\nContent-Type: application/octet-stream\r\n\r\n" + p.content + "\r\n";
     return body + "--" + kBoundary + "--\r\n";
@@ -61,13 +61,13 @@ std::string multipart(const Fields& fields, const std::vector<Part>& extra) {
 
 class FidelityTest : public EmulatorFixture {
 public:
-    Reply upload(const Fields& fields, const std::vector<Part>& files) {
+    Reply upload(Fields const& fields, std::vector<Part> const& files) {
         return postRaw(emulator->httpUrl(), "multipart/form-data; boundary=" + kBoundary, multipart(fields, files));
     }
     // The viewer's status message as a later FQL read shows it.
     std::string statusMessage() {
-        const Reply r = client.postForm(emulator->httpUrl(),
-                                        sessionCall("fql.query", {{"query", "SELECT status FROM user WHERE uid = me()"}}));
+        const Reply r = client.postForm(
+            emulator->httpUrl(), sessionCall("fql.query", {{"query", "SELECT status FROM user WHERE uid = me()"}}));
         EXPECT_TRUE(wellFormed(r.body)) << r.body.substr(0, 300);
         // Found by hand: a regular expression over a megabyte of text would overflow the stack.
         const std::size_t start = r.body.find("<message>");
@@ -79,7 +79,7 @@ public:
 
 TEST_F(FidelityTest, UploadsTakeTheFirstFilePartWhateverItsNameAndNeverSignIt) {
     struct Case {
-        const char* name;
+        char const* name;
         std::vector<Part> files;
         Fields extra;  // signed arguments besides the call's own
         int code;
@@ -90,14 +90,17 @@ TEST_F(FidelityTest, UploadsTakeTheFirstFilePartWhateverItsNameAndNeverSignIt) {
         {"no name at all", {{"filename=\"photo.jpg\"", kJpeg}}, {}, 0, kJpeg.size()},
         {"named _file", {{"name=\"_file\"; filename=\"photo.jpg\"", kJpeg}}, {}, 0, kJpeg.size()},
         {"binary file name, binary caption", {{binaryName, kJpeg}}, {{"caption", "caf\xE9 \x01"}}, 0, kJpeg.size()},
-        {"two files: the first is the image", {{"filename=\"a.jpg\"", kJpeg}, {"filename=\"b.txt\"", "text"}}, {}, 0,
+        {"two files: the first is the image",
+         {{"filename=\"a.jpg\"", kJpeg}, {"filename=\"b.txt\"", "text"}},
+         {},
+         0,
          kJpeg.size()},
         {"a text file", {{"filename=\"notes.txt\"", "just some text, not a picture"}}, {}, 324, 29},
         {"an HTML page named .jpg", {{"filename=\"x.jpg\"", "<html><body>hi</body></html>"}}, {}, 324, 28},
         {"an empty file", {{"filename=\"\"", ""}}, {}, 324, 0},
         {"no file part", {}, {}, 324, 0},
     };
-    for (const Case& c : cases) {
+    for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
         emulator->log().clear();
         Fields fields = c.extra;
@@ -107,7 +110,7 @@ TEST_F(FidelityTest, UploadsTakeTheFirstFilePartWhateverItsNameAndNeverSignIt) {
         EXPECT_EQ(r.status, 200);
         EXPECT_TRUE(wellFormed(r.body)) << r.body;
         EXPECT_EQ(r.errorCode(), c.code) << r.body;
-        const auto logged = emulator->log().entries();
+        auto const logged = emulator->log().entries();
         ASSERT_EQ(logged.size(), 1u);
         EXPECT_EQ(logged[0].hadFile, !c.files.empty());
         EXPECT_EQ(logged[0].fileSize, c.fileSize);
@@ -120,8 +123,8 @@ TEST_F(FidelityTest, UploadsTakeTheFirstFilePartWhateverItsNameAndNeverSignIt) {
 
 TEST_F(FidelityTest, ABrokenMultipartBodyIsAnsweredAsACallWithoutArguments) {
     const std::string body = multipart(fqlCall(), {});
-    const Reply r = postRaw(emulator->httpUrl(), "multipart/form-data; boundary=" + kBoundary,
-                            body.substr(0, body.size() - 10));
+    const Reply r =
+        postRaw(emulator->httpUrl(), "multipart/form-data; boundary=" + kBoundary, body.substr(0, body.size() - 10));
     EXPECT_EQ(r.status, 200);
     EXPECT_TRUE(wellFormed(r.body)) << r.body;
     EXPECT_EQ(r.errorCode(), 101) << r.body;
@@ -133,17 +136,25 @@ TEST_F(FidelityTest, StrictCallIdComparesMicrotimeValuesAsNumbers) {
     o.httpsPort = -1;
     start(o);
     struct Step {
-        const char* callId;
+        char const* callId;
         int code;
     };
     const std::vector<Step> steps = {
         {"1795457318.1586", 0},  // a new session's first call
-        {"1795457318.1587", 0},  {"1795457318.16", 0},  {"1795457318.16", 103}, {"1795457318.159", 103},
-        {"1795457318.1600", 103}, {"1795457319", 0},     {"01795457319.5", 0},   {"1795457319.50", 103},
-        {"99999999999999999999999.1", 0},                 {"1e30", 103},          {".", 103},
+        {"1795457318.1587", 0},
+        {"1795457318.16", 0},
+        {"1795457318.16", 103},
+        {"1795457318.159", 103},
+        {"1795457318.1600", 103},
+        {"1795457319", 0},
+        {"01795457319.5", 0},
+        {"1795457319.50", 103},
+        {"99999999999999999999999.1", 0},
+        {"1e30", 103},
+        {".", 103},
         {"-1", 103},
     };
-    for (const Step& s : steps) {
+    for (Step const& s : steps) {
         const Reply r =
             client.postForm(emulator->httpUrl(), sessionCall("fql.query", {{"query", kFql}, {"call_id", s.callId}}));
         EXPECT_EQ(r.errorCode(), s.code) << "call_id " << s.callId << ": " << r.body;
@@ -158,9 +169,9 @@ TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
 
     using Json = nlohmann::json;
     struct Case {
-        const char* name;
-        std::function<Reply(const std::string& format)> send;
-        std::function<void(const Json&)> check;
+        char const* name;
+        std::function<Reply(std::string const& format)> send;
+        std::function<void(Json const&)> check;
     };
     auto call = [this](std::string method, Fields fields) {
         return [this, method, fields](const std::string& format) {
@@ -173,57 +184,58 @@ TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
     useHttps(https);
     const std::vector<Case> cases = {
         {"fql.query", call("facebook.fql.query", {{"query", "SELECT uid, name, status FROM user WHERE uid = me()"}}),
-         [](const Json& j) {
+         [](Json const& j) {
              ASSERT_TRUE(j.is_array());
              ASSERT_EQ(j.size(), 1u);
              EXPECT_EQ(j[0]["uid"], std::to_string(DemoAccount::uid));
              EXPECT_TRUE(j[0]["name"].is_string());
          }},
         {"fql.query, no rows", call("fql.query", {{"query", "SELECT name FROM user WHERE uid = 1"}}),
-         [](const Json& j) { EXPECT_EQ(j, Json::array()); }},
+         [](Json const& j) { EXPECT_EQ(j, Json::array()); }},
         {"stream.get", call("stream.get", {{"limit", "3"}}),
-         [](const Json& j) {
+         [](Json const& j) {
              ASSERT_TRUE(j["posts"].is_array());
              EXPECT_EQ(j["posts"].size(), 3u);
              EXPECT_TRUE(j["posts"][0]["post_id"].is_string());
              EXPECT_TRUE(j["profiles"].is_array());
          }},
         {"mailbox.getInbox", call("mailbox.getInbox", {{"limit", "2"}}),
-         [](const Json& j) {
+         [](Json const& j) {
              ASSERT_EQ(j.size(), 2u);
              EXPECT_TRUE(j[0]["tid"].is_string());
          }},
         {"mailbox.getThreadMessages", call("mailbox.getThreadMessages", {{"tid", tid}}),
-         [](const Json& j) {
+         [](Json const& j) {
              ASSERT_FALSE(j.empty());
              EXPECT_TRUE(j[0]["body"].is_string());
          }},
-        {"users.getInfo", call("users.getInfo", {{"uids", std::to_string(DemoAccount::uid)}, {"fields", "name,timezone"}}),
-         [](const Json& j) {
+        {"users.getInfo",
+         call("users.getInfo", {{"uids", std::to_string(DemoAccount::uid)}, {"fields", "name,timezone"}}),
+         [](Json const& j) {
              ASSERT_EQ(j.size(), 1u);
              EXPECT_EQ(j[0]["timezone"], "");
          }},
-        {"friends.get", call("friends.get", {}), [](const Json& j) { EXPECT_EQ(j.size(), 5u); }},
-        {"users.setStatus", call("users.setStatus", {{"status", "json"}}), [](const Json& j) { EXPECT_EQ(j, "1"); }},
+        {"friends.get", call("friends.get", {}), [](Json const& j) { EXPECT_EQ(j.size(), 5u); }},
+        {"users.setStatus", call("users.setStatus", {{"status", "json"}}), [](Json const& j) { EXPECT_EQ(j, "1"); }},
         {"photos.upload",
-         [this](const std::string& format) {
+         [this](std::string const& format) {
              return upload(sessionCall("photos.upload", {{"format", format}}), {{"filename=\"p.jpg\"", kJpeg}});
          },
-         [](const Json& j) { EXPECT_TRUE(j["pid"].is_string()); }},
+         [](Json const& j) { EXPECT_TRUE(j["pid"].is_string()); }},
         {"auth.login",
-         [&](const std::string& format) {
+         [&](std::string const& format) {
              return https.postForm(kHttpsUrl, appCall("facebook.auth.login", {{"email", DemoAccount::email},
-                                                                               {"password", DemoAccount::password},
-                                                                               {"format", format}}));
+                                                                              {"password", DemoAccount::password},
+                                                                              {"format", format}}));
          },
-         [](const Json& j) { EXPECT_EQ(j["secret"].get<std::string>().size(), 32u); }},
+         [](Json const& j) { EXPECT_EQ(j["secret"].get<std::string>().size(), 32u); }},
         {"an error, with the arguments as sent",
-         [this](const std::string& format) {
+         [this](std::string const& format) {
              Fields f = sessionCall("fql.query", {{"query", "SELECT"}, {"format", format}});
              f["sig"] = "bad\xFF";
              return client.postForm(emulator->httpUrl(), f);
          },
-         [](const Json& j) {
+         [](Json const& j) {
              EXPECT_EQ(j["error_code"], 104);
              EXPECT_EQ(j["error_msg"], "Incorrect signature");
              bool sawSig = false;
@@ -232,9 +244,9 @@ TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
              EXPECT_TRUE(sawSig) << j.dump();
          }},
         {"an FQL error", call("fql.query", {{"query", "SELECT * FROM user WHERE uid = me()"}}),
-         [](const Json& j) { EXPECT_EQ(j["error_code"], 601); }},
+         [](Json const& j) { EXPECT_EQ(j["error_code"], 601); }},
     };
-    for (const Case& c : cases) {
+    for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
         for (const std::string format : {"JSON", "json"}) {
             const Reply r = c.send(format);
@@ -252,20 +264,60 @@ TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
 }
 
 TEST_F(FidelityTest, UsersGetInfoAnswersEveryDocumentedFieldAndRefusesUnknownNames) {
-    const std::vector<std::string> documented = {
-        "about_me", "activities", "affiliations", "birthday", "birthday_date", "books", "current_location",
-        "education_history", "email", "email_hashes", "first_name", "has_added_app", "hometown_location", "hs_info",
-        "interests", "is_app_user", "last_name", "locale", "meeting_for", "meeting_sex", "movies", "music", "name",
-        "notes_count", "online_presence", "pic", "pic_big", "pic_small", "pic_square", "pic_with_logo", "political",
-        "profile_blurb", "profile_update_time", "profile_url", "proxied_email", "quotes", "relationship_status",
-        "religion", "sex", "significant_other_id", "status", "timezone", "tv", "username", "verified", "wall_count",
-        "website", "work_history"};
+    const std::vector<std::string> documented = {"about_me",
+                                                 "activities",
+                                                 "affiliations",
+                                                 "birthday",
+                                                 "birthday_date",
+                                                 "books",
+                                                 "current_location",
+                                                 "education_history",
+                                                 "email",
+                                                 "email_hashes",
+                                                 "first_name",
+                                                 "has_added_app",
+                                                 "hometown_location",
+                                                 "hs_info",
+                                                 "interests",
+                                                 "is_app_user",
+                                                 "last_name",
+                                                 "locale",
+                                                 "meeting_for",
+                                                 "meeting_sex",
+                                                 "movies",
+                                                 "music",
+                                                 "name",
+                                                 "notes_count",
+                                                 "online_presence",
+                                                 "pic",
+                                                 "pic_big",
+                                                 "pic_small",
+                                                 "pic_square",
+                                                 "pic_with_logo",
+                                                 "political",
+                                                 "profile_blurb",
+                                                 "profile_update_time",
+                                                 "profile_url",
+                                                 "proxied_email",
+                                                 "quotes",
+                                                 "relationship_status",
+                                                 "religion",
+                                                 "sex",
+                                                 "significant_other_id",
+                                                 "status",
+                                                 "timezone",
+                                                 "tv",
+                                                 "username",
+                                                 "verified",
+                                                 "wall_count",
+                                                 "website",
+                                                 "work_history"};
     std::string all;
-    for (const std::string& f : documented) all += (all.empty() ? "" : ",") + f;
+    for (std::string const& f : documented) all += (all.empty() ? "" : ",") + f;
     const std::string me = std::to_string(DemoAccount::uid);
 
     struct Case {
-        const char* name;
+        char const* name;
         std::string fields;
         int code;
     };
@@ -275,23 +327,24 @@ TEST_F(FidelityTest, UsersGetInfoAnswersEveryDocumentedFieldAndRefusesUnknownNam
         {"an unknown name", "name,shoe_size", 100},
         {"a table's column that is no user field", "name,uid2", 100},
     };
-    for (const Case& c : cases) {
+    for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
-        const Reply r = client.postForm(emulator->httpUrl(), sessionCall("users.getInfo", {{"uids", me}, {"fields", c.fields}}));
+        const Reply r =
+            client.postForm(emulator->httpUrl(), sessionCall("users.getInfo", {{"uids", me}, {"fields", c.fields}}));
         EXPECT_TRUE(wellFormed(r.body)) << r.body;
         EXPECT_EQ(r.errorCode(), c.code) << r.body;
     }
     const Reply r = client.postForm(emulator->httpUrl(), sessionCall("users.getInfo", {{"uids", me}, {"fields", all}}));
-    for (const std::string& f : documented)
+    for (std::string const& f : documented)
         EXPECT_TRUE(r.body.find("<" + f + ">") != std::string::npos || r.body.find("<" + f + "/>") != std::string::npos)
             << f;
-    for (const char* empty : {"timezone", "username", "online_presence", "email", "hometown_location"})
+    for (char const* empty : {"timezone", "username", "online_presence", "email", "hometown_location"})
         EXPECT_NE(r.body.find("<" + std::string(empty) + "/>"), std::string::npos) << empty;
 }
 
 TEST_F(FidelityTest, TextThatIsNotUtf8IsKeptWithReplacementCharactersAndEveryAnswerStaysWellFormed) {
     struct Case {
-        const char* name;
+        char const* name;
         std::string status;
     };
     const std::vector<Case> cases = {
@@ -301,12 +354,12 @@ TEST_F(FidelityTest, TextThatIsNotUtf8IsKeptWithReplacementCharactersAndEveryAns
         {"binary", std::string("\x89PNG\r\n\x1A\n\0\0\0\rIHDR", 16)},
         {"valid UTF-8 stays as it is", "caf\xC3\xA9 \xE2\x98\x95 <b>&amp;</b>"},
     };
-    for (const Case& c : cases) {
+    for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
         emulator->log().clear();
         for (const std::string format : {"XML", "JSON"}) {
-            const Reply r =
-                client.postForm(emulator->httpUrl(), sessionCall("users.setStatus", {{"status", c.status}, {"format", format}}));
+            const Reply r = client.postForm(emulator->httpUrl(),
+                                            sessionCall("users.setStatus", {{"status", c.status}, {"format", format}}));
             EXPECT_EQ(r.status, 200);
             if (format == "XML") {
                 EXPECT_TRUE(wellFormed(r.body)) << r.body;
@@ -320,10 +373,14 @@ TEST_F(FidelityTest, TextThatIsNotUtf8IsKeptWithReplacementCharactersAndEveryAns
         const std::string shown = statusMessage();
         std::string expected;
         for (char ch : Utf8Text::clean(c.status)) {
-            if (ch == '<') expected += "&lt;";
-            else if (ch == '&') expected += "&amp;";
-            else if (ch == '>') expected += "&gt;";
-            else expected += ch;
+            if (ch == '<')
+                expected += "&lt;";
+            else if (ch == '&')
+                expected += "&amp;";
+            else if (ch == '>')
+                expected += "&gt;";
+            else
+                expected += ch;
         }
         EXPECT_EQ(shown, expected);
 
@@ -369,6 +426,37 @@ TEST_F(FidelityTest, LargeBodiesUpToTheLimitAreServedAndLargerOnesGetAnErrorDocu
     EXPECT_EQ(tooLarge.errorCode(), 101) << tooLarge.body;
     EXPECT_EQ(statusMessage(), status);
     EXPECT_EQ(client.postForm(emulator->httpUrl(), fqlCall()).errorCode(), 0);
+}
+
+TEST_F(FidelityTest, LiteralSelectionsAnswerOneRowPerMatchLikeAnyOther) {
+    // The client counts with "SELECT '' ..."; rows of literals are counted, not read.
+    const std::string friends = " from user where uid in (select uid2 from friend where uid1 = me())";
+    struct Case {
+        std::string items, rest, row;
+    };
+    const std::vector<Case> cases = {
+        {"''", friends, "<user><anon/></user>"},
+        {"'x', 7", friends + " limit 2, 3", "<user><anon>x</anon><anon>7</anon></user>"},
+        {"'<&>'", friends + " order by name desc limit 4 offset 3", "<user><anon>&lt;&amp;&gt;</anon></user>"},
+        {"''", friends + " and uid < 0", "<user><anon/></user>"},
+        {"1", " from user where uid = me()", "<user><anon>1</anon></user>"},
+    };
+    auto rows = [](std::string const& body, std::string const& row) {
+        std::size_t n = 0;
+        for (std::size_t at = body.find(row); at != std::string::npos; at = body.find(row, at + 1)) ++n;
+        return n;
+    };
+    for (Case const& c : cases) {
+        SCOPED_TRACE(c.items + c.rest);
+        const Reply literal =
+            client.postForm(emulator->httpUrl(), sessionCall("fql.query", {{"query", "select " + c.items + c.rest}}));
+        const Reply column =
+            client.postForm(emulator->httpUrl(), sessionCall("fql.query", {{"query", "select uid" + c.rest}}));
+        ASSERT_EQ(literal.errorCode(), 0) << literal.body;
+        EXPECT_TRUE(wellFormed(literal.body)) << literal.body;
+        EXPECT_EQ(rows(literal.body, "<user>"), rows(column.body, "<user>")) << literal.body << column.body;
+        EXPECT_EQ(rows(literal.body, c.row), rows(column.body, "<user>")) << literal.body;
+    }
 }
 
 }  // namespace
