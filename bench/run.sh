@@ -139,7 +139,9 @@ report cursor/stream_walk/real_time curl/stream_replay/real_time page
 report cursor/stream_walk/real_time curl/stream_replay/real_time pagecpu
 report engine/contact_page sqlite_xml/contact_page cpu
 report engine/count sqlite_xml/count cpu
-report http/contact_page engine/contact_page wall
+report http/contact_page/process_time/real_time engine/contact_page wall
+report http/contact_page/process_time/real_time sqlite/contact_page wall
+report http/contact_page/process_time/real_time sqlite/contact_page cpu
 
 # The message cursor's peak resident memory over the bytes of its records' keys and values.
 if [ -f "$results/bench_message_memory.json" ]; then

@@ -8,7 +8,7 @@ packages=(
   libcpp-httplib-dev nlohmann-json3-dev libcli11-dev
   libgtest-dev libgmock-dev libbenchmark-dev
   curl openssl
-  clang clang-format
+  clang clang-format libclang-rt-14-dev
 )
 missing=()
 for p in "${packages[@]}"; do

@@ -53,6 +53,9 @@ FqlColumn structured(std::string name, FqlShape shape, std::vector<FqlField> fie
     return c;
 }
 
+// A column the service had and this one keeps no data for: always the empty text.
+FqlColumn unknown(std::string name) { return computed(std::move(name), FqlType::Text, "''"); }
+
 FqlColumn hidden(FqlColumn c, int bit) {
     c.hiddenBit = bit;
     return c;
@@ -114,6 +117,22 @@ FqlCatalog::FqlCatalog() {
                    8),
             stored("locale", T),
             hidden(stored("about_me", T), 4),
+            computed("pic_small_with_logo", T, "('http://pics.trelm.example/t/' || $.uid || '.jpg')"),
+            computed("pic_big_with_logo", T, "('http://pics.trelm.example/n/' || $.uid || '.jpg')"),
+            computed("pic_square_with_logo", T, "('http://pics.trelm.example/q/' || $.uid || '.jpg')"),
+            computed("pic_with_logo", T, "('http://pics.trelm.example/s/' || $.uid || '.jpg')"),
+            // The rest of the service's user fields: this service keeps no data for them, and
+            // answers each as an empty element, as the service did for a field a user left empty.
+            unknown("activities"), unknown("affiliations"), unknown("allowed_restrictions"),
+            unknown("birthday_date"), unknown("books"), unknown("education_history"), unknown("email"),
+            unknown("email_hashes"), unknown("family"), unknown("has_added_app"), unknown("hometown_location"),
+            unknown("hs_info"), unknown("interests"), unknown("is_app_user"), unknown("is_blocked"),
+            unknown("meeting_for"), unknown("meeting_sex"), unknown("movies"), unknown("music"),
+            unknown("name_format"), unknown("notes_count"), unknown("online_presence"), unknown("political"),
+            unknown("profile_blurb"), unknown("profile_update_time"), unknown("proxied_email"), unknown("quotes"),
+            unknown("relationship_status"), unknown("religion"), unknown("significant_other_id"),
+            unknown("timezone"), unknown("tv"), unknown("username"), unknown("verified"), unknown("wall_count"),
+            unknown("website"), unknown("work_history"),
         },
         {{"uid"}},
         {"uid"},

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <string>
 
+#include "AnswerWriter.h"
 #include "AttachmentWriter.h"
 #include "FqlPlan.h"
 #include "Store.h"
@@ -26,9 +27,12 @@ public:
     // Parses, checks and translates `query` for `viewer`; `now` is the value of now().
     static Status compile(std::int64_t viewer, std::int64_t now, const std::string& query, FqlPlan& plan);
 
-    // compile + execute: one <table> element per row appended to `root`, which becomes a list.
+    // compile + execute: one <table> element per row, written inside the open element of `out`
+    // as the rows come from SQLite. On failure part of the rows may have been written.
+    Status run(std::int64_t viewer, std::int64_t now, const std::string& query, AnswerWriter& out);
+    Status execute(const FqlPlan& plan, AnswerWriter& out);
+    // The same rows appended to `root`, which becomes a list.
     Status run(std::int64_t viewer, std::int64_t now, const std::string& query, XmlNode& root);
-    Status execute(const FqlPlan& plan, XmlNode& root);
 
 private:
     SqliteDatabase& db_;

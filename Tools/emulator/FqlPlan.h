@@ -29,6 +29,11 @@ struct FqlPlan {
     std::vector<SqlValue> params;
     std::string rowElement;
     std::vector<FqlOutput> outputs;
+    // When every selected item is a literal (the client's counting statement, "SELECT '' ..."),
+    // each row is the same: `constantRow` holds its texts in output order, and `countSql` (same
+    // parameters) only counts the matches, so that no row has to come out of SQLite.
+    std::vector<std::string> constantRow;
+    std::string countSql;
 };
 
 }  // namespace emu

@@ -124,6 +124,14 @@ FqlPlan FqlTranslator::translate(const FqlSelect& select) {
     buildSelect(select, &plan, false, out);
     plan.sql = std::move(out.sql);
     plan.params = std::move(out.params);
+    bool literals = true;
+    for (const auto& item : select.items)
+        literals = literals && (item->kind == FqlExprKind::String || item->kind == FqlExprKind::Integer);
+    if (literals) {
+        for (const auto& item : select.items)
+            plan.constantRow.push_back(item->kind == FqlExprKind::String ? item->text : std::to_string(item->integer));
+        plan.countSql = "SELECT count(*) FROM (" + plan.sql + ")";
+    }
     return plan;
 }
 

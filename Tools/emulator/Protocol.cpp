@@ -1,9 +1,14 @@
 #include "Protocol.h"
 
 #include <chrono>
+#include <cstring>
 #include <exception>
 #include <iostream>
 #include <thread>
+
+#include "JsonAnswerWriter.h"
+#include "Utf8Text.h"
+#include "XmlAnswerWriter.h"
 
 namespace emu {
 namespace {
@@ -34,19 +39,48 @@ std::string malform(const std::string& body) {
     return body.substr(0, body.size() * 2 / 3) + "<</ broken&;>\n";
 }
 
+// The answer in `format`, written by `fn` into the writer it is given.
+template <typename Fn>
+std::string render(Protocol::Format format, std::size_t sizeHint, Fn&& fn) {
+    if (format == Protocol::Format::Json) {
+        JsonAnswerWriter writer(sizeHint);
+        fn(static_cast<AnswerWriter&>(writer));
+        return writer.take();
+    }
+    XmlAnswerWriter writer(sizeHint);
+    fn(static_cast<AnswerWriter&>(writer));
+    return writer.take();
+}
+
+// Whether `bytes` start like an image of a format the service took: JPEG, PNG, GIF, BMP, TIFF,
+// PSD, JPEG 2000 or IFF.
+bool looksLikeImage(const std::string& bytes) {
+    auto startsWith = [&](const char* magic, std::size_t length) {
+        return bytes.size() >= length && std::memcmp(bytes.data(), magic, length) == 0;
+    };
+    return startsWith("\xFF\xD8\xFF", 3) || startsWith("\x89PNG\r\n\x1A\n", 8) || startsWith("GIF87a", 6) ||
+           startsWith("GIF89a", 6) || (startsWith("BM", 2) && bytes.size() >= 26) || startsWith("II*\0", 4) ||
+           startsWith("MM\0*", 4) || startsWith("8BPS", 4) || startsWith("\0\0\0\x0CjP  ", 8) ||
+           (startsWith("FORM", 4) && bytes.size() >= 12 &&
+            (bytes.compare(8, 4, "ILBM") == 0 || bytes.compare(8, 4, "PBM ") == 0));
+}
+
 using Runner = Status (*)(Store&, std::int64_t viewer, const HttpCall&, XmlNode& root);
+// A method that writes its rows straight into the answer text, inside the open root.
+using Streamer = Status (*)(Store&, std::int64_t viewer, const HttpCall&, AnswerWriter& root);
 
 struct MethodEntry {
     const char* name;
     bool listRoot;
     const char* required;  // a parameter without which the call is invalid (100), or null
     Runner run;
+    Streamer stream = nullptr;  // used instead of run when set
 };
 
 // Session methods. auth.login, the one application method, is answered by the protocol itself.
 const MethodEntry kMethods[] = {
-    {"fql.query", true, "query",
-     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) { return s.fqlQuery(v, arg(c, "query"), r); }},
+    {"fql.query", true, "query", nullptr,
+     [](Store& s, std::int64_t v, const HttpCall& c, AnswerWriter& w) { return s.fqlQuery(v, arg(c, "query"), w); }},
     {"stream.get", false, nullptr,
      [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) {
          return s.streamGet(v, arg(c, "viewer_id"), arg(c, "start_time"), arg(c, "end_time"), arg(c, "limit"), r);
@@ -64,7 +98,8 @@ const MethodEntry kMethods[] = {
          return s.setStatus(v, arg(c, "status"), arg(c, "status_includes_verb"), arg(c, "clear"), r);
      }},
     {"photos.upload", false, nullptr,
-     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) {
+     [](Store& s, std::int64_t v, const HttpCall& c, XmlNode& r) -> Status {
+         if (c.haveFile && !c.file.empty() && !looksLikeImage(c.file)) return serviceError(324);
          return s.uploadPhoto(v, arg(c, "aid"), arg(c, "caption"), c.file, c.haveFile, r);
      }},
     {"users.getInfo", true, "uids",
@@ -113,23 +148,43 @@ std::string Protocol::responseRoot(const std::string& method) {
     return root + "_response";
 }
 
-std::string Protocol::errorDocument(const ServiceError& error, const Arguments& args) {
-    XmlNode root("error_response");
-    root.add("error_code", std::to_string(error.code));
-    root.add("error_msg", error.message);
-    XmlNode& list = root.addList("request_args");
-    for (const auto& [key, value] : visibleArgs(args)) {
-        XmlNode& a = list.add("arg");
-        a.add("key", key);
-        a.add("value", value);
-    }
-    return renderDocument(root);
+Protocol::Format Protocol::formatOf(const Arguments& args) {
+    auto it = args.find("format");
+    if (it == args.end() || it->second.size() != 4) return Format::Xml;
+    std::string lower = it->second;
+    for (char& c : lower) c = static_cast<char>(c >= 'A' && c <= 'Z' ? c - 'A' + 'a' : c);
+    return lower == "json" ? Format::Json : Format::Xml;
+}
+
+const char* Protocol::contentType(Format format) {
+    return format == Format::Json ? "application/json; charset=utf-8" : "text/xml; charset=utf-8";
+}
+
+std::string Protocol::errorDocument(const ServiceError& error, const Arguments& args, Format format) {
+    const Arguments shown = visibleArgs(args);
+    std::size_t size = 256;
+    for (const auto& [key, value] : shown) size += key.size() + value.size() + 40;
+    return render(format, size, [&](AnswerWriter& w) {
+        w.open("error_response", false);
+        w.number("error_code", error.code);
+        w.leaf("error_msg", error.message);
+        w.open("request_args", true);
+        for (const auto& [key, value] : shown) {
+            w.open("arg", false);
+            w.leaf("key", key);
+            w.leaf("value", value);
+            w.close();
+        }
+        w.close();
+        w.close();
+    });
 }
 
 HttpReply Protocol::handle(const HttpCall& call) {
     const std::string sent = arg(call, "method");
     const std::string method = sent.rfind(kPrefix, 0) == 0 ? sent.substr(9) : sent;
     const FaultDecision faults = faults_.decide(method);
+    const Format format = formatOf(call.args);
 
     LoggedRequest entry;
     const bool logging = log_.enabled();
@@ -160,7 +215,7 @@ HttpReply Protocol::handle(const HttpCall& call) {
 
     Outcome outcome;
     try {
-        outcome = process(call, method, faults);
+        outcome = process(call, method, faults, format);
     } catch (const std::exception& e) {
         // An emulator fault, not a service error: said on stderr and in the request log, so that
         // nobody takes the code-1 answer below for the service's behaviour.
@@ -169,13 +224,16 @@ HttpReply Protocol::handle(const HttpCall& call) {
         outcome.error = serviceError(1);
     }
     HttpReply reply;
+    reply.contentType = contentType(format);
     int errorCode = 0;
     if (outcome.error) {
         errorCode = outcome.error->code;
         if (outcome.error->message.empty()) outcome.error->message = errorText(errorCode);
-        reply.body = errorDocument(*outcome.error, call.args);
+        reply.body = errorDocument(*outcome.error, call.args, format);
+    } else if (outcome.rendered) {
+        reply.body = std::move(outcome.body);
     } else {
-        reply.body = renderDocument(outcome.root);
+        reply.body = render(format, 1024, [&](AnswerWriter& w) { w.write(outcome.root); });
     }
     if (faults.truncate) {
         reply.delivery = HttpReply::Delivery::Truncated;
@@ -188,8 +246,13 @@ HttpReply Protocol::handle(const HttpCall& call) {
     return finish(std::move(reply), errorCode, "");
 }
 
-Protocol::Outcome Protocol::process(const HttpCall& call, const std::string& method, const FaultDecision& faults) {
-    auto fail = [](int code) { return Outcome{{}, serviceError(code)}; };
+Protocol::Outcome Protocol::process(const HttpCall& call, const std::string& method, const FaultDecision& faults,
+                                    Format format) {
+    auto fail = [](int code) {
+        Outcome out;
+        out.error = serviceError(code);
+        return out;
+    };
 
     const auto appSecret = has(call, "api_key") ? store_.appSecret(arg(call, "api_key")) : std::nullopt;
     if (!appSecret) return fail(101);
@@ -225,7 +288,17 @@ Protocol::Outcome Protocol::process(const HttpCall& call, const std::string& met
         return login(call);
     }
     if (entry->required != nullptr && arg(call, entry->required).empty()) return fail(100);
-    return runMethod(method, session->uid, call);
+    // The method sees its texts as the service kept them: valid UTF-8 that XML can carry. The
+    // signature above was checked over the bytes as sent.
+    bool clean = true;
+    for (const auto& [name, value] : call.args) clean = clean && Utf8Text::isClean(value);
+    if (clean) return runMethod(method, session->uid, call, format);
+    HttpCall cleaned;
+    cleaned.file = call.file;
+    cleaned.haveFile = call.haveFile;
+    cleaned.https = call.https;
+    for (const auto& [name, value] : call.args) cleaned.args.emplace(name, Utf8Text::clean(value));
+    return runMethod(method, session->uid, cleaned, format);
 }
 
 Protocol::Outcome Protocol::login(const HttpCall& call) {
@@ -250,9 +323,19 @@ Protocol::Outcome Protocol::login(const HttpCall& call) {
     return out;
 }
 
-Protocol::Outcome Protocol::runMethod(const std::string& method, std::int64_t viewer, const HttpCall& call) {
+Protocol::Outcome Protocol::runMethod(const std::string& method, std::int64_t viewer, const HttpCall& call,
+                                      Format format) {
     const MethodEntry* entry = findMethod(method);
     Outcome out;
+    if (entry->stream != nullptr) {
+        out.body = render(format, 16 * 1024, [&](AnswerWriter& w) {
+            w.open(responseRoot(method), entry->listRoot);
+            out.error = entry->stream(store_, viewer, call, w);
+            w.close();
+        });
+        out.rendered = !out.error;
+        return out;
+    }
     out.root.name = responseRoot(method);
     out.root.list = entry->listRoot;
     out.error = entry->run(store_, viewer, call, out.root);

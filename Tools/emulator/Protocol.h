@@ -35,25 +35,33 @@ public:
     // The server's handler: answers `call`, applying the faults decided for it, and logs it.
     HttpReply handle(const HttpCall& call);
 
+    // The answer's format: "format" = "JSON" (any case) asks for JSON; anything else is XML.
+    enum class Format { Xml, Json };
+    static Format formatOf(const Arguments& args);
+    static const char* contentType(Format format);
+
     // The service's text for an error code ("An unknown error occurred" for a code it had no text for).
     static std::string errorText(int code);
 
-    // An "error_response" document listing every argument of the request (a password as "***").
-    static std::string errorDocument(const ServiceError& error, const Arguments& args);
+    // An "error_response" document listing every argument of the request (a password as "***");
+    // in JSON an object {"error_code": n, "error_msg": "...", "request_args": [{"key", "value"}...]}.
+    static std::string errorDocument(const ServiceError& error, const Arguments& args, Format format = Format::Xml);
 
     // The root element of a method's answer: "fql.query" gives "fql_query_response".
     static std::string responseRoot(const std::string& method);
 
 private:
-    // The answer document, or the error to answer with.
+    // The answer document (as a tree, or already rendered), or the error to answer with.
     struct Outcome {
         XmlNode root;
         Status error;
+        std::string body;
+        bool rendered = false;  // body holds the answer; root is unused
     };
 
-    Outcome process(const HttpCall& call, const std::string& method, const FaultDecision& faults);
+    Outcome process(const HttpCall& call, const std::string& method, const FaultDecision& faults, Format format);
     Outcome login(const HttpCall& call);
-    Outcome runMethod(const std::string& method, std::int64_t viewer, const HttpCall& call);
+    Outcome runMethod(const std::string& method, std::int64_t viewer, const HttpCall& call, Format format);
 
     Store& store_;
     SessionTable& sessions_;

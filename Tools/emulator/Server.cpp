@@ -1,5 +1,7 @@
 #include "Server.h"
 
+#include "RequestParser.h"
+
 #include <arpa/inet.h>
 #include <dirent.h>
 #include <netinet/in.h>
@@ -11,6 +13,7 @@
 #include <chrono>
 #include <cstdlib>
 #include <iostream>
+#include <string_view>
 
 #include <httplib.h>
 #include <openssl/ssl.h>
@@ -27,8 +30,8 @@ namespace emu {
 namespace {
 
 constexpr const char* kPath = "/restserver.php";
-// Photos are the largest thing a client sends; anything bigger is not a request of this service.
-constexpr std::size_t kMaxBody = 64u * 1024u * 1024u;
+// The request's own Content-Type, kept where the HTTP library does not look (see configure).
+constexpr const char* kBodyType = "X-Emulator-Body-Type";
 // Requests a client may send on one connection. The library's default of 5 would force a new
 // connection (and a TLS handshake) every fifth call.
 constexpr std::size_t kKeepAliveMaxCount = 1000000;
@@ -87,22 +90,10 @@ int connectionSocket(const httplib::Request& req) {
     return found;
 }
 
-HttpCall readCall(const httplib::Request& req, bool https) {
-    HttpCall call;
-    call.https = https;
-    // The library puts the query string and a url-encoded body into params, query string first.
-    for (const auto& [name, value] : req.params) call.args[name] = value;
-    for (const auto& [name, part] : req.files) {
-        if (!part.filename.empty()) {
-            if (!call.haveFile) {
-                call.file = part.content;
-                call.haveFile = true;
-            }
-            continue;
-        }
-        call.args[name] = part.content;
-    }
-    return call;
+// The query string of a request target ("/restserver.php?a=1" gives "a=1").
+std::string_view queryOf(const std::string& target) {
+    const std::size_t mark = target.find('?');
+    return mark == std::string::npos ? std::string_view() : std::string_view(target).substr(mark + 1);
 }
 
 void deliver(const httplib::Request& req, httplib::Response& res, HttpReply reply) {
@@ -159,12 +150,26 @@ void Server::configure(httplib::Server& server, bool https) {
     });
     server.set_keep_alive_max_count(kKeepAliveMaxCount);
     server.set_keep_alive_timeout(options_.keepAliveSeconds > 0 ? options_.keepAliveSeconds : 1);
-    server.set_payload_max_length(kMaxBody);
 
-    auto handle = [this, https](const httplib::Request& req, httplib::Response& res) {
+    // The library reads url-encoded bodies only up to 8 KB and parses multipart bodies itself,
+    // dropping a file part that has no name. Under another header name the body reaches the
+    // handler's reader untouched, and RequestParser reads it as the service did.
+    server.set_pre_routing_handler([](const httplib::Request& req, httplib::Response&) {
+        // The library's request object is its own and mutable; only this hook sees it as const.
+        auto& mutableReq = const_cast<httplib::Request&>(req);
+        auto it = mutableReq.headers.find("Content-Type");
+        if (it != mutableReq.headers.end()) {
+            std::string type = std::move(it->second);
+            mutableReq.headers.erase(it);
+            mutableReq.headers.emplace(kBodyType, std::move(type));
+        }
+        return httplib::Server::HandlerResponse::Unhandled;
+    });
+
+    auto answer = [this](const httplib::Request& req, httplib::Response& res, HttpCall call) {
         HttpReply reply;
         try {
-            reply = handler_(readCall(req, https));
+            reply = handler_(call);
         } catch (const std::exception& e) {
             // An emulator fault outside the protocol's own handling: said before the bare 500.
             std::cerr << "trelm-emulator: internal error answering " << req.method << " " << req.path << ": "
@@ -173,8 +178,39 @@ void Server::configure(httplib::Server& server, bool https) {
         }
         deliver(req, res, std::move(reply));
     };
-    server.Get(kPath, handle);
-    server.Post(kPath, handle);
+    server.Get(kPath, [https, answer](const httplib::Request& req, httplib::Response& res) {
+        HttpCall call;
+        call.https = https;
+        RequestParser::addUrlEncoded(queryOf(req.target), call);
+        answer(req, res, std::move(call));
+    });
+    const std::size_t maxBody = options_.maxBodyBytes;
+    server.Post(kPath, [https, answer, maxBody](const httplib::Request& req, httplib::Response& res,
+                                                const httplib::ContentReader& reader) {
+        HttpCall call;
+        call.https = https;
+        RequestParser::addUrlEncoded(queryOf(req.target), call);
+        // A body over the limit is read to its end (so that the client gets the answer rather
+        // than a reset connection) and then ignored, as the service's front end ignored it: the
+        // call has the arguments of its query string alone.
+        std::string body;
+        bool tooLarge = false;
+        reader([&](const char* data, std::size_t length) {
+            if (tooLarge || body.size() + length > maxBody) {
+                tooLarge = true;
+                body.clear();
+                body.shrink_to_fit();
+            } else {
+                body.append(data, length);
+            }
+            return true;
+        });
+        // A malformed multipart body adds nothing either: the call keeps its query string's
+        // arguments, whatever addBody says.
+        if (!tooLarge) RequestParser::addBody(req.get_header_value(kBodyType), body, call);
+        call.bodyIgnored = tooLarge;
+        answer(req, res, std::move(call));
+    });
 }
 
 bool Server::launch(Listener& listener, int wantedPort, int& boundPort, std::string& error) {

@@ -1,6 +1,7 @@
 // The emulator's HTTP and HTTPS listeners at "/restserver.php".
 #pragma once
 
+#include <cstddef>
 #include <functional>
 #include <memory>
 #include <string>
@@ -15,12 +16,13 @@ class Server;
 namespace emu {
 
 // One request, its arguments merged from the query string and a url-encoded or multipart body
-// (a later source wins for a repeated name: body over query string).
+// (a later source wins for a repeated name: body over query string); see RequestParser.
 struct HttpCall {
     Arguments args;
-    std::string file;        // the bytes of the multipart part that carries a file name
+    std::string file;        // the bytes of the first multipart part that carries a file name
     bool haveFile = false;
     bool https = false;
+    bool bodyIgnored = false;  // the body was over the server's limit: args hold the query string's
 };
 
 // How to answer it.
@@ -55,6 +57,10 @@ public:
         std::string keyPath;   // PEM private key of the certificate
         int threads = 16;      // workers per listener
         int keepAliveSeconds = 5;
+        // The largest request body read; a larger one is received and ignored (the call keeps the
+        // arguments of its query string). 16 MiB holds the largest photos of the service's time
+        // (a few MB straight from a camera) with room to spare, and bounds what one worker holds.
+        std::size_t maxBodyBytes = 16u * 1024u * 1024u;
     };
 
     Server(Options options, Handler handler);

@@ -1,6 +1,5 @@
 #include "SessionTable.h"
 
-#include <charconv>
 #include <chrono>
 #include <stdexcept>
 
@@ -59,15 +58,28 @@ SessionTable::Lookup SessionTable::use(const std::string& key) {
 }
 
 bool SessionTable::acceptCallId(const std::string& key, const std::string& callId) {
-    std::uint64_t value = 0;
-    const char* end = callId.data() + callId.size();
-    auto [ptr, ec] = std::from_chars(callId.data(), end, value);
-    if (callId.empty() || ec != std::errc() || ptr != end) return false;
+    const std::size_t point = callId.find('.');
+    std::string whole = callId.substr(0, point);
+    std::string fraction = point == std::string::npos ? std::string() : callId.substr(point + 1);
+    if (whole.empty() && fraction.empty()) return false;
+    for (const std::string* part : {&whole, &fraction})
+        for (char c : *part)
+            if (c < '0' || c > '9') return false;
+    whole.erase(0, whole.find_first_not_of('0') == std::string::npos ? whole.size() : whole.find_first_not_of('0'));
+    fraction.erase(fraction.find_last_not_of('0') + 1);
+    // Without leading zeros a longer integer part is the greater number; equal lengths compare
+    // digit by digit, and so do fractions without trailing zeros.
+    auto greater = [](const std::pair<std::string, std::string>& a, const std::pair<std::string, std::string>& b) {
+        if (a.first.size() != b.first.size()) return a.first.size() > b.first.size();
+        if (a.first != b.first) return a.first > b.first;
+        return a.second > b.second;
+    };
+    std::pair<std::string, std::string> value{std::move(whole), std::move(fraction)};
     std::lock_guard lock(mutex_);
     auto it = entries_.find(key);
     if (it == entries_.end()) return false;
-    if (it->second.lastCallId && value <= *it->second.lastCallId) return false;
-    it->second.lastCallId = value;
+    if (it->second.lastCallId && !greater(value, *it->second.lastCallId)) return false;
+    it->second.lastCallId = std::move(value);
     return true;
 }
 

@@ -7,6 +7,7 @@
 #include <optional>
 #include <string>
 #include <unordered_map>
+#include <utility>
 
 namespace emu {
 
@@ -41,8 +42,10 @@ public:
     // Looks up `key` and, when valid, counts one call on it. An expired session is forgotten.
     Lookup use(const std::string& key);
 
-    // Strict call_id: accepts `callId` when it is a decimal number greater than the last one
-    // accepted for this session (any number is greater than none) and remembers it.
+    // Strict call_id: accepts `callId` when it is a non-negative decimal number, with or without a
+    // fraction ("7", "1795457318.1586": the era's clients sent microtime(true)), greater as a
+    // number than the last one accepted for this session (any number is greater than none), and
+    // remembers it. Compared exactly, digit by digit, whatever the length.
     bool acceptCallId(const std::string& key, const std::string& callId);
 
     // Forgets a session; later calls with it get Unknown.
@@ -55,7 +58,9 @@ private:
     struct Entry {
         Session session;
         std::int64_t calls = 0;
-        std::optional<std::uint64_t> lastCallId;
+        // The last accepted call_id as (integer digits, fraction digits), without leading zeros of
+        // the integer part or trailing zeros of the fraction; unset before the first.
+        std::optional<std::pair<std::string, std::string>> lastCallId;
     };
 
     const Clock clock_;  // constant after construction

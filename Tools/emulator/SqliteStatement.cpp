@@ -55,4 +55,10 @@ std::string SqliteStatement::getText(int column) const {
     return std::string(reinterpret_cast<const char*>(text), static_cast<std::size_t>(sqlite3_column_bytes(stmt_, column)));
 }
 
+std::string_view SqliteStatement::textView(int column) const {
+    const unsigned char* text = sqlite3_column_text(stmt_, column);
+    if (!text) return {};
+    return {reinterpret_cast<const char*>(text), static_cast<std::size_t>(sqlite3_column_bytes(stmt_, column))};
+}
+
 }  // namespace emu

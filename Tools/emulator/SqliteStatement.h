@@ -3,6 +3,7 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 
 #include "SqlValue.h"
 
@@ -41,6 +42,8 @@ public:
     double getReal(int column) const;
     // The column's text; numbers as SQLite renders them, NULL as "".
     std::string getText(int column) const;
+    // The same text without a copy, valid until the next step or reset.
+    std::string_view textView(int column) const;
 
 private:
     sqlite3_stmt* stmt_;

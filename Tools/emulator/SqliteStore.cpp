@@ -13,6 +13,7 @@
 #include "Schema.h"
 #include "SqliteDatabase.h"
 #include "SqliteStatement.h"
+#include "XmlTreeWriter.h"
 
 namespace emu {
 
@@ -98,6 +99,12 @@ std::unique_ptr<Store> Store::open(const std::string& path, std::string& error) 
     return SqliteStore::openDatabase(path, error);
 }
 
+Status Store::fqlQuery(std::int64_t viewer, const std::string& query, XmlNode& root) {
+    root.list = true;
+    XmlTreeWriter rows(root);
+    return fqlQuery(viewer, query, rows);
+}
+
 std::unique_ptr<SqliteStore> SqliteStore::openDatabase(const std::string& path, std::string& error) {
     std::unique_ptr<SqliteDatabase> db = SqliteDatabase::open(path, error);
     if (!db) return nullptr;
@@ -152,9 +159,9 @@ std::optional<std::int64_t> SqliteStore::checkLogin(const std::string& email, co
     return stmt.getInt(0);
 }
 
-Status SqliteStore::fqlQuery(std::int64_t viewer, const std::string& query, XmlNode& root) {
+Status SqliteStore::fqlQuery(std::int64_t viewer, const std::string& query, AnswerWriter& out) {
     std::lock_guard<std::mutex> lock(mutex_);
-    return engine_->run(viewer, now(), query, root);
+    return engine_->run(viewer, now(), query, out);
 }
 
 Status SqliteStore::explainFql(std::int64_t viewer, const std::string& query, std::string& sql,

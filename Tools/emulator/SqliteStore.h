@@ -40,7 +40,8 @@ public:
     Status generate(const GeneratorOptions& options) override;
     std::optional<std::string> appSecret(const std::string& apiKey) override;
     std::optional<std::int64_t> checkLogin(const std::string& email, const std::string& password) override;
-    Status fqlQuery(std::int64_t viewer, const std::string& query, XmlNode& root) override;
+    using Store::fqlQuery;
+    Status fqlQuery(std::int64_t viewer, const std::string& query, AnswerWriter& out) override;
     Status streamGet(std::int64_t viewer, const std::string& viewerId, const std::string& startTime,
                      const std::string& endTime, const std::string& limit, XmlNode& root) override;
     Status getInbox(std::int64_t viewer, const std::string& start, const std::string& limit, XmlNode& root) override;

@@ -12,6 +12,8 @@
 
 namespace emu {
 
+class AnswerWriter;
+
 // The fixed demo account that the generator always creates (named in the README).
 struct DemoAccount {
     static constexpr const char* email = "demo@trelm.example";
@@ -80,7 +82,10 @@ public:
     // `root`, whose name the caller has already set (e.g. "fql_query_response"); the caller
     // renders it. Argument texts arrive as the client sent them; parsing and range checks
     // (error 100) are the store's.
-    virtual Status fqlQuery(std::int64_t viewer, const std::string& query, XmlNode& root) = 0;
+    // fql.query writes its rows straight into the answer: one element per row inside the open
+    // root of `out`. The XmlNode form appends the same rows to `root`, which becomes a list.
+    virtual Status fqlQuery(std::int64_t viewer, const std::string& query, AnswerWriter& out) = 0;
+    Status fqlQuery(std::int64_t viewer, const std::string& query, XmlNode& root);
     virtual Status streamGet(std::int64_t viewer, const std::string& viewerId, const std::string& startTime,
                              const std::string& endTime, const std::string& limit, XmlNode& root) = 0;
     virtual Status getInbox(std::int64_t viewer, const std::string& start, const std::string& limit,

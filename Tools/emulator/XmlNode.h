@@ -2,7 +2,6 @@
 #pragma once
 
 #include <string>
-#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -37,66 +36,7 @@ struct XmlNode {
     }
 };
 
-// Escapes &, <, >, " and ' for element text and attribute values. Runs of plain text are copied
-// whole: most answer text has nothing to escape.
-inline void appendEscaped(std::string& out, std::string_view text) {
-    std::size_t start = 0;
-    while (start < text.size()) {
-        const std::size_t special = text.find_first_of("&<>\"'", start);
-        if (special == std::string_view::npos) {
-            out.append(text.data() + start, text.size() - start);
-            return;
-        }
-        out.append(text.data() + start, special - start);
-        switch (text[special]) {
-            case '&': out += "&amp;"; break;
-            case '<': out += "&lt;"; break;
-            case '>': out += "&gt;"; break;
-            case '"': out += "&quot;"; break;
-            default: out += "&apos;"; break;
-        }
-        start = special + 1;
-    }
-}
-
-// About the size of `node` rendered (before escaping), to size the output once.
-inline std::size_t renderedSizeHint(const XmlNode& node) {
-    std::size_t size = 2 * node.name.size() + node.text.size() + 24;
-    for (const XmlNode& c : node.children) size += renderedSizeHint(c);
-    return size;
-}
-
-inline void renderNode(std::string& out, const XmlNode& node, bool root) {
-    out += '<';
-    out += node.name;
-    if (root)
-        out += " xmlns=\"http://api.facebook.com/1.0/\""
-               " xmlns:xsi=\"http://www.w3.org/2001/XMLSchema-instance\"";
-    if (node.list) out += " list=\"true\"";
-    if (node.nil) {
-        out += " xsi:nil=\"true\"/>";
-        return;
-    }
-    if (node.children.empty() && node.text.empty()) {
-        out += "/>";
-        return;
-    }
-    out += '>';
-    for (const XmlNode& c : node.children) renderNode(out, c, false);
-    appendEscaped(out, node.text);
-    out += "</";
-    out += node.name;
-    out += '>';
-}
-
-// The whole document: XML declaration, then the root with the service's namespaces.
-inline std::string renderDocument(const XmlNode& root) {
-    std::string out;
-    out.reserve(renderedSizeHint(root) + 160);
-    out += "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n";
-    renderNode(out, root, true);
-    out += '\n';
-    return out;
-}
+// The whole document as the service wrote it (see XmlAnswerWriter).
+std::string renderDocument(const XmlNode& root);
 
 }  // namespace emu

@@ -124,7 +124,8 @@ int main(int argc, char** argv) {
     for (const auto& [method, rule] : faults) emulator.faults().set(method, rule);
     if (logStream != nullptr) {
         emulator.log().setListener([logStream](const emu::LoggedRequest& r) {
-            *logStream << toJson(r).dump() << std::endl;
+            // Arguments are the bytes a client sent; invalid UTF-8 in them is shown as U+FFFD.
+            *logStream << toJson(r).dump(-1, ' ', false, nlohmann::json::error_handler_t::replace) << std::endl;
         });
     }
 
