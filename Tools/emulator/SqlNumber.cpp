@@ -44,7 +44,8 @@ SqlValue SqlNumber::fromText(const std::string& text) {
     }
     const double real = std::strtod(number.c_str(), nullptr);
     // A real with an integral value is an integer, as in SQLite.
-    if (!integral && real == static_cast<double>(static_cast<std::int64_t>(real)) && real > -9.2e18 && real < 9.2e18)
+    // The range is checked first: converting a double outside it to an integer is undefined.
+    if (!integral && real > -9.2e18 && real < 9.2e18 && real == static_cast<double>(static_cast<std::int64_t>(real)))
         return SqlValue::ofInt(static_cast<std::int64_t>(real));
     return SqlValue::ofReal(real);
 }

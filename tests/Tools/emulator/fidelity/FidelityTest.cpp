@@ -428,6 +428,18 @@ TEST_F(FidelityTest, LargeBodiesUpToTheLimitAreServedAndLargerOnesGetAnErrorDocu
     EXPECT_EQ(client.postForm(emulator->httpUrl(), fqlCall()).errorCode(), 0);
 }
 
+TEST_F(FidelityTest, TextComparedWithANumberPastTheIntegerRangeIsAnsweredNotUndefined) {
+    // Found by the FQL fuzz target: the text converts to a real beyond any 64-bit integer.
+    for (char const* text : {"9727719610855429986.", "-1e300", "18446744073709551616"}) {
+        const Reply r = client.postForm(
+            emulator->httpUrl(),
+            sessionCall("fql.query",
+                        {{"query", "SELECT name FROM user WHERE uid = me() OR uid = '" + std::string(text) + "'"}}));
+        EXPECT_EQ(r.errorCode(), 0) << r.body;
+        EXPECT_NE(r.body.find("<name>"), std::string::npos) << r.body;
+    }
+}
+
 TEST_F(FidelityTest, LiteralSelectionsAnswerOneRowPerMatchLikeAnyOther) {
     // The client counts with "SELECT '' ..."; rows of literals are counted, not read.
     const std::string friends = " from user where uid in (select uid2 from friend where uid1 = me())";
