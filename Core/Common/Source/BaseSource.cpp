@@ -2,8 +2,7 @@
 
 namespace trelm {
 
-BaseSource::BaseSource(String const& name, String const& componentId)
-    : Component(name, componentId) {}
+BaseSource::BaseSource(String const& name, String const& componentId) : Component(name, componentId) {}
 
 BaseSource::~BaseSource() = default;
 
@@ -79,8 +78,7 @@ uError BaseSource::fieldRequiredStringNotEmpty(Record const& record, String cons
     return fieldRequiredNotEmpty(record, key, ignored);
 }
 
-uError BaseSource::fieldOptional(Record const& record, String const& key, bool& present,
-                                 String& value) {
+uError BaseSource::fieldOptional(Record const& record, String const& key, bool& present, String& value) {
     Variant const* held = record.search(key);
     if (held == nullptr || held->empty()) {
         present = false;
@@ -106,12 +104,8 @@ uError BaseSource::markDataInvisible(GUID const&) { return TRELM_ERROR(kDataOpNo
 uError BaseSource::postMarkInvisible(GUID const&) { return TRELM_OK(); }
 uError BaseSource::removeData(GUID const&, bool) { return TRELM_ERROR(kDataOpNotSupported); }
 uError BaseSource::postRemove(GUID const&) { return TRELM_OK(); }
-uError BaseSource::retrieveData(GUID const&, Record&, bool) {
-    return TRELM_ERROR(kDataOpNotSupported);
-}
+uError BaseSource::retrieveData(GUID const&, Record&, bool) { return TRELM_ERROR(kDataOpNotSupported); }
 uError BaseSource::checkQuery(IQueryItems::StartQueryMessage const&, bool) { return TRELM_OK(); }
-uError BaseSource::doStartQuery(IQueryItems::StartQueryMessage&, bool) {
-    return TRELM_ERROR(kNotSupported);
-}
+uError BaseSource::doStartQuery(IQueryItems::StartQueryMessage&, bool) { return TRELM_ERROR(kNotSupported); }
 
 }  // namespace trelm

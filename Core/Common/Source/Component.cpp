@@ -2,8 +2,7 @@
 
 namespace trelm {
 
-Component::Component(String name, String componentId)
-    : name_(std::move(name)), componentId_(std::move(componentId)) {}
+Component::Component(String name, String componentId) : name_(std::move(name)), componentId_(std::move(componentId)) {}
 
 Component::~Component() = default;
 

@@ -27,8 +27,7 @@ uError ComponentRegistry::add(String const& name, Component* component) {
 
 uError ComponentRegistry::remove(String const& name) {
     std::lock_guard<std::mutex> lock(mutex_);
-    auto it = std::find_if(entries_.begin(), entries_.end(),
-                           [&](auto const& entry) { return entry.first == name; });
+    auto it = std::find_if(entries_.begin(), entries_.end(), [&](auto const& entry) { return entry.first == name; });
     if (it == entries_.end()) return TRELM_ERROR(kNotFound);
     entries_.erase(it);
     return TRELM_OK();

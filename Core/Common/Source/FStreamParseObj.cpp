@@ -9,14 +9,12 @@ char const kPostsPath[] = ".stream_get_response.posts";
 char const kPostPath[] = ".stream_get_response.posts.stream_post";
 char const kMediaPath[] = ".stream_get_response.posts.stream_post.attachment.media";
 char const kMediumPath[] = ".stream_get_response.posts.stream_post.attachment.media.stream_media";
-char const kPhotoPath[] =
-    ".stream_get_response.posts.stream_post.attachment.media.stream_media.photo";
+char const kPhotoPath[] = ".stream_get_response.posts.stream_post.attachment.media.stream_media.photo";
 // Type of a status update post.
 char const kStatusType[] = "46";
 
 // Copies src[key] to dst[as] when present.
-uError copyField(Map<String, String> const& src, char const* key, Map<String, String>& dst,
-                 char const* as) {
+uError copyField(Map<String, String> const& src, char const* key, Map<String, String>& dst, char const* as) {
     String const* value = src.search(String(key));
     if (value == nullptr) return TRELM_OK();
     return dst.insert(String(as), *value);

@@ -18,8 +18,7 @@ uError initCurlOnce() {
     static CURLcode result = CURLE_OK;
     std::call_once(once, [] { result = curl_global_init(CURL_GLOBAL_DEFAULT); });
     if (result != CURLE_OK) {
-        return TRELM_ERROR_MSG(kResource, String("libcurl initialisation failed: ") +
-                                              curl_easy_strerror(result));
+        return TRELM_ERROR_MSG(kResource, String("libcurl initialisation failed: ") + curl_easy_strerror(result));
     }
     return TRELM_OK();
 }
@@ -68,8 +67,7 @@ uError HttpRequest::ConnectionCache::create(SmartPtr<ConnectionCache>& out) {
         if (rc == CURLSHE_OK) rc = curl_share_setopt(impl->share, CURLSHOPT_SHARE, kind);
     }
     if (rc != CURLSHE_OK) {
-        return TRELM_ERROR_MSG(kResource, String("cannot set up a libcurl share handle: ") +
-                                              curl_share_strerror(rc));
+        return TRELM_ERROR_MSG(kResource, String("cannot set up a libcurl share handle: ") + curl_share_strerror(rc));
     }
     out = SmartPtr<ConnectionCache>(new ConnectionCache(std::move(impl)));
     return TRELM_OK();
@@ -94,7 +92,7 @@ struct HttpRequest::Impl {
     String url;
     Map<String, String> fields;
     SmartPtr<InputDataStream> upload;
-    std::string body;      // the url-encoded fields; curl reads it during the transfer
+    std::string body;  // the url-encoded fields; curl reads it during the transfer
     std::string response;
     long status = 0;
     bool completed = false;
@@ -215,8 +213,7 @@ uError HttpRequest::Impl::configure() {
 
 HttpRequest::HttpRequest() : HttpRequest(Settings(), SmartPtr<ConnectionCache>()) {}
 
-HttpRequest::HttpRequest(Settings settings, SmartPtr<ConnectionCache> cache)
-    : impl_(std::make_unique<Impl>()) {
+HttpRequest::HttpRequest(Settings settings, SmartPtr<ConnectionCache> cache) : impl_(std::make_unique<Impl>()) {
     impl_->settings = std::move(settings);
     impl_->cache = std::move(cache);
 }

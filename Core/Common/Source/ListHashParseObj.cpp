@@ -14,8 +14,7 @@ uError ListHashParseObj::parse(String const& xml, Vector<Map<String, String>>& r
     return parseRows(xml, rows, count);
 }
 
-uError ListHashParseObj::parseRows(String const& xml, Vector<Map<String, String>>& rows,
-                                   unsigned& count) {
+uError ListHashParseObj::parseRows(String const& xml, Vector<Map<String, String>>& rows, unsigned& count) {
     rows_ = &rows;
     count_ = 0;
     inRow_ = false;
@@ -33,8 +32,7 @@ uError ListHashParseObj::start(String const& name, Vector<String> const& attribu
     unsigned const d = depth();
     if (d == 1) {
         if (name != root_) {
-            return TRELM_ERROR_MSG(kFailure,
-                                   "unexpected root element <" + name + ">, expected <" + root_ + ">");
+            return TRELM_ERROR_MSG(kFailure, "unexpected root element <" + name + ">, expected <" + root_ + ">");
         }
         return TRELM_OK();
     }

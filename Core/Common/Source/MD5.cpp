@@ -15,9 +15,7 @@ void MD5Init(MD5_CTX* ctx) {
     EVP_DigestInit_ex(ctx->evp, EVP_md5(), nullptr);
 }
 
-void MD5Update(MD5_CTX* ctx, unsigned char const* data, unsigned length) {
-    EVP_DigestUpdate(ctx->evp, data, length);
-}
+void MD5Update(MD5_CTX* ctx, unsigned char const* data, unsigned length) { EVP_DigestUpdate(ctx->evp, data, length); }
 
 void MD5Final(unsigned char digest[16], MD5_CTX* ctx) {
     unsigned int size = 0;

@@ -46,15 +46,28 @@ struct CoreKeys {
         trelm_RegisterMetadataType("core_object_type", INT32);
         trelm_RegisterMetadataType("core_object_time", INT32);
         trelm_RegisterMetadataType("core_object_deleted", BOOL);
-        for (char const* name : {
-                 "core_object_source", "core_object_origin_importcomponent",
-                 "core_object_origin_servicename", "core_event_service", "core_event_serviceid",
-                 "core_event_parent_serviceid", "core_event_uri", "core_event_contactid",
-                 "core_event_contactname", "core_event_contactfullname", "core_event_text",
-                 "core_event_subject", "core_contact_service", "core_contact_service_id",
-                 "core_contact_profile_url", "core_contact_profile_picture_url",
-                 "core_contact_display_name", "core_contact_name", "core_contact_location",
-                 "core_service_id", "media_uri", "media_notes"}) {
+        for (char const* name : {"core_object_source",
+                                 "core_object_origin_importcomponent",
+                                 "core_object_origin_servicename",
+                                 "core_event_service",
+                                 "core_event_serviceid",
+                                 "core_event_parent_serviceid",
+                                 "core_event_uri",
+                                 "core_event_contactid",
+                                 "core_event_contactname",
+                                 "core_event_contactfullname",
+                                 "core_event_text",
+                                 "core_event_subject",
+                                 "core_contact_service",
+                                 "core_contact_service_id",
+                                 "core_contact_profile_url",
+                                 "core_contact_profile_picture_url",
+                                 "core_contact_display_name",
+                                 "core_contact_name",
+                                 "core_contact_location",
+                                 "core_service_id",
+                                 "media_uri",
+                                 "media_notes"}) {
             trelm_RegisterMetadataType(name, STRING);
         }
     }

@@ -95,9 +95,9 @@ uError XMLParser::runParser(String const& xml) {
     if (run.stopped) {
         result = run.error;
     } else if (status != XML_STATUS_OK) {
-        std::string text = "XML error at line " + std::to_string(XML_GetCurrentLineNumber(run.expat)) +
-                           ", column " + std::to_string(XML_GetCurrentColumnNumber(run.expat)) +
-                           ": " + XML_ErrorString(XML_GetErrorCode(run.expat));
+        std::string text = "XML error at line " + std::to_string(XML_GetCurrentLineNumber(run.expat)) + ", column " +
+                           std::to_string(XML_GetCurrentColumnNumber(run.expat)) + ": " +
+                           XML_ErrorString(XML_GetErrorCode(run.expat));
         result = TRELM_ERROR_MSG(kFailure, String(text));
     } else {
         result = TRELM_OK();

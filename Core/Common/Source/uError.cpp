@@ -12,8 +12,7 @@ uError::uError(char const* file, int line) noexcept : line_(line), file_(file) {
 uError::uError(unsigned code, char const* message, char const* file, int line)
     : code_(code), line_(line), file_(file), message_(message ? message : "") {}
 
-uError::uError(unsigned code, uError const& cause, char const* message, char const* file,
-               int line)
+uError::uError(unsigned code, uError const& cause, char const* message, char const* file, int line)
     : code_(code),
       line_(line),
       file_(file),
@@ -23,13 +22,8 @@ uError::uError(unsigned code, uError const& cause, char const* message, char con
 uError::uError(unsigned code, String const& message, char const* file, int line)
     : code_(code), line_(line), file_(file), message_(message.str()) {}
 
-uError::uError(unsigned code, uError const& cause, String const& message, char const* file,
-               int line)
-    : code_(code),
-      line_(line),
-      file_(file),
-      message_(message.str()),
-      cause_(std::make_shared<uError const>(cause)) {}
+uError::uError(unsigned code, uError const& cause, String const& message, char const* file, int line)
+    : code_(code), line_(line), file_(file), message_(message.str()), cause_(std::make_shared<uError const>(cause)) {}
 
 String uError::message() const { return String(message_); }
 

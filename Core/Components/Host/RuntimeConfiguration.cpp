@@ -59,8 +59,7 @@ uError prepare(sqlite3* db, char const* sql, Statement& st) {
 }
 
 uError bindText(sqlite3* db, sqlite3_stmt* stmt, int index, String const& text) {
-    if (sqlite3_bind_text(stmt, index, text.cStr(), static_cast<int>(text.size()), SQLITE_TRANSIENT) !=
-        SQLITE_OK) {
+    if (sqlite3_bind_text(stmt, index, text.cStr(), static_cast<int>(text.size()), SQLITE_TRANSIENT) != SQLITE_OK) {
         return sqliteError(db, "bind");
     }
     return TRELM_OK();
@@ -202,7 +201,8 @@ uError RuntimeConfiguration::get(String const& tag, Map<String, Variant>& values
         if (rc == SQLITE_ROW) {
             auto const* text = reinterpret_cast<char const*>(sqlite3_column_text(st.stmt, 0));
             int size = sqlite3_column_bytes(st.stmt, 0);
-            TRELM_RETURN_IF_ERROR(found.insert(entry.first, Variant(String(text != nullptr ? text : "", static_cast<unsigned>(size)))));
+            TRELM_RETURN_IF_ERROR(
+                found.insert(entry.first, Variant(String(text != nullptr ? text : "", static_cast<unsigned>(size)))));
         } else if (rc != SQLITE_DONE) {
             return sqliteError(db_, "get");
         }

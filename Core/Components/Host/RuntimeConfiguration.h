@@ -81,7 +81,6 @@ private:
     sqlite3* db_ = nullptr;
     String path_;              // of the open store
     bool openFailed_ = false;  // the last open() failed
-
 };
 
 }  // namespace trelm

@@ -31,16 +31,13 @@ public:
     virtual uError closeConnection();
     virtual uError getPeers(Vector<String>& ids);
     virtual uError getPeerInfo(String uid, NetworkMetadata::tRELMNetworkPeer& peer);
-    virtual uError getPeerInfoBatch(Vector<String>& ids,
-                                    Vector<NetworkMetadata::tRELMNetworkPeer>& peers);
+    virtual uError getPeerInfoBatch(Vector<String>& ids, Vector<NetworkMetadata::tRELMNetworkPeer>& peers);
     virtual uError getPeerStatus(String const& uid, NetworkMetadata::tRELMNetworkEvent& event);
-    virtual uError getPeerStatusBatch(Vector<String>& ids,
-                                      Vector<NetworkMetadata::tRELMNetworkEvent>& events);
+    virtual uError getPeerStatusBatch(Vector<String>& ids, Vector<NetworkMetadata::tRELMNetworkEvent>& events);
     virtual uError setStatus(String const& text);
     virtual uError getPhotoAlbums(Vector<String>& albums);
     virtual uError publishPhoto(String const& uri, String const& caption);
-    virtual uError publishPhotoTo(String const& albumId, String const& uri,
-                                  String const& caption);
+    virtual uError publishPhotoTo(String const& albumId, String const& uri, String const& caption);
 
 protected:
     uError handleMessage(IMessage& msg) override;

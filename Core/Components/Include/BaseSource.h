@@ -51,8 +51,7 @@ public:
     static uError fieldRequiredStringNotEmpty(Record const& record, String const& key);
     // Absent: present = false, success, value untouched. Present: present = true and value
     // = its text, or kInvalid wrapping the conversion's error.
-    static uError fieldOptional(Record const& record, String const& key, bool& present,
-                                String& value);
+    static uError fieldOptional(Record const& record, String const& key, bool& present, String& value);
 
 protected:
     uError handleMessage(IMessage& msg) override;

@@ -13,8 +13,7 @@ public:
     static constexpr char const* kType = "ConfigurationChangedMessage";
 
     ConfigurationChangedMessage() : IMessage(kType) {}
-    explicit ConfigurationChangedMessage(Set<String> keys)
-        : IMessage(kType), keys(std::move(keys)) {}
+    explicit ConfigurationChangedMessage(Set<String> keys) : IMessage(kType), keys(std::move(keys)) {}
     ~ConfigurationChangedMessage() override;
 
     // The names of the keys that changed.

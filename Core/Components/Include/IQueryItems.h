@@ -21,9 +21,7 @@ struct Column {
     Metadata::Key key;
     bool flag = false;
 
-    friend bool operator==(Column const& a, Column const& b) {
-        return a.flag == b.flag && a.key == b.key;
-    }
+    friend bool operator==(Column const& a, Column const& b) { return a.flag == b.flag && a.key == b.key; }
 };
 
 // One condition of a query: `key` compared by `function` with `value` (for InList, a list).
@@ -72,12 +70,8 @@ public:
     static constexpr char const* kType = "IQueryItems::StartQueryMessage";
 
     StartQueryMessage() : IMessage(kType) {}
-    StartQueryMessage(Vector<Column> columns, Vector<Constraint> constraints,
-                      std::int64_t position = -1)
-        : IMessage(kType),
-          columns(std::move(columns)),
-          constraints(std::move(constraints)),
-          position(position) {}
+    StartQueryMessage(Vector<Column> columns, Vector<Constraint> constraints, std::int64_t position = -1)
+        : IMessage(kType), columns(std::move(columns)), constraints(std::move(constraints)), position(position) {}
     ~StartQueryMessage() override;
 
     // The wanted columns; also the query's ordering.

@@ -45,10 +45,8 @@ bool registerKeys() {
     Media::reg_OwnerSid = trelm_RegisterMetadataType("facebook_media_owner_service_id", STRING);
     Media::reg_AlbumSid = trelm_RegisterMetadataType("facebook_media_album_service_id", STRING);
     Media::reg_ThumbUri = trelm_RegisterMetadataType("facebook_media_thumb_uri", STRING);
-    PhotoTag::reg_PhotoSid =
-        trelm_RegisterMetadataType("facebook_photo_tag_photo_service_id", STRING);
-    PhotoTag::reg_ContactSid =
-        trelm_RegisterMetadataType("facebook_photo_tag_tagged_service_id", STRING);
+    PhotoTag::reg_PhotoSid = trelm_RegisterMetadataType("facebook_photo_tag_photo_service_id", STRING);
+    PhotoTag::reg_ContactSid = trelm_RegisterMetadataType("facebook_photo_tag_tagged_service_id", STRING);
     PhotoTag::reg_X = trelm_RegisterMetadataType("facebook_photo_tag_x", STRING);
     PhotoTag::reg_Y = trelm_RegisterMetadataType("facebook_photo_tag_y", STRING);
     PhotoTag::reg_Text = trelm_RegisterMetadataType("facebook_photo_tag_text", STRING);

@@ -19,9 +19,9 @@ namespace Facebook {
 void Register();
 
 namespace Media {
-extern Key reg_OwnerSid;   // "facebook_media_owner_service_id"
-extern Key reg_AlbumSid;   // "facebook_media_album_service_id"
-extern Key reg_ThumbUri;   // "facebook_media_thumb_uri"
+extern Key reg_OwnerSid;  // "facebook_media_owner_service_id"
+extern Key reg_AlbumSid;  // "facebook_media_album_service_id"
+extern Key reg_ThumbUri;  // "facebook_media_thumb_uri"
 }  // namespace Media
 
 namespace PhotoTag {

@@ -42,9 +42,7 @@ trelm::uError getComponents(trelm::ComponentTable& components) {
     return TRELM_OK();
 }
 
-trelm::Component* FacebookSource_component(trelm::String name) {
-    return new trelm::FacebookSource(std::move(name));
-}
+trelm::Component* FacebookSource_component(trelm::String name) { return new trelm::FacebookSource(std::move(name)); }
 
 trelm::Component* FacebookConnector_component(trelm::String name) {
     return new trelm::FacebookConnector(std::move(name));

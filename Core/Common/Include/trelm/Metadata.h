@@ -38,9 +38,7 @@ public:
     String const& name() const noexcept { return name_; }
     TRELM_TYPES::TYPES type() const noexcept { return type_; }
 
-    friend bool operator==(Key const& a, Key const& b) {
-        return a.type_ == b.type_ && a.name_ == b.name_;
-    }
+    friend bool operator==(Key const& a, Key const& b) { return a.type_ == b.type_ && a.name_ == b.name_; }
     friend bool operator!=(Key const& a, Key const& b) { return !(a == b); }
     friend bool operator<(Key const& a, Key const& b) {
         if (a.name_ != b.name_) return a.name_ < b.name_;
@@ -78,5 +76,4 @@ enum Kind {
 // first registration, and the returned key carries that first type. Thread-safe; may be called
 // from static initialisers of any library (the registry is built on first use).
 // libtrelm registers the host's own "core_*" keys, "media_uri" and "media_notes" when it is loaded.
-TRELM_API trelm::Metadata::Key trelm_RegisterMetadataType(char const* name,
-                                                          trelm::TRELM_TYPES::TYPES type);
+TRELM_API trelm::Metadata::Key trelm_RegisterMetadataType(char const* name, trelm::TRELM_TYPES::TYPES type);

@@ -31,14 +31,14 @@ public:
 
     void reset() noexcept { p_.reset(); }
     template <class U>
-    void reset(U* p) { p_.reset(p); }
+    void reset(U* p) {
+        p_.reset(p);
+    }
 
     long useCount() const noexcept { return p_.use_count(); }
     std::shared_ptr<T> const& shared() const noexcept { return p_; }
 
-    friend bool operator==(SmartPtr const& a, SmartPtr const& b) noexcept {
-        return a.p_ == b.p_;
-    }
+    friend bool operator==(SmartPtr const& a, SmartPtr const& b) noexcept { return a.p_ == b.p_; }
     friend bool operator==(SmartPtr const& a, std::nullptr_t) noexcept { return !a.p_; }
 
 private:

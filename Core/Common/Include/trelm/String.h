@@ -24,7 +24,7 @@ public:
     String() = default;
     String(char const* text) : s_(text ? text : "") {}  // NOLINT: implicit by design
     String(char const* text, unsigned length) : s_(text, length) {}
-    String(std::string const& text) : s_(text) {}        // NOLINT
+    String(std::string const& text) : s_(text) {}                 // NOLINT
     String(std::string&& text) noexcept : s_(std::move(text)) {}  // NOLINT
     explicit String(std::string_view text) : s_(text) {}
 
@@ -44,14 +44,39 @@ public:
     // Up to n bytes from pos; a pos past the end gives the empty string.
     String substr(unsigned pos, unsigned n = npos) const;
 
-    String& operator+=(String const& other) { s_ += other.s_; return *this; }
-    String& operator+=(char const* other) { if (other) s_ += other; return *this; }
-    String& operator+=(char c) { s_ += c; return *this; }
+    String& operator+=(String const& other) {
+        s_ += other.s_;
+        return *this;
+    }
+    String& operator+=(char const* other) {
+        if (other) s_ += other;
+        return *this;
+    }
+    String& operator+=(char c) {
+        s_ += c;
+        return *this;
+    }
 
-    friend String operator+(String const& a, String const& b) { String r(a); r += b; return r; }
-    friend String operator+(String const& a, char const* b) { String r(a); r += b; return r; }
-    friend String operator+(char const* a, String const& b) { String r(a); r += b; return r; }
-    friend String operator+(String const& a, char b) { String r(a); r += b; return r; }
+    friend String operator+(String const& a, String const& b) {
+        String r(a);
+        r += b;
+        return r;
+    }
+    friend String operator+(String const& a, char const* b) {
+        String r(a);
+        r += b;
+        return r;
+    }
+    friend String operator+(char const* a, String const& b) {
+        String r(a);
+        r += b;
+        return r;
+    }
+    friend String operator+(String const& a, char b) {
+        String r(a);
+        r += b;
+        return r;
+    }
 
     friend bool operator==(String const& a, String const& b) noexcept { return a.s_ == b.s_; }
     friend bool operator!=(String const& a, String const& b) noexcept { return a.s_ != b.s_; }
@@ -84,7 +109,5 @@ TRELM_API std::ostream& operator<<(std::ostream& os, String const& s);
 
 template <>
 struct std::hash<trelm::String> {
-    std::size_t operator()(trelm::String const& s) const noexcept {
-        return std::hash<std::string>()(s.str());
-    }
+    std::size_t operator()(trelm::String const& s) const noexcept { return std::hash<std::string>()(s.str()); }
 };

@@ -45,29 +45,53 @@ public:
     };
 
     Variant() noexcept = default;
-    Variant(bool v) : v_(v) {}                        // NOLINT: implicit by design
-    Variant(char const* v) : v_(trelm::String(v)) {}         // NOLINT
-    Variant(int v) : v_(std::int32_t(v)) {}           // NOLINT
-    Variant(long v) : v_(std::int64_t(v)) {}          // NOLINT
-    Variant(long long v) : v_(std::int64_t(v)) {}     // NOLINT
-    Variant(unsigned v) : v_(std::uint32_t(v)) {}     // NOLINT
-    Variant(GUID const& v) : v_(v) {}                 // NOLINT
-    Variant(trelm::String const& v) : v_(v) {}               // NOLINT
-    Variant(Vector<int> const& v) : v_(v) {}          // NOLINT
-    Variant(Vector<trelm::String> const& v) : v_(v) {}       // NOLINT
+    Variant(bool v) : v_(v) {}                          // NOLINT: implicit by design
+    Variant(char const* v) : v_(trelm::String(v)) {}    // NOLINT
+    Variant(int v) : v_(std::int32_t(v)) {}             // NOLINT
+    Variant(long v) : v_(std::int64_t(v)) {}            // NOLINT
+    Variant(long long v) : v_(std::int64_t(v)) {}       // NOLINT
+    Variant(unsigned v) : v_(std::uint32_t(v)) {}       // NOLINT
+    Variant(GUID const& v) : v_(v) {}                   // NOLINT
+    Variant(trelm::String const& v) : v_(v) {}          // NOLINT
+    Variant(Vector<int> const& v) : v_(v) {}            // NOLINT
+    Variant(Vector<trelm::String> const& v) : v_(v) {}  // NOLINT
     Variant(Variant const&) = default;
     Variant(Variant&&) noexcept = default;
 
     Variant& operator=(Variant const&) = default;
     Variant& operator=(Variant&&) noexcept = default;
-    Variant& operator=(bool v) { v_ = v; return *this; }
-    Variant& operator=(int v) { v_ = std::int32_t(v); return *this; }
-    Variant& operator=(long v) { v_ = std::int64_t(v); return *this; }
-    Variant& operator=(long long v) { v_ = std::int64_t(v); return *this; }
-    Variant& operator=(unsigned v) { v_ = std::uint32_t(v); return *this; }
-    Variant& operator=(char const* v) { v_ = trelm::String(v); return *this; }
-    Variant& operator=(trelm::String const& v) { v_ = v; return *this; }
-    Variant& operator=(GUID const& v) { v_ = v; return *this; }
+    Variant& operator=(bool v) {
+        v_ = v;
+        return *this;
+    }
+    Variant& operator=(int v) {
+        v_ = std::int32_t(v);
+        return *this;
+    }
+    Variant& operator=(long v) {
+        v_ = std::int64_t(v);
+        return *this;
+    }
+    Variant& operator=(long long v) {
+        v_ = std::int64_t(v);
+        return *this;
+    }
+    Variant& operator=(unsigned v) {
+        v_ = std::uint32_t(v);
+        return *this;
+    }
+    Variant& operator=(char const* v) {
+        v_ = trelm::String(v);
+        return *this;
+    }
+    Variant& operator=(trelm::String const& v) {
+        v_ = v;
+        return *this;
+    }
+    Variant& operator=(GUID const& v) {
+        v_ = v;
+        return *this;
+    }
 
     Type type() const noexcept { return static_cast<Type>(v_.index()); }
     bool empty() const noexcept { return v_.index() == Empty; }

@@ -74,7 +74,7 @@ public:
     //   "0x80000001 at Core/Libraries/trelmfacebook/loader:46"
     //   "  caused by 0x80000010 at Core/Common/Include/trelm/Map:70: message"
     // The message is appended after ": " when not empty. No trailing newline.
-    void format(String& out) const;
+    void format(String & out) const;
     // format() into a fresh std::string.
     std::string toText() const;
 
@@ -158,15 +158,14 @@ struct SourcePath {
 #define TRELM_ERROR(code) ::trelm::uError((code), "", TRELM_SOURCE_FILE, __LINE__)
 #define TRELM_ERROR_MSG(code, msg) ::trelm::uError((code), (msg), TRELM_SOURCE_FILE, __LINE__)
 #define TRELM_WRAP(code, cause) ::trelm::uError((code), (cause), "", TRELM_SOURCE_FILE, __LINE__)
-#define TRELM_WRAP_MSG(code, cause, msg) \
-    ::trelm::uError((code), (cause), (msg), TRELM_SOURCE_FILE, __LINE__)
+#define TRELM_WRAP_MSG(code, cause, msg) ::trelm::uError((code), (cause), (msg), TRELM_SOURCE_FILE, __LINE__)
 
 // Evaluates an uError expression once and returns it, unchanged (cause and location kept), from
 // the enclosing function when it failed. A success, kNoData included, falls through.
-#define TRELM_RETURN_IF_ERROR(...)                                       \
-    do {                                                                 \
-        ::trelm::uError trelmReturnIfError_ = (__VA_ARGS__);            \
-        if (trelmReturnIfError_.failed()) return trelmReturnIfError_;   \
+#define TRELM_RETURN_IF_ERROR(...)                                    \
+    do {                                                              \
+        ::trelm::uError trelmReturnIfError_ = (__VA_ARGS__);          \
+        if (trelmReturnIfError_.failed()) return trelmReturnIfError_; \
     } while (0)
 
 #include "trelm/String.h"

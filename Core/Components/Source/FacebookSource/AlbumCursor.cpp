@@ -54,9 +54,8 @@ PhotoLibraryCursor::Kind const AlbumCursor::kKind{
 };
 
 AlbumCursor::AlbumCursor(SmartPtr<FacebookLibrary> library, SmartPtr<FacebookSource::MappingCache> cache,
-                         Vector<IQueryItems::Column> const& columns,
-                         Vector<IQueryItems::Constraint> const& constraints, String const& sourceId, bool flag,
-                         std::int64_t since)
+                         Vector<IQueryItems::Column> const& columns, Vector<IQueryItems::Constraint> const& constraints,
+                         String const& sourceId, bool flag, std::int64_t since)
     : PhotoLibraryCursor(kKind, std::move(library), std::move(cache), columns, constraints, sourceId, flag, since) {}
 
 AlbumCursor::~AlbumCursor() = default;

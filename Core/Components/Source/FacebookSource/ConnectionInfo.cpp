@@ -73,8 +73,7 @@ uError FacebookLibrary::ConnectionInfo::setLoginConfig(String const& login, Stri
 }
 
 uError FacebookLibrary::ConnectionInfo::setSessionConfig(String const& sessionId, String const& sessionSecret,
-                                                         String const& userId, bool storeSession,
-                                                         bool storeLastUser) {
+                                                         String const& userId, bool storeSession, bool storeLastUser) {
     setSessionInMemory(sessionId, sessionSecret, userId);
     return ConnectionInfo::storeSession(configTag_, sessionId, sessionSecret, userId, storeSession, storeLastUser);
 }

@@ -7,8 +7,8 @@
 namespace trelm {
 
 CursorBase::CursorBase(SmartPtr<FacebookLibrary> library, SmartPtr<FacebookSource::MappingCache> cache,
-                       Vector<IQueryItems::Column> const& columns,
-                       Vector<IQueryItems::Constraint> const& constraints, String const& sourceId, bool flag)
+                       Vector<IQueryItems::Column> const& columns, Vector<IQueryItems::Constraint> const& constraints,
+                       String const& sourceId, bool flag)
     : library_(std::move(library)), cache_(std::move(cache)), sourceId_(sourceId), flag_(flag) {
     // Element by element, so that running out of memory is an error value, not an exception
     // escaping a constructor.

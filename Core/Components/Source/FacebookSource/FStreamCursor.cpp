@@ -98,8 +98,8 @@ uError FStreamCursor::checkOrdering(Vector<IQueryItems::Column> const& ordering)
     }
     for (unsigned i = 0; i < fixed.size(); ++i) {
         if (!(ordering[i] == fixed[i])) {
-            return TRELM_ERROR_MSG(kInvalid, "ordering entry " + String::from(i + 1) + " (" + ordering[i].key.name() +
-                                                 ") is not served");
+            return TRELM_ERROR_MSG(
+                kInvalid, "ordering entry " + String::from(i + 1) + " (" + ordering[i].key.name() + ") is not served");
         }
     }
     return TRELM_OK();
@@ -134,12 +134,23 @@ uError FStreamCursor::derivedStart() {
             uError err = c.value.as(v);
             if (err.failed()) return TRELM_WRAP_MSG(kInvalid, err, "core_object_time must be a number");
             switch (c.function) {
-                case IQueryItems::Constraint::LessThan: endTime_ = v - 1; break;
-                case IQueryItems::Constraint::LessOrEqual: endTime_ = v; break;
-                case IQueryItems::Constraint::Equal: startTime_ = endTime_ = v; break;
-                case IQueryItems::Constraint::GreaterOrEqual: startTime_ = v; break;
-                case IQueryItems::Constraint::GreaterThan: startTime_ = v + 1; break;
-                default: return TRELM_ERROR_MSG(kInvalid, "unsupported comparison on core_object_time");
+                case IQueryItems::Constraint::LessThan:
+                    endTime_ = v - 1;
+                    break;
+                case IQueryItems::Constraint::LessOrEqual:
+                    endTime_ = v;
+                    break;
+                case IQueryItems::Constraint::Equal:
+                    startTime_ = endTime_ = v;
+                    break;
+                case IQueryItems::Constraint::GreaterOrEqual:
+                    startTime_ = v;
+                    break;
+                case IQueryItems::Constraint::GreaterThan:
+                    startTime_ = v + 1;
+                    break;
+                default:
+                    return TRELM_ERROR_MSG(kInvalid, "unsupported comparison on core_object_time");
             }
         } else if (name == "core_object_type") {
             if (c.function == IQueryItems::Constraint::InList) {

@@ -76,8 +76,8 @@ protected:
     // is null), at most `count`. `lastTime` receives the time of the last row read, delivered
     // or left out; -1 when the service answered nothing. Success when the row at `startIndex`
     // exists, else kNoData.
-    uError refreshWindow(RecordPtr const& anchor, unsigned startIndex, unsigned count, bool forward,
-                         unsigned& fetched, int& lastTime) override;
+    uError refreshWindow(RecordPtr const& anchor, unsigned startIndex, unsigned count, bool forward, unsigned& fetched,
+                         int& lastTime) override;
     // A status or photo post to its record; kNoData for a post left out (which still sets
     // `lastTime` from its "created_time").
     uError convertItem(Map<String, String> const& row, RecordPtr& record, int& lastTime) override;

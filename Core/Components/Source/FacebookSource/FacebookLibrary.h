@@ -148,8 +148,8 @@ public:
                        unsigned int parseArg, unsigned int& count);
 
     // "facebook.stream.get": appends one row per stream post; `count` = posts in the answer.
-    uError runFStreamQuery(String const& viewerId, unsigned int startTime, unsigned int endTime,
-                           unsigned int limit, Vector<Map<String, String>>& rows, unsigned int& count);
+    uError runFStreamQuery(String const& viewerId, unsigned int startTime, unsigned int endTime, unsigned int limit,
+                           Vector<Map<String, String>>& rows, unsigned int& count);
 
     // "mailbox.getInbox": appends the inbox threads from `start`, at most `limit`.
     uError getInboxThreads(int start, int limit, Vector<ThreadObj>& threads);
@@ -165,8 +165,7 @@ public:
     // "photos.upload" of the file named by `photo` into `albumId` (empty: the application's
     // default album) with `caption` (empty: none). Once the answer has arrived, `photoId` is
     // emptied and receives the new photo's "pid".
-    uError sendPhoto(SmartPtr<InputDataStream> photo, String const& albumId, String const& caption,
-                     String& photoId);
+    uError sendPhoto(SmartPtr<InputDataStream> photo, String const& albumId, String const& caption, String& photoId);
 
     // ---- Request building and transport (used by the calls above; public for tests and tools) ----
     // The request format, the signature, the exchange and the error codes are ServiceTransport's,
@@ -191,8 +190,7 @@ public:
     // sendPost to kServiceUrl, then turns an "error_response" document into its code (see
     // resolveBaseFacebookErrorCode). When the service refuses the session, the session is dropped
     // (in memory and in the store) and the user kept. `response` holds the answer on success.
-    uError sendRequestAndCheckErrors(Map<String, String> const& args, SmartPtr<InputDataStream> data,
-                                     String& response);
+    uError sendRequestAndCheckErrors(Map<String, String> const& args, SmartPtr<InputDataStream> data, String& response);
 
     // addAuth(args, true) then sendRequestAndCheckErrors. Every way of being unable to
     // authenticate comes back as kNotSignedIn. No retry, no automatic login.

@@ -534,7 +534,8 @@ uError FacebookSource::doStartQuery(IQueryItems::StartQueryMessage& msg, bool fl
     if (err.code() != kSuccess) return err;
     CursorKind const* chosen = findKind(type);
     if (chosen == nullptr || chosen->make == nullptr) {
-        return TRELM_ERROR_MSG(kNotSupported, "queries for object type " + String::from(type) + " are not supported yet");
+        return TRELM_ERROR_MSG(kNotSupported,
+                               "queries for object type " + String::from(type) + " are not supported yet");
     }
 
     CursorArgs const args{library, cache, msg.columns, constraints, name(), msg.position};

@@ -21,8 +21,8 @@ namespace trelm {
 
 // The data source of the Facebook plug-in. It answers the host's item queries with cursors over
 // the service (contacts, albums, media and photo tags so far; the other object kinds answer
-// kNotSupported until their cursors exist), posts a status or uploads a photo when the host inserts one, and hands back the records
-// its cursors produced when the host asks for one by GUID.
+// kNotSupported until their cursors exist), posts a status or uploads a photo when the host inserts one, and hands back
+// the records its cursors produced when the host asks for one by GUID.
 //
 // Life of a source:
 //   FacebookSource src("facebook");   // nothing exists yet
@@ -73,8 +73,8 @@ public:
     // Codes: kNotSupported (another comparison on the type, another source, no or several kinds
     // left), kInvalid (a value of the wrong kind, a position that can't be used), kNoData (a kind
     // that needs `flag` true asked for with false).
-    static uError selectObjectType(Vector<IQueryItems::Constraint> const& constraints, std::int64_t position,
-                                   bool flag, String const& sourceName, int& type);
+    static uError selectObjectType(Vector<IQueryItems::Constraint> const& constraints, std::int64_t position, bool flag,
+                                   String const& sourceName, int& type);
 
 protected:
     uError sendConfigImpl(Configuration::Group const& group) override;
@@ -98,8 +98,7 @@ protected:
 
 private:
     // The session block and the login block of configurationChangedImpl.
-    uError applySessionChange(ConfigurationChangedMessage const& msg,
-                              SmartPtr<FacebookLibrary> const& library);
+    uError applySessionChange(ConfigurationChangedMessage const& msg, SmartPtr<FacebookLibrary> const& library);
     uError applyLoginChange(ConfigurationChangedMessage const& msg,
                             SmartPtr<FacebookLibrary::ConnectionInfo> const& info,
                             SmartPtr<FacebookLibrary> const& library);

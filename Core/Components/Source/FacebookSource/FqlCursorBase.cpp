@@ -12,8 +12,8 @@ namespace trelm {
 
 FacebookSource::FqlCursorBase::FqlCursorBase(SmartPtr<FacebookLibrary> library, SmartPtr<MappingCache> cache,
                                              Vector<IQueryItems::Column> const& columns,
-                                             Vector<IQueryItems::Constraint> const& constraints,
-                                             String const& sourceId, bool flag, bool paged)
+                                             Vector<IQueryItems::Constraint> const& constraints, String const& sourceId,
+                                             bool flag, bool paged)
     : CursorBase(std::move(library), std::move(cache), columns, constraints, sourceId, flag), paged_(paged) {}
 
 FacebookSource::FqlCursorBase::~FqlCursorBase() = default;
@@ -216,8 +216,8 @@ uError FacebookSource::FqlCursorBase::countRows(RecordPtr const& key, Direction 
     return library_->runFqlQuery(query, type, rows, 0, total);
 }
 
-uError FacebookSource::FqlCursorBase::refreshWindow(RecordPtr const& key, unsigned offset, unsigned count,
-                                                    bool forward, unsigned& got, int& convertError) {
+uError FacebookSource::FqlCursorBase::refreshWindow(RecordPtr const& key, unsigned offset, unsigned count, bool forward,
+                                                    unsigned& got, int& convertError) {
     convertError = -1;
     if (noMoreData_) {
         got = 0;
@@ -335,8 +335,7 @@ uError FacebookSource::FqlCursorBase::copyField(Map<String, String> const& row, 
 }
 
 uError FacebookSource::FqlCursorBase::copyField(Map<String, String> const& row, String const& field,
-                                                String const& recordKey, TRELM_TYPES::TYPES type,
-                                                RecordPtr& record) {
+                                                String const& recordKey, TRELM_TYPES::TYPES type, RecordPtr& record) {
     String const* text = row.search(field);
     if (text == nullptr) return TRELM_OK();
     Variant value;

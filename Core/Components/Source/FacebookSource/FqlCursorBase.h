@@ -140,14 +140,14 @@ private:
     bool const paged_;
 
     unsigned windowSize_ = kDefaultWindowSize;
-    unsigned position_ = 0;       // index of the current record inside window_
+    unsigned position_ = 0;  // index of the current record inside window_
     Vector<RecordPtr> window_{16};
-    bool noMoreData_ = false;     // the result is known to be empty without asking
-    bool backwardWindow_ = false; // the window ends at a key, not at the end of the result
+    bool noMoreData_ = false;      // the result is known to be empty without asking
+    bool backwardWindow_ = false;  // the window ends at a key, not at the end of the result
     bool rowCountKnown_ = false;
-    unsigned rowCount_ = 0;       // valid when rowCountKnown_
-    bool atBeginning_ = true;     // the window starts at the first row of the result
-    bool windowLoaded_ = false;   // a refill has succeeded
+    unsigned rowCount_ = 0;      // valid when rowCountKnown_
+    bool atBeginning_ = true;    // the window starts at the first row of the result
+    bool windowLoaded_ = false;  // a refill has succeeded
 };
 
 }  // namespace trelm

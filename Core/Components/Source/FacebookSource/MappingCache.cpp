@@ -4,7 +4,6 @@
 
 namespace trelm {
 
-
 FacebookSource::MappingCache::MappingCache() = default;
 
 FacebookSource::MappingCache::~MappingCache() = default;
@@ -17,7 +16,7 @@ uError FacebookSource::MappingCache::setup() {
 
 // Each operation below locks with a MutexLock; a failure to lock is reported, never ignored,
 // because running unlocked would break the invariants for every other user of the cache.
-#define TRELM_CACHE_LOCK(guard)                                                   \
+#define TRELM_CACHE_LOCK(guard)                                                      \
     if (!mutex_.made()) return TRELM_ERROR_MSG(kNotSet, "mapping cache not set up"); \
     MutexLock guard(mutex_);                                                         \
     if (!guard.locked()) return TRELM_ERROR(kResource)

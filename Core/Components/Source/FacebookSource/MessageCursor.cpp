@@ -189,8 +189,8 @@ uError MessageCursor::getContactNames(Set<String> const& uids, Map<String, Strin
     if (list.empty()) return TRELM_OK();
     Vector<Map<String, String>> rows;
     unsigned count = 0;
-    TRELM_RETURN_IF_ERROR(library_->runFqlQuery("select uid,name from user where uid in (" + list + ")", "user", rows,
-                                                0, count));
+    TRELM_RETURN_IF_ERROR(
+        library_->runFqlQuery("select uid,name from user where uid in (" + list + ")", "user", rows, 0, count));
     static String const uidField("uid");
     static String const nameField("name");
     bool allKept = true;

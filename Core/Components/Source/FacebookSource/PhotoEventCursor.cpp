@@ -71,9 +71,10 @@ uError PhotoEventCursor::generateBaseQuery(String const& fields, RecordPtr const
                                            bool ordered, String& query) {
     String userId;
     TRELM_RETURN_IF_ERROR(library_->getUserId(userId));
-    String text = "select " + fields +
-                  " from photo where aid in (select aid from album where owner in (select uid2 from friend where uid1='" +
-                  userId + "'))";
+    String text =
+        "select " + fields +
+        " from photo where aid in (select aid from album where owner in (select uid2 from friend where uid1='" +
+        userId + "'))";
     if (!timeCondition_.empty()) text += " and (" + timeCondition_ + ")";
     if (key) {
         static String const timeKey(kTimeKey);

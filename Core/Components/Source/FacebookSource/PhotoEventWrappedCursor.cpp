@@ -59,9 +59,8 @@ uError PhotoEventWrappedCursor::populateCache() {
         if (!(*time == runTime)) break;  // stays current in the inner cursor for the next run
     }
     std::vector<RecordPtr>& rows = run_.vec();
-    std::stable_sort(rows.begin(), rows.end(), [this](RecordPtr const& a, RecordPtr const& b) {
-        return QueryUtils::isLess(*a, *b, columns_);
-    });
+    std::stable_sort(rows.begin(), rows.end(),
+                     [this](RecordPtr const& a, RecordPtr const& b) { return QueryUtils::isLess(*a, *b, columns_); });
     return TRELM_OK();
 }
 

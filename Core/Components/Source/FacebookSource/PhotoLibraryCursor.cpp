@@ -41,13 +41,20 @@ bool isLiteralSafe(String const& text) {
 
 char const* comparison(IQueryItems::Constraint::Function function) {
     switch (function) {
-        case IQueryItems::Constraint::LessThan: return " < ";
-        case IQueryItems::Constraint::LessOrEqual: return " <= ";
-        case IQueryItems::Constraint::Equal: return " = ";
-        case IQueryItems::Constraint::GreaterOrEqual: return " >= ";
-        case IQueryItems::Constraint::GreaterThan: return " > ";
-        case IQueryItems::Constraint::NotEqual: return " != ";
-        default: return nullptr;
+        case IQueryItems::Constraint::LessThan:
+            return " < ";
+        case IQueryItems::Constraint::LessOrEqual:
+            return " <= ";
+        case IQueryItems::Constraint::Equal:
+            return " = ";
+        case IQueryItems::Constraint::GreaterOrEqual:
+            return " >= ";
+        case IQueryItems::Constraint::GreaterThan:
+            return " > ";
+        case IQueryItems::Constraint::NotEqual:
+            return " != ";
+        default:
+            return nullptr;
     }
 }
 

@@ -63,18 +63,18 @@ public:
     };
 
     struct Kind {
-        int objectType;                            // "core_object_type" of the records
-        char const* table;                         // the FQL table
-        char const* fields;                        // its field list
-        std::span<FieldMapping const> fieldMap;    // answer fields to record keys
-        char const* sidKey;                        // the cache key the identity is kept under
-        std::span<char const* const> sidParts;     // record keys whose values, joined by blanks, are the identity
-        std::span<Ordering const> orderings;       // [0] is the default
-        bool defaultAscending;                     // sense of the default ordering
+        int objectType;                          // "core_object_type" of the records
+        char const* table;                       // the FQL table
+        char const* fields;                      // its field list
+        std::span<FieldMapping const> fieldMap;  // answer fields to record keys
+        char const* sidKey;                      // the cache key the identity is kept under
+        std::span<char const* const> sidParts;   // record keys whose values, joined by blanks, are the identity
+        std::span<Ordering const> orderings;     // [0] is the default
+        bool defaultAscending;                   // sense of the default ordering
         std::span<IdCondition const> idConditions;
-        char const* userColumn;                    // default condition: "<userColumn> = <signed-in user>"
-        char const* timeColumn;                    // the column "core_object_time" stands for
-        char const* sinceColumn;                   // the column the since mode compares
+        char const* userColumn;   // default condition: "<userColumn> = <signed-in user>"
+        char const* timeColumn;   // the column "core_object_time" stands for
+        char const* sinceColumn;  // the column the since mode compares
     };
 
     static constexpr std::int64_t kNoSince = -1;

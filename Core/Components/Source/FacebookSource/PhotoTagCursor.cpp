@@ -49,8 +49,8 @@ PhotoLibraryCursor::Kind const PhotoTagCursor::kKind{
 
 PhotoTagCursor::PhotoTagCursor(SmartPtr<FacebookLibrary> library, SmartPtr<FacebookSource::MappingCache> cache,
                                Vector<IQueryItems::Column> const& columns,
-                               Vector<IQueryItems::Constraint> const& constraints, String const& sourceId,
-                               bool flag, std::int64_t since)
+                               Vector<IQueryItems::Constraint> const& constraints, String const& sourceId, bool flag,
+                               std::int64_t since)
     : PhotoLibraryCursor(kKind, std::move(library), std::move(cache), columns, constraints, sourceId, flag, since) {}
 
 PhotoTagCursor::~PhotoTagCursor() = default;
