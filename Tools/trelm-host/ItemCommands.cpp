@@ -2,16 +2,12 @@
 
 #include <iostream>
 
-#include <cstdio>
-
-#include <chrono>
-
-#include <unistd.h>
-
+#include <algorithm>
 #include <cstddef>
 #include <string>
 
 #include "ItemQuery.h"
+#include "ProgressLine.h"
 #include "trelm/GUID.h"
 
 namespace trelm {
@@ -102,40 +98,6 @@ uError ItemCommands::run(SourceClient& client, Printer& printer) {
     return e;
 }
 
-namespace {
-
-// A one-line progress report that rewrites itself: rows so far and the rate.
-class Progress {
-public:
-    Progress(bool enabled, std::ostream& out)
-        : enabled_(enabled), out_(out), start_(std::chrono::steady_clock::now()) {}
-    void show(std::size_t rows) {
-        if (!enabled_) return;
-        auto const now = std::chrono::steady_clock::now();
-        if (now - last_ < std::chrono::milliseconds(200)) return;  // a few updates a second at most
-        double const seconds = std::chrono::duration<double>(now - start_).count();
-        char line[96];
-        std::snprintf(line, sizeof line, "\r%zu rows, %.0f rows/s ", rows, seconds > 0 ? rows / seconds : 0.0);
-        out_ << line << std::flush;
-        shown_ = true;
-        last_ = now;
-    }
-    void clear() {
-        if (!shown_) return;
-        out_ << "\r\033[K" << std::flush;
-        shown_ = false;
-    }
-
-private:
-    bool const enabled_;
-    std::ostream& out_;
-    std::chrono::steady_clock::time_point const start_;
-    std::chrono::steady_clock::time_point last_;
-    bool shown_ = false;
-};
-
-}  // namespace
-
 uError ItemCommands::runQuery(SourceClient& client, Printer& printer) {
     ItemQuery::Kind const* kind = ItemQuery::findKind(type_);
     if (kind == nullptr) return TRELM_ERROR_MSG(kInvalid, "unknown item type " + type_);
@@ -150,14 +112,26 @@ uError ItemCommands::runQuery(SourceClient& client, Printer& printer) {
 
     // Records are printed as they arrive; on a terminal a progress line on standard error says
     // how far the listing is (never in JSON output, never when standard error is not a terminal).
-    Progress progress(printer.format() == Printer::Format::Table && isatty(STDERR_FILENO) == 1, std::cerr);
+    // The total, when the kind can count, is asked for before the walk only for that line.
+    ProgressLine progress(printer.format() == Printer::Format::Table && ProgressLine::stderrIsTerminal(), std::cerr);
+    SourceClient::Counted counted;
+    if (progress.enabled()) {
+        counted = [&](unsigned total) {
+            std::size_t rows = total > skip_ ? total - skip_ : 0;
+            if (!all_) rows = std::min<std::size_t>(rows, limit_);
+            progress.setTotal(rows);
+        };
+    }
     SourceClient::Listing listing;
-    uError e = client.query(query, listing, [&](std::size_t index, SourceClient::Record const& row) {
-        progress.clear();
-        printer.record(static_cast<unsigned>(index), row);
-        printer.flush();
-        progress.show(index);
-    });
+    uError e = client.query(
+        query, listing,
+        [&](std::size_t index, SourceClient::Record const& row) {
+            progress.clear();
+            printer.record(static_cast<unsigned>(index), row);
+            printer.flush();
+            progress.show(index);
+        },
+        counted);
     progress.clear();
     if (e.failed()) {
         return TRELM_WRAP_MSG(kFailure, e, client.sourceName() + " cannot list " + type_);

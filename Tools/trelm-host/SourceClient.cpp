@@ -117,7 +117,8 @@ uError SourceClient::retrying(Operation operation) {
     return operation();
 }
 
-uError SourceClient::query(ItemQuery const& query, Listing& listing, ItemQuery::RowSink const& arrived) {
+uError SourceClient::query(ItemQuery const& query, Listing& listing, ItemQuery::RowSink const& arrived,
+                          Counted const& counted) {
     bool const completedLater = query.kind().type == Metadata::Object::TYPE_FRIEND_REQUEST;
     // A query made again after a new sign-in reads the same rows again: those already told are
     // not told twice.
@@ -147,6 +148,12 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing, ItemQuery::
             return TRELM_ERROR_MSG(kFailure, name_ + " answered the query without a cursor");
         }
         cursor = msg.cursor;
+        if (counted && query.kind().countable) {
+            // The cursor keeps its count, so the one after the walk asks the service nothing.
+            unsigned total = 0;
+            TRELM_RETURN_IF_ERROR(paced("counting the rows", [&] { return cursor->numRows(total); }));
+            counted(total);
+        }
         uError step = query.walk(
             *cursor, result.rows,
             [this](char const* what, std::function<uError()> const& op) { return paced(what, op); }, tell);

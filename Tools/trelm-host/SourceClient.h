@@ -67,7 +67,10 @@ public:
     // `arrived` (optional) is told of each row as it is read, once per row even when the query is
     // made again after a new sign-in; kinds whose rows the host completes afterwards (friend
     // requests get their names) are told at the end instead.
-    uError query(ItemQuery const& query, Listing& listing, ItemQuery::RowSink const& arrived = {});
+    // Told the source's count of the query's rows before the walk starts (kinds that can count).
+    using Counted = std::function<void(unsigned total)>;
+    uError query(ItemQuery const& query, Listing& listing, ItemQuery::RowSink const& arrived = {},
+                 Counted const& counted = {});
     // BaseSource::insert; `record` receives what the source writes back ("core_service_id").
     uError insert(Record& record);
     // Inserts a status post (object type 4, "core_event_text" = `text`).

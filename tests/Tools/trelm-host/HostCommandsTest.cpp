@@ -401,3 +401,21 @@ TEST_F(HostCommandsTest, DamagedStateDatabaseIsNamedWithHowToStartAfresh) {
 }
 
 }  // namespace
+
+TEST_F(HostCommandsTest, ListingOnATerminalShowsProgressWithTheTotal) {
+    // `script` gives the host a terminal on every stream, as a user's shell does.
+    std::string command = "exec '" + std::string(TRELM_HOST_PROGRAM) + "'";
+    for (std::string const& arg :
+         {std::string("--state-dir"), stateDir(), std::string("--no-emulator"), std::string("--connect-to"),
+          "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()), std::string("--connect-to"),
+          "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()), std::string("--ca-file"),
+          emulator_->caFile(), std::string("--config"), config_, std::string("--plugin"),
+          std::string(TRELMFACEBOOK_MODULE), std::string("query"), std::string("contacts"), std::string("--all")}) {
+        command += " '" + arg + "'";
+    }
+    auto result = runner_.run("/usr/bin/script", {"-qec", command, "/dev/null"});
+    ASSERT_EQ(result.exitCode, 0) << result.out;
+    std::size_t const friends = fql("select uid2 from friend where uid1=" + std::string(kDemoUser)).size();
+    ASSERT_GT(friends, 0u);
+    EXPECT_NE(result.out.find(" of " + std::to_string(friends) + " rows, "), std::string::npos) << result.out;
+}
