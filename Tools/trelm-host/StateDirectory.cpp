@@ -30,7 +30,8 @@ uError StateDirectory::prepare(std::string const& requested, std::string& path) 
     std::error_code ec;
     if (fs::exists(folder, ec)) {
         if (!fs::is_directory(folder, ec)) {
-            return TRELM_ERROR_MSG(kFailure, "state folder " + folder.string() + " is not a folder");
+            return TRELM_ERROR_MSG(kFailure, "state folder " + folder.string() +
+                                                 " is not a folder; choose another with --state-dir");
         }
     } else {
         if (folder.has_parent_path()) fs::create_directories(folder.parent_path(), ec);
@@ -40,9 +41,22 @@ uError StateDirectory::prepare(std::string const& requested, std::string& path) 
         if (!ec) fs::permissions(folder, fs::perms::owner_all, fs::perm_options::replace, ec);
         if (ec) {
             return TRELM_ERROR_MSG(kFailure,
-                                   "cannot create state folder " + folder.string() + ": " + ec.message());
+                                   "cannot create state folder " + folder.string() + ": " + ec.message() +
+                                       "; choose another with --state-dir");
         }
     }
+    // A folder that cannot take a new file would fail later, on the first store, with a less
+    // telling message (and root passes every permission test but an immutable flag or a
+    // read-only mount): a file is made and removed to know.
+    std::string probe = (folder / ".write-test-XXXXXX").string();
+    int const fd = ::mkstemp(probe.data());
+    if (fd < 0) {
+        std::string const why = std::error_code(errno, std::generic_category()).message();
+        return TRELM_ERROR_MSG(kFailure, "state folder " + folder.string() + " cannot be written (" + why +
+                                             "); make it writable or choose another with --state-dir");
+    }
+    ::close(fd);
+    ::unlink(probe.c_str());
     path = folder.string();
     return TRELM_OK();
 }

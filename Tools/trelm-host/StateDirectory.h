@@ -16,7 +16,8 @@ public:
     // Resolves `requested` (empty: "$HOME/.trelm-host", or the account's home folder when HOME is
     // unset) into `path` and creates the folder, with its missing parents, when it does not exist;
     // a folder made here gets mode 0700 whatever the umask. An existing folder is used as it is.
-    // kFailure, with the path and the reason, when it cannot be made or is not a folder.
+    // kFailure, with the path, the reason and a remedy, when it cannot be made, is not a folder or
+    // cannot be written.
     static uError prepare(std::string const& requested, std::string& path);
 
     // The runtime-configuration store inside the folder.

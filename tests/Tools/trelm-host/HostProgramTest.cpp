@@ -1,6 +1,9 @@
 // trelm-host run as a user runs it: the built program, the built plug-in, a configuration file
 // and a state folder in a scratch folder.
 #include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
 
 #include <ostream>
 #include <string>
@@ -168,3 +171,29 @@ TEST_F(HostProgramTest, MalformedConfigurationNamesThePlaceAndStopsTheHost) {
 }
 
 }  // namespace
+
+// A state folder the host cannot use is named, with why and what to do, before any work starts.
+TEST_F(HostProgramTest, UnusableStateFolderIsNamedWithTheReasonAndARemedy) {
+    std::string const file = runner_.writeFile("plain-file", "x");
+    std::string const locked = runner_.folder() + "/locked";
+    ASSERT_EQ(::mkdir(locked.c_str(), 0700), 0);
+    // Root passes every permission test: only the immutable flag keeps it out, where the file
+    // system has one.
+    bool const immutable = std::system(("chattr +i '" + locked + "' 2>/dev/null").c_str()) == 0;
+    bool const lockable = immutable || (::geteuid() != 0 && ::chmod(locked.c_str(), 0500) == 0);
+    struct Case {
+        std::string folder, words;
+    };
+    std::vector<Case> cases{{file, " is not a folder; choose another with --state-dir"},
+                            {file + "/state", "cannot create state folder " + file + "/state: Not a directory"}};
+    if (lockable) cases.push_back({locked, "state folder " + locked + " cannot be written ("});
+    for (Case const& c : cases) {
+        auto result = runner_.run(TRELM_HOST_PROGRAM, {"--state-dir", c.folder, "--plugin", TRELMFACEBOOK_MODULE});
+        EXPECT_EQ(result.exitCode, 1) << c.folder;
+        EXPECT_NE(result.err.find(c.words), std::string::npos) << result.err;
+        EXPECT_NE(result.err.find("--state-dir"), std::string::npos) << result.err;
+    }
+    if (immutable) {
+        EXPECT_EQ(std::system(("chattr -i '" + locked + "'").c_str()), 0);
+    }
+}
