@@ -128,53 +128,46 @@ uError MessageCursor::addMessages(bool hasTime, int time, bool inclusive) {
 }
 
 uError MessageCursor::addMessageToList(FacebookLibrary::MessageObj const& message) {
-    // Every record starts as a copy of the fixed keys; copying the map copies its tree whole.
-    RecordPtr record;
+    MessageRow row;
     try {
-        record = makeSmart<Record>(prototype_);
+        row.author = message.author;
+        row.serviceId = message.threadId + "-" + message.messageId;
+        row.body = message.body;
+        row.subject = message.context;
     } catch (std::bad_alloc const&) {
         return TRELM_ERROR(kOutOfMemory);
     }
-    String const serviceId = message.threadId + "-" + message.messageId;
-    TRELM_RETURN_IF_ERROR(record->insert(kContactIdKey, Variant(message.author)));
-    TRELM_RETURN_IF_ERROR(record->insert(kServiceIdKey, Variant(serviceId)));
-    TRELM_RETURN_IF_ERROR(record->insert("core_event_text", Variant(message.body)));
-    TRELM_RETURN_IF_ERROR(record->insert(kTimeKey, Variant(message.timeSent)));
-    TRELM_RETURN_IF_ERROR(record->insert("core_event_subject", Variant(message.context)));
-
     static Metadata::Key const sidKey(kServiceIdKey, TRELM_TYPES::STRING);
-    GUID guid;
-    FacebookSource::MappingCache::SidMapKey const sid(sidKey, serviceId);
-    TRELM_RETURN_IF_ERROR(cache_->getGuid(tag_, sid, true, guid));
-    TRELM_RETURN_IF_ERROR(record->insert("core_object_id", Variant(guid)));
-    return messages_.insert(MessageOrder{message.timeSent, message.messageId}, std::move(record));
+    FacebookSource::MappingCache::SidMapKey const sid(sidKey, row.serviceId);
+    TRELM_RETURN_IF_ERROR(cache_->getGuid(tag_, sid, true, row.guid));
+    return messages_.insert(MessageOrder{message.timeSent, message.messageId}, std::move(row));
 }
 
 uError MessageCursor::addUserNames() {
-    static String const contactIdKey(kContactIdKey);
-    static String const contactNameKey(kContactNameKey);
     Set<String> uids;
-    for (auto const& [order, record] : messages_) {
-        Variant const* author = record->search(contactIdKey);
-        if (author == nullptr) continue;
-        String uid;
-        uError err = author->as(uid);
-        if (err.failed()) return TRELM_WRAP_MSG(kFailure, err, "a message author is not text");
-        TRELM_RETURN_IF_ERROR(uids.insert(uid));
+    for (auto const& [order, row] : messages_) TRELM_RETURN_IF_ERROR(uids.insert(row.author));
+    uError err = getContactNames(uids, names_);
+    // kNoData: some names could not be kept; the others are still used.
+    return err.failed() ? err : TRELM_OK();
+}
+
+uError MessageCursor::makeRecord(MessageOrder const& order, MessageRow const& row, RecordPtr& record) const {
+    RecordPtr made;
+    try {
+        made = makeSmart<Record>(prototype_);
+    } catch (std::bad_alloc const&) {
+        return TRELM_ERROR(kOutOfMemory);
     }
-    Map<String, String> names;
-    uError err = getContactNames(uids, names);
-    // kNoData: some names could not be kept; the others are still set.
-    if (err.failed()) return err;
-    for (auto const& [order, record] : messages_) {
-        Variant const* author = record->search(contactIdKey);
-        String uid;
-        if (author == nullptr || author->as(uid).failed()) continue;
-        String const* name = names.search(uid);
-        if (name == nullptr) continue;
-        err = record->insert(contactNameKey, Variant(*name));
-        if (err.failed()) return TRELM_WRAP(kFailure, err);
+    TRELM_RETURN_IF_ERROR(made->insert(kContactIdKey, Variant(row.author)));
+    TRELM_RETURN_IF_ERROR(made->insert(kServiceIdKey, Variant(row.serviceId)));
+    TRELM_RETURN_IF_ERROR(made->insert("core_event_text", Variant(row.body)));
+    TRELM_RETURN_IF_ERROR(made->insert(kTimeKey, Variant(order.time)));
+    TRELM_RETURN_IF_ERROR(made->insert("core_event_subject", Variant(row.subject)));
+    TRELM_RETURN_IF_ERROR(made->insert("core_object_id", Variant(row.guid)));
+    if (String const* name = names_.search(row.author)) {
+        TRELM_RETURN_IF_ERROR(made->insert(kContactNameKey, Variant(*name)));
     }
+    record = std::move(made);
     return TRELM_OK();
 }
 
@@ -221,13 +214,8 @@ uError MessageCursor::getRow(RecordPtr& row) {
         row.reset();
         return TRELM_ERROR(kNoData);
     }
-    // The host gets its own copy, so what it changes never reaches the cursor's records.
-    try {
-        row = makeSmart<Record>(*it->second);
-    } catch (std::bad_alloc const&) {
-        return TRELM_ERROR(kOutOfMemory);
-    }
-    return TRELM_OK();
+    // The host gets a record of its own, so what it changes never reaches the cursor.
+    return makeRecord(it->first, it->second, row);
 }
 
 uError MessageCursor::getRows(unsigned count, Vector<RecordPtr>& rows) {
@@ -235,13 +223,9 @@ uError MessageCursor::getRows(unsigned count, Vector<RecordPtr>& rows) {
     auto it = current();
     if (it == messages_.end()) return TRELM_ERROR(kNoData);
     for (unsigned n = 0; n < count && it != messages_.end(); ++n, ++it) {
-        RecordPtr copy;
-        try {
-            copy = makeSmart<Record>(*it->second);
-        } catch (std::bad_alloc const&) {
-            return TRELM_ERROR(kOutOfMemory);
-        }
-        TRELM_RETURN_IF_ERROR(rows.pushBack(std::move(copy)));
+        RecordPtr record;
+        TRELM_RETURN_IF_ERROR(makeRecord(it->first, it->second, record));
+        TRELM_RETURN_IF_ERROR(rows.pushBack(std::move(record)));
     }
     return TRELM_OK();
 }

@@ -2,6 +2,7 @@
 
 #include "CursorBase.h"
 #include "FacebookLibrary.h"
+#include "trelm/GUID.h"
 #include "trelm/Map.h"
 #include "trelm/Set.h"
 #include "trelm/String.h"
@@ -16,6 +17,9 @@ namespace trelm {
 // thread's messages 50 at a time ("mailbox.getThreadMessages"), both newest first. Every message
 // becomes one record, the authors' names are added with one "user" statement, and all records
 // stay in memory, newest first, until the cursor goes away. No row operation calls the service.
+// A record is kept as a compact row (the message's own values and its GUID) and is made whole
+// when a row is asked for: the keys every record shares are held once, so a large mailbox costs
+// about twice its text and not six times.
 //
 // The query's columns must start with the ordering the cursor serves: "core_object_time" (32-bit
 // integer), "core_event_service", "core_event_serviceid" (strings), all descending (flag false);
@@ -91,15 +95,26 @@ protected:
     uError derivedStart() override;
 
 private:
-    using MessageMap = Map<MessageOrder, RecordPtr>;
+    // What a record holds beyond the keys every message record shares; its time and message id
+    // are the map key.
+    struct MessageRow {
+        String author;
+        String serviceId;
+        String body;
+        String subject;
+        GUID guid;
+    };
+    using MessageMap = Map<MessageOrder, MessageRow>;
 
     // Reads threads and their messages, newest first; with `hasTime` only what was sent at or
     // after `time` (after it when not `inclusive`).
     uError addMessages(bool hasTime, int time, bool inclusive);
-    // One message to one record in messages_ (replacing a record under the same key).
+    // One message to one row in messages_ (replacing a row under the same key).
     uError addMessageToList(FacebookLibrary::MessageObj const& message);
-    // Sets "core_event_contactname" on every record whose author the service could name.
+    // Looks up the names of every row's author into names_ ("core_event_contactname").
     uError addUserNames();
+    // The whole record of a row: prototype_, the row's values and its author's name if known.
+    uError makeRecord(MessageOrder const& order, MessageRow const& row, RecordPtr& record) const;
     // Names of `uids` with one statement; kNoData when a name could not be kept.
     uError getContactNames(Set<String> const& uids, Map<String, String>& names);
     // Makes prototype_ (the keys every message record carries with the same value).
@@ -111,6 +126,7 @@ private:
     // Filled by derivedStart, read-only afterwards.
     MessageMap messages_;
     Record prototype_;
+    Map<String, String> names_;  // author uid -> name, for the authors the service could name
 
     MessageOrder currentOrder_;
 };
