@@ -197,15 +197,8 @@ uError ContactCursor::convertItem(Map<String, String> const& row, RecordPtr& rec
 }
 
 uError ContactCursor::getSid(RecordPtr const& record, Metadata::Key& key, String& serviceId) {
-    static String const serviceIdKey(kServiceIdKey);
-    Variant const* value = record->search(serviceIdKey);
-    if (value == nullptr) return TRELM_ERROR_MSG(kInvalid, "contact record without a service id");
-    String id;
-    TRELM_RETURN_IF_ERROR(value->as(id));
     static Metadata::Key const sidKey(kServiceIdKey, TRELM_TYPES::STRING);
-    key = sidKey;
-    serviceId = std::move(id);
-    return TRELM_OK();
+    return stringSid(record, sidKey, "contact record without a service id", key, serviceId);
 }
 
 }  // namespace trelm

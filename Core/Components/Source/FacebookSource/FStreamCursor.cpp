@@ -290,15 +290,8 @@ uError FStreamCursor::copyEventField(Map<String, String> const& row, String cons
 }
 
 uError FStreamCursor::getSid(RecordPtr const& record, Metadata::Key& key, String& sid) {
-    static String const serviceIdKey(kServiceIdKey);
-    Variant const* value = record->search(serviceIdKey);
-    if (value == nullptr) return TRELM_ERROR_MSG(kInvalid, "event record without a service id");
-    String id;
-    TRELM_RETURN_IF_ERROR(value->as(id));
     static Metadata::Key const sidKey(kServiceIdKey, TRELM_TYPES::STRING);
-    key = sidKey;
-    sid = std::move(id);
-    return TRELM_OK();
+    return stringSid(record, sidKey, "event record without a service id", key, sid);
 }
 
 uError FStreamCursor::postConvert(Vector<RecordPtr>& records) {

@@ -326,6 +326,17 @@ void FacebookSource::FqlCursorBase::setEmptyResult() {
     windowLoaded_ = true;
 }
 
+uError FacebookSource::FqlCursorBase::stringSid(RecordPtr const& record, Metadata::Key const& sidKey,
+                                                char const* missing, Metadata::Key& key, String& serviceId) {
+    Variant const* value = record->search(sidKey.name());
+    if (value == nullptr) return TRELM_ERROR_MSG(kInvalid, missing);
+    String id;
+    TRELM_RETURN_IF_ERROR(value->as(id));
+    key = sidKey;
+    serviceId = std::move(id);
+    return TRELM_OK();
+}
+
 uError FacebookSource::FqlCursorBase::copyField(Map<String, String> const& row, String const& field,
                                                 String const& recordKey, RecordPtr& record) {
     TRELM_TYPES::TYPES type = TRELM_TYPES::STRING;

@@ -109,6 +109,12 @@ protected:
     static uError copyField(Map<String, String> const& row, String const& field, String const& recordKey,
                             TRELM_TYPES::TYPES type, RecordPtr& record);
 
+    // getSid for a cursor whose records carry their service id as a string under `sidKey`:
+    // `key` becomes `sidKey` and `serviceId` the record's value. kInvalid with `missing` as the
+    // message when the record lacks it; the conversion's error when it is not a string.
+    static uError stringSid(RecordPtr const& record, Metadata::Key const& sidKey, char const* missing,
+                            Metadata::Key& key, String& serviceId);
+
     // The window state, for a cursor that fills its window without a statement (the stream
     // cursor pages by time) and so runs its own refreshWindow, seek and jumpBeginning.
     Vector<RecordPtr> const& window() const noexcept { return window_; }

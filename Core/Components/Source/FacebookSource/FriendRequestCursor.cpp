@@ -108,15 +108,8 @@ uError FriendRequestCursor::convertItem(Map<String, String> const& row, RecordPt
 }
 
 uError FriendRequestCursor::getSid(RecordPtr const& record, Metadata::Key& key, String& serviceId) {
-    static String const serviceIdKey(kServiceIdKey);
-    Variant const* value = record->search(serviceIdKey);
-    if (value == nullptr) return TRELM_ERROR_MSG(kInvalid, "friend request record without a service id");
-    String id;
-    TRELM_RETURN_IF_ERROR(value->as(id));
     static Metadata::Key const sidKey(kServiceIdKey, TRELM_TYPES::STRING);
-    key = sidKey;
-    serviceId = std::move(id);
-    return TRELM_OK();
+    return stringSid(record, sidKey, "friend request record without a service id", key, serviceId);
 }
 
 uError FriendRequestCursor::postConvert(Vector<RecordPtr>& window) {

@@ -131,15 +131,8 @@ uError PhotoEventCursor::convertItem(Map<String, String> const& row, RecordPtr& 
 }
 
 uError PhotoEventCursor::getSid(RecordPtr const& record, Metadata::Key& key, String& serviceId) {
-    static String const serviceIdKey(kServiceIdKey);
-    Variant const* value = record->search(serviceIdKey);
-    if (value == nullptr) return TRELM_ERROR_MSG(kInvalid, "photo event record without a photo id");
-    String id;
-    TRELM_RETURN_IF_ERROR(value->as(id));
     static Metadata::Key const sidKey(kServiceIdKey, TRELM_TYPES::STRING);
-    key = sidKey;
-    serviceId = std::move(id);
-    return TRELM_OK();
+    return stringSid(record, sidKey, "photo event record without a photo id", key, serviceId);
 }
 
 uError PhotoEventCursor::postConvert(Vector<RecordPtr>& window) {
