@@ -3,6 +3,7 @@
 #include "ConfigSchema.h"
 
 #include <cstdint>
+#include <filesystem>
 #include <fstream>
 #include <limits>
 #include <set>
@@ -123,12 +124,27 @@ uError toComponent(json const& entry, std::string const& origin, std::string con
 }  // namespace
 
 uError HostConfig::load(std::string const& path, HostConfig& out) {
+    // A configuration is a small file; a folder, a device or a huge file is a wrong path, and
+    // reading /dev/zero would never end.
+    std::error_code ec;
+    std::filesystem::file_status const status = std::filesystem::status(path, ec);
+    if (std::filesystem::is_directory(status)) {
+        return TRELM_ERROR_MSG(kInvalid, "configuration file " + path + " is a folder; give the path of a JSON file");
+    }
+    if (std::filesystem::exists(status) && !std::filesystem::is_regular_file(status)) {
+        return TRELM_ERROR_MSG(kInvalid, "configuration file " + path + " is not a regular file");
+    }
     std::ifstream in(path, std::ios::binary);
     if (!in) return TRELM_ERROR_MSG(kNotFound, "cannot read configuration file " + path);
-    std::ostringstream text;
-    text << in.rdbuf();
+    std::string text(kMaxFileBytes + 1, '\0');
+    in.read(text.data(), static_cast<std::streamsize>(text.size()));
     if (in.bad()) return TRELM_ERROR_MSG(kNotFound, "cannot read configuration file " + path);
-    return parse(text.str(), path, out);
+    if (static_cast<std::size_t>(in.gcount()) > kMaxFileBytes) {
+        return TRELM_ERROR_MSG(kInvalid, "configuration file " + path + " is larger than " +
+                                             std::to_string(kMaxFileBytes / (1024 * 1024)) + " MiB");
+    }
+    text.resize(static_cast<std::size_t>(in.gcount()));
+    return parse(text, path, out);
 }
 
 uError HostConfig::parse(std::string const& text, std::string const& origin, HostConfig& out) {

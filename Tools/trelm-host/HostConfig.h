@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstddef>
+
 #include <string>
 #include <vector>
 
@@ -39,7 +41,11 @@ public:
         Vector<String> runtimeKeys;
     };
 
-    // Reads and parses the file. kNotFound when it cannot be read; otherwise as parse().
+    // The largest configuration file read.
+    static constexpr std::size_t kMaxFileBytes = 1024 * 1024;
+
+    // Reads and parses the file. kNotFound when it cannot be read; kInvalid when it is a folder,
+    // not a regular file or larger than kMaxFileBytes; otherwise as parse().
     static uError load(std::string const& path, HostConfig& out);
     // Parses `text`; `origin` names it in error messages. kInvalid, with the place and the reason
     // in the message, for malformed JSON, an unknown section, a component without a name or id,

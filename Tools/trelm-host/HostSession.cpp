@@ -4,6 +4,10 @@
 
 #include "StateDirectory.h"
 
+#include <filesystem>
+#include <fstream>
+#include <string>
+
 namespace trelm {
 namespace host {
 
@@ -65,6 +69,32 @@ uError HostSession::prepareEndpoint(Printer& printer, Map<String, Variant>& http
     String caFile;
     if (Variant const* value = http.search("ca_file")) (void)value->as(caFile);
     printer.endpoint(useEmulator, routes, caFile);
+    if (!caFile.empty()) TRELM_RETURN_IF_ERROR(checkCaFile(caFile.str()));
+    return TRELM_OK();
+}
+
+uError HostSession::checkCaFile(std::string const& path) {
+    // HTTPS would fail on every request with a bad CA file, and the sign-in reports only that it
+    // failed: the file is looked at once, here, so the user reads what is wrong with it.
+    std::string const remedy = "; give a PEM file of the CAs to trust with --ca-file or http.ca_file";
+    std::error_code ec;
+    std::filesystem::file_status const status = std::filesystem::status(path, ec);
+    if (!std::filesystem::exists(status)) {
+        return TRELM_ERROR_MSG(kInvalid, "CA file " + path + " does not exist" + remedy);
+    }
+    if (!std::filesystem::is_regular_file(status)) {
+        return TRELM_ERROR_MSG(kInvalid, "CA file " + path + " is not a regular file" + remedy);
+    }
+    std::ifstream in(path, std::ios::binary);
+    std::string head(64 * 1024, '\0');
+    in.read(head.data(), static_cast<std::streamsize>(head.size()));
+    if (in.bad() || (!in && in.gcount() == 0)) {
+        return TRELM_ERROR_MSG(kInvalid, "CA file " + path + " cannot be read" + remedy);
+    }
+    head.resize(static_cast<std::size_t>(in.gcount()));
+    if (head.find("-----BEGIN CERTIFICATE-----") == std::string::npos) {
+        return TRELM_ERROR_MSG(kInvalid, "CA file " + path + " holds no PEM certificate" + remedy);
+    }
     return TRELM_OK();
 }
 

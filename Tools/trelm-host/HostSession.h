@@ -50,6 +50,9 @@ public:
 
 private:
     uError prepareEndpoint(Printer& printer, Map<String, Variant>& http);
+    // kInvalid, naming the file and what to do, unless `path` is a readable file with a PEM
+    // certificate in its first 64 KiB.
+    static uError checkCaFile(std::string const& path);
 
     HostOptions const options_;
     HostConfig config_;

@@ -75,7 +75,10 @@ uError SourceClient::open() {
         }
     }
     if (source_ == nullptr) {
-        return TRELM_ERROR_MSG(kNotFound, "no data source is configured and started");
+        return TRELM_ERROR_MSG(kNotFound,
+                               "no data source is configured and started; give a configuration file that "
+                               "names one with --config (the demo's is Tools/trelm-host/demo.json in the "
+                               "source tree, share/trelm/demo.json where the host is installed)");
     }
     HostConfig::ComponentEntry const* entry = session_.entry(name_);
     if (entry == nullptr) return TRELM_ERROR_MSG(kNotFound, "no configuration entry for " + name_);

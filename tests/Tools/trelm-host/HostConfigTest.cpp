@@ -1,6 +1,9 @@
 #include <ostream>
 #include <string>
 
+#include <cstdio>
+#include <fstream>
+
 #include <gtest/gtest.h>
 
 #include "ErrorAssertions.h"
@@ -102,11 +105,29 @@ INSTANTIATE_TEST_SUITE_P(
                   "components[0].runtime_keys: must be a list of strings"}),
     [](auto const& info) { return std::string(info.param.name); });
 
-TEST(HostConfigTest, UnreadableFileIsNotFound) {
-    HostConfig config;
-    trelm::uError e = HostConfig::load("/nonexistent/config.json", config);
-    EXPECT_CODE(e, trelm::kNotFound);
-    EXPECT_NE(e.message().str().find("/nonexistent/config.json"), std::string::npos);
+// A missing file and one too large to be a configuration are named (folders and devices: in the
+// program's tests).
+TEST(HostConfigTest, PathThatIsNoConfigurationFileIsRefusedWithItsName) {
+    std::string const big = ::testing::TempDir() + "big-config.json";
+    {
+        std::ofstream out(big);
+        out << "{\"http\": {}, \"pad\": \"" << std::string(HostConfig::kMaxFileBytes, 'x') << "\"}";
+    }
+    struct Case {
+        std::string path;
+        trelm::ErrorCode code;
+        std::string words;
+    } const cases[] = {
+        {"/nonexistent/config.json", trelm::kNotFound, "cannot read configuration file /nonexistent/config.json"},
+        {big, trelm::kInvalid, "is larger than 1 MiB"},
+    };
+    for (Case const& c : cases) {
+        HostConfig config;
+        trelm::uError e = HostConfig::load(c.path, config);
+        EXPECT_CODE(e, c.code);
+        EXPECT_NE(e.message().str().find(c.words), std::string::npos) << e.message().str();
+    }
+    std::remove(big.c_str());
 }
 
 }  // namespace

@@ -172,9 +172,11 @@ TEST_F(HostProgramTest, MalformedConfigurationNamesThePlaceAndStopsTheHost) {
 
 }  // namespace
 
-// A state folder the host cannot use is named, with why and what to do, before any work starts.
-TEST_F(HostProgramTest, UnusableStateFolderIsNamedWithTheReasonAndARemedy) {
+// A path the host cannot use (state folder, configuration file, CA file) is named, with why and
+// what to do, before any request is sent.
+TEST_F(HostProgramTest, UnusablePathIsNamedWithTheReasonAndARemedy) {
     std::string const file = runner_.writeFile("plain-file", "x");
+    std::string const config = runner_.writeFile("config.json", kConfig);
     std::string const locked = runner_.folder() + "/locked";
     ASSERT_EQ(::mkdir(locked.c_str(), 0700), 0);
     // Root passes every permission test: only the immutable flag keeps it out, where the file
@@ -182,16 +184,25 @@ TEST_F(HostProgramTest, UnusableStateFolderIsNamedWithTheReasonAndARemedy) {
     bool const immutable = std::system(("chattr +i '" + locked + "' 2>/dev/null").c_str()) == 0;
     bool const lockable = immutable || (::geteuid() != 0 && ::chmod(locked.c_str(), 0500) == 0);
     struct Case {
-        std::string folder, words;
+        std::vector<std::string> args;
+        std::string words;
     };
-    std::vector<Case> cases{{file, " is not a folder; choose another with --state-dir"},
-                            {file + "/state", "cannot create state folder " + file + "/state: Not a directory"}};
-    if (lockable) cases.push_back({locked, "state folder " + locked + " cannot be written ("});
+    std::vector<Case> cases{
+        {{"--state-dir", file}, "state folder " + file + " is not a folder; choose another with --state-dir"},
+        {{"--state-dir", file + "/state"}, "cannot create state folder " + file + "/state: Not a directory"},
+        {{"--config", "/dev/zero"}, "configuration file /dev/zero is not a regular file"},
+        {{"--config", runner_.folder()}, "configuration file " + runner_.folder() + " is a folder"},
+        {{"--config", config, "--ca-file", "/dev/zero"}, "CA file /dev/zero is not a regular file; give a PEM file"},
+        {{"--config", config, "--ca-file", file}, "CA file " + file + " holds no PEM certificate"},
+    };
+    if (lockable) cases.push_back({{"--state-dir", locked}, "state folder " + locked + " cannot be written ("});
     for (Case const& c : cases) {
-        auto result = runner_.run(TRELM_HOST_PROGRAM, {"--state-dir", c.folder, "--plugin", TRELMFACEBOOK_MODULE});
-        EXPECT_EQ(result.exitCode, 1) << c.folder;
+        std::vector<std::string> args{"--plugin", TRELMFACEBOOK_MODULE};
+        if (c.args[0] != "--state-dir") args.insert(args.end(), {"--state-dir", stateDir()});
+        args.insert(args.end(), c.args.begin(), c.args.end());
+        auto result = runner_.run(TRELM_HOST_PROGRAM, args);
+        EXPECT_EQ(result.exitCode, 1) << c.words;
         EXPECT_NE(result.err.find(c.words), std::string::npos) << result.err;
-        EXPECT_NE(result.err.find("--state-dir"), std::string::npos) << result.err;
     }
     if (immutable) {
         EXPECT_EQ(std::system(("chattr -i '" + locked + "'").c_str()), 0);
