@@ -111,7 +111,7 @@ uError SyncCommand::syncKind(ItemQuery::Kind const& kind, SourceClient& client, 
     uError e = client.withSession([&]() -> uError {
         ItemQuery query(kind);
         if (!pass.resume.empty()) TRELM_RETURN_IF_ERROR(query.where(pass.resume));
-        return walk(query, plan, client, session, scope, pass, summary, report, plan.boundaries);
+        return walk(query, plan, client, session, scope, pass, summary, report, true);
     });
 
     if (e.ok() && plan.boundaries) {
