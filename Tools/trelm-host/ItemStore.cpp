@@ -215,7 +215,9 @@ uError ItemStore::openLocked(String const& path) {
     }
     sqlite3_busy_timeout(db, 5000);
     // A killed host loses at most the window it was writing; the journal keeps the rest whole.
+    // Committed windows survive the process at once; only a power loss may take the last few.
     uError e = exec(db, "PRAGMA journal_mode=WAL");
+    if (e.ok()) e = exec(db, "PRAGMA synchronous=NORMAL");
     if (e.ok()) e = exec(db, kSchema);
     if (e.failed()) {
         sqlite3_close_v2(db);
