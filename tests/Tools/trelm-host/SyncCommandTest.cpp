@@ -268,6 +268,40 @@ INSTANTIATE_TEST_SUITE_P(Stops, InterruptedSyncTest,
                          ::testing::Values(Interruption{"ServiceError", false}, Interruption{"Killed", true}),
                          [](auto const& info) { return std::string(info.param.name); });
 
+// The kinds that come newest first continue at the time of the last row committed.
+struct TimedKind {
+    char const* kind;
+    char const* method;  // the call that fails on its third use
+};
+
+class StoppedTimedSyncTest : public SyncCommandTest, public ::testing::WithParamInterface<TimedKind> {};
+
+TEST_P(StoppedTimedSyncTest, ContinuesFromTheLastCommittedTimeAndEndsWithEveryItemOnce) {
+    start();
+    emu::FaultRule third;
+    third.every = 3;
+    third.errorCode = 1;
+    fault(GetParam().method, third);
+    ProgramRunner::Result stopped = host({"sync", GetParam().kind});
+    EXPECT_EQ(stopped.exitCode, 3);
+    std::size_t const committed = stored(GetParam().kind).size();
+    ASSERT_GT(committed, 0u);
+
+    emulator_->faults().clearAll();
+    ProgramRunner::Result rest = host({"sync", GetParam().kind});
+    ASSERT_EQ(rest.exitCode, 0) << rest.err;
+    json const begun = linesOfType(rest, "sync").at(0);
+    EXPECT_TRUE(begun["continued"]);
+    EXPECT_EQ(begun["from"].get<std::string>().rfind("core_object_time<=", 0), 0u) << begun;
+    std::set<std::string> const expected = serviceIds(GetParam().kind);
+    EXPECT_EQ(synced(rest)[GetParam().kind]["added"], expected.size() - committed);
+    EXPECT_EQ(keys(stored(GetParam().kind)), expected);
+}
+
+INSTANTIATE_TEST_SUITE_P(Kinds, StoppedTimedSyncTest,
+                         ::testing::Values(TimedKind{"status", "stream.get"}, TimedKind{"photos", "fql.query"}),
+                         [](auto const& info) { return std::string(info.param.kind); });
+
 TEST_F(SyncCommandTest, PostsSharingASecondWithAWindowsLastPostAreStoredOnce) {
     emu::GeneratorOptions generator;
     generator.postsPerSecond = 6;
