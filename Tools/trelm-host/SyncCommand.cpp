@@ -215,7 +215,7 @@ uError SyncCommand::walk(ItemQuery const& query, Plan const& plan, SourceClient&
         if (e.code() == kNoData || !row) break;
         pending.push_back(*row);
         ++summary.rows;
-        report.progress(rowsBefore + summary.rows, total);
+        report.progress(rowsBefore + summary.rows, summary.rows, total);
         int moved = 0;
         e = step("moving to the next row", [&] { return cursor->seek(1, moved); });
         if (wentOut && mainWalk && plan.boundaries) {

@@ -68,7 +68,7 @@ void SyncReport::begin(std::string const& kind, int type, ItemStore::Pass const&
     out_.flush();
 }
 
-void SyncReport::progress(std::size_t rows, std::optional<unsigned> total) {
+void SyncReport::progress(std::size_t rows, std::size_t read, std::optional<unsigned> total) {
     if (!showProgress_) return;
     auto const now = std::chrono::steady_clock::now();
     if (now - shown_ < std::chrono::milliseconds(200)) return;  // a few updates a second at most
@@ -76,7 +76,7 @@ void SyncReport::progress(std::size_t rows, std::optional<unsigned> total) {
     char line[160];
     std::string of = total ? " of " + std::to_string(*total) : std::string();
     std::snprintf(line, sizeof line, "\r%s: %zu rows%s, %.0f rows/s ", kind_.c_str(), rows, of.c_str(),
-                  seconds > 0 ? rows / seconds : 0.0);
+                  seconds > 0 ? read / seconds : 0.0);
     progress_ << line << std::flush;
     lineShown_ = true;
     shown_ = now;

@@ -53,8 +53,9 @@ public:
 
     void wiped(String const& tag, unsigned items);
     void begin(std::string const& kind, int type, ItemStore::Pass const& pass, bool restart);
-    // Rows so far of the kind being synced; `total` when the source counted.
-    void progress(std::size_t rows, std::optional<unsigned> total);
+    // Rows so far of the kind being synced (`read` of them in this run, which gives the rate);
+    // `total` when the source counted.
+    void progress(std::size_t rows, std::size_t read, std::optional<unsigned> total);
     void endProgress();
     void summary(KindSummary const& summary);
     // Writes the gathered summaries (table); call once at the end.
