@@ -137,6 +137,7 @@ report cursor/contacts_walk/real_time curl/contacts_replay/real_time page
 report cursor/contacts_walk/real_time curl/contacts_replay/real_time pagecpu
 report cursor/stream_walk/real_time curl/stream_replay/real_time page
 report cursor/stream_walk/real_time curl/stream_replay/real_time pagecpu
+report sync/full_sync/real_time walk/every_kind/real_time wall
 report engine/contact_page sqlite_xml/contact_page cpu
 report engine/count sqlite_xml/count cpu
 report http/contact_page/process_time/real_time engine/contact_page wall

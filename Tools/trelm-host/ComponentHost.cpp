@@ -12,6 +12,7 @@ ComponentHost::~ComponentHost() {
     shutdownAll();
     for (String const& name : attached_) (void)registry_.remove(name);
     for (auto it = slots_.rbegin(); it != slots_.rend(); ++it) destroy(*it);
+    destroy(items_);
     destroy(runtime_);
     destroy(http_);
 }
@@ -29,6 +30,16 @@ RuntimeConfiguration& ComponentHost::runtimeConfiguration() {
 
 HttpRequestFactory& ComponentHost::httpRequestFactory() {
     return static_cast<HttpRequestFactory&>(*http_.component);
+}
+
+ItemStore& ComponentHost::itemStore() { return static_cast<ItemStore&>(*items_.component); }
+
+uError ComponentHost::startItemStore(String const& path) {
+    items_.component = std::make_unique<ItemStore>();
+    uError e = registry_.add(items_.component->name(), items_.component.get());
+    if (e.failed()) return TRELM_WRAP_MSG(kFailure, e, "cannot register ItemStore");
+    items_.registered = true;
+    return addBuiltin(*items_.component, Map<String, Variant>{{"path", Variant(path)}});
 }
 
 uError ComponentHost::addBuiltin(Component& component, Map<String, Variant> const& values) {
@@ -172,6 +183,7 @@ void ComponentHost::shutdownAll(Vector<uError>* errors) {
     for (auto it = slots_.rbegin(); it != slots_.rend(); ++it) {
         if (it->component) shutdownOne(*it->component, errors);
     }
+    if (items_.component) shutdownOne(*items_.component, errors);
     if (runtime_.component) shutdownOne(*runtime_.component, errors);
     if (http_.component) shutdownOne(*http_.component, errors);
 }

@@ -8,6 +8,7 @@
 #include "ComponentRegistry.h"
 #include "HostConfig.h"
 #include "HttpRequestFactory.h"
+#include "ItemStore.h"
 #include "PluginLoader.h"
 #include "RuntimeConfiguration.h"
 #include "trelm/Map.h"
@@ -53,6 +54,12 @@ public:
     uError startBuiltins(Map<String, Variant> const& http, Map<String, Variant> const& runtime,
                          String const& runtimeStorePath);
 
+    // Makes, registers, configures and starts the built-in "ItemStore" on the database `path`, so
+    // that it is there for the wipes a source sends when another person signs in. Returns the
+    // failure wrapped with the component's name.
+    // REQUIRES: startBuiltins() succeeded.
+    uError startItemStore(String const& path);
+
     // Makes the component of `entry` with the table's factory for its id, registers it under its
     // name, configures it with its "config" values overlaid by the values the runtime store holds
     // under its name (for its config keys and runtime keys), and starts it. The outcome,
@@ -75,6 +82,8 @@ public:
     // REQUIRES: startBuiltins() succeeded.
     RuntimeConfiguration& runtimeConfiguration();
     HttpRequestFactory& httpRequestFactory();
+    // REQUIRES: startItemStore() succeeded.
+    ItemStore& itemStore();
     ComponentRegistry& registry() noexcept { return registry_; }
 
     // Shuts down every started component, plug-in instances first (newest first), then the
@@ -99,6 +108,7 @@ private:
     ComponentRegistry registry_;
     Slot http_;      // HttpRequestFactory
     Slot runtime_;   // RuntimeConfiguration
+    Slot items_;     // ItemStore
     std::vector<Slot> slots_;          // plug-in components, in creation order
     std::vector<Instance> instances_;  // one per addComponent call, in call order
     std::vector<String> attached_;     // names of the components registered by attach()

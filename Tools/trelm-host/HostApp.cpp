@@ -1,5 +1,7 @@
 #include "HostApp.h"
 
+#include <unistd.h>
+
 #include <CLI/CLI.hpp>
 
 #include "DemoTour.h"
@@ -7,9 +9,12 @@
 #include "HostSession.h"
 #include "HostShell.h"
 #include "ItemCommands.h"
+#include "ItemsCommand.h"
 #include "PeerCommands.h"
 #include "RuntimeConfiguration.h"
 #include "StateDirectory.h"
+#include "SyncCommand.h"
+#include "SyncReport.h"
 #include "trelm/Configuration.h"
 #include "trelm/Set.h"
 
@@ -97,6 +102,8 @@ int HostApp::run(int argc, char const* const* argv) {
     ItemCommands items(app, false);
     PeerCommands peerCommands(app);
     CLI::App* shell = app.add_subcommand("shell", "read query, insert and retrieve commands from standard input");
+    SyncCommand sync(app);
+    ItemsCommand storedItems(app);
 
     try {
         app.parse(argc, argv);
@@ -126,6 +133,31 @@ int HostApp::run(int argc, char const* const* argv) {
             PeerPrinter peerPrinter(options.format, out_);
             return peerCommands.run(connector, peerPrinter);
         });
+    }
+    if (sync.parsed()) {
+        return runWithSource(options, [&](SourceClient& client, Printer&, HostSession& session) {
+            TRELM_RETURN_IF_ERROR(client.open());
+            SyncReport syncReport(options.format, out_, err_, isatty(STDERR_FILENO) == 1);
+            return sync.run(client, session, syncReport);
+        });
+    }
+    if (storedItems.parsed()) {
+        // From the local store alone: no plug-in, no component, no service.
+        std::string folder;
+        ItemStore store;
+        uError e = StateDirectory::prepare(options.stateDir, folder);
+        if (e.ok()) e = store.open(String(StateDirectory::itemStorePath(folder)));
+        if (e.failed()) {
+            report(e);
+            return kExitSetupFailed;
+        }
+        SyncReport listing(options.format, out_, err_, false);
+        e = storedItems.run(store, listing);
+        if (e.failed()) {
+            report(e);
+            return kExitCommandFailed;
+        }
+        return kExitOk;
     }
     if (shell->parsed()) {
         return runWithSource(options, [&](SourceClient& client, Printer& printer, HostSession&) {

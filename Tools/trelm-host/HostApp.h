@@ -23,6 +23,8 @@ namespace host {
 //   trelm-host [options] demo [--friends N] [--status TEXT] [--photo FILE]   the tour (DemoTour)
 //   trelm-host [options] query|insert ...         one item command (ItemCommands)
 //   trelm-host [options] shell                    item commands read from `in` (HostShell)
+//   trelm-host [options] sync [KIND ...]          every item into the host's item store (SyncCommand)
+//   trelm-host [options] items KIND [--where ...] what sync stored, without the service (ItemsCommand)
 //   trelm-host [options] peers|peer-status|set-status ...   through the first network connector
 //                                                (PeerCommands)
 // The item commands and the demo work on the first configured data source, which the host

@@ -34,6 +34,7 @@ uError HostSession::open(Printer& printer) {
 
     e = host_.startBuiltins(http, config_.runtime(),
                             String(StateDirectory::runtimeStorePath(stateDir_)));
+    if (e.ok()) e = host_.startItemStore(String(StateDirectory::itemStorePath(stateDir_)));
     if (e.ok()) e = host_.attach(loginListener_);
     if (e.failed()) return e;
 

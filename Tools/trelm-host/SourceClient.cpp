@@ -188,6 +188,19 @@ uError SourceClient::query(ItemQuery const& query, Listing& listing, ItemQuery::
     return TRELM_OK();
 }
 
+uError SourceClient::withSession(std::function<uError()> const& operation) { return retrying(operation); }
+
+uError SourceClient::start(ItemQuery const& query, SmartPtr<IQueryItems::ICursor>& cursor) {
+    cursor_.reset();
+    listed_.clear();
+    IQueryItems::StartQueryMessage msg;
+    TRELM_RETURN_IF_ERROR(query.fill(msg));
+    TRELM_RETURN_IF_ERROR(paced("starting the query", [&] { return source_->startQuery(msg, query.interactive()); }));
+    if (!msg.cursor) return TRELM_ERROR_MSG(kFailure, name_ + " answered the query without a cursor");
+    cursor = msg.cursor;
+    return TRELM_OK();
+}
+
 uError SourceClient::addContactNames(std::vector<Record>& rows) {
     static String const idKey("core_event_contactid");
     static String const nameKey("core_event_contactname");

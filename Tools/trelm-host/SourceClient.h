@@ -85,6 +85,18 @@ public:
     // otherwise.
     uError retrieve(GUID const& guid, Record& record);
 
+    // For walks the caller drives itself (sync). Starts `query` under the session's pacing and
+    // hands its cursor over; the last listing's cursor is released first.
+    uError start(ItemQuery const& query, SmartPtr<IQueryItems::ICursor>& cursor);
+    // Runs one cursor step under the session's pacing; `what` names it in the reports of waits.
+    uError step(char const* what, std::function<uError()> const& op) { return paced(what, op); }
+    // Runs `operation`; after a refused session, signs in again and runs it once more.
+    uError withSession(std::function<uError()> const& operation);
+    // Friend requests carry only the requester's id ("core_event_contactid"); this sets
+    // "core_event_contactname" on each of `rows` from one contact query for those ids, so that a
+    // listing says who asked. The query's cursor is released at once; the last listing's is kept.
+    uError addContactNames(std::vector<Record>& rows);
+
     // The n-th record (from 1) of the last successful listing, or null.
     Record const* listed(std::size_t n) const;
     String const& sourceName() const noexcept { return name_; }
@@ -93,10 +105,6 @@ public:
 
 private:
     uError signIn();
-    // Friend requests carry only the requester's id ("core_event_contactid"); this sets
-    // "core_event_contactname" on each of `rows` from one contact query for those ids, so that a
-    // listing says who asked. The query's cursor is released at once; the last listing's is kept.
-    uError addContactNames(std::vector<Record>& rows);
     // Runs `operation`; after a refused session, signs in again and runs it once more.
     // Runs `step` under the session's pacing, waits reported on standard error.
     uError paced(char const* what, std::function<uError()> const& step);

@@ -65,5 +65,9 @@ std::string StateDirectory::runtimeStorePath(std::string const& folder) {
     return (std::filesystem::path(folder) / "runtime-configuration.db").string();
 }
 
+std::string StateDirectory::itemStorePath(std::string const& folder) {
+    return (std::filesystem::path(folder) / "items.db").string();
+}
+
 }  // namespace host
 }  // namespace trelm

@@ -22,6 +22,8 @@ public:
 
     // The runtime-configuration store inside the folder.
     static std::string runtimeStorePath(std::string const& folder);
+    // The item store inside the folder.
+    static std::string itemStorePath(std::string const& folder);
 };
 
 }  // namespace host

@@ -37,6 +37,7 @@ uError HttpRequestFactory::createRequest(SmartPtr<HttpRequest>& out) {
         cache = cache_;
     }
     out = makeSmart<HttpRequest>(std::move(settings), std::move(cache));
+    requestsMade_.fetch_add(1);
     return TRELM_OK();
 }
 

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <atomic>
+#include <cstdint>
 #include <mutex>
 
 #include "Component.h"
@@ -51,6 +53,9 @@ public:
     void setCaFile(String const& path);
     void setConnectTo(Vector<String> const& entries);
     HttpRequest::Settings settings() const;
+    // How many requests createRequest has handed out since construction: a host that watches it
+    // around a cursor step knows whether the step went to the service.
+    std::uint64_t requestsMade() const noexcept { return requestsMade_.load(); }
 
 protected:
     uError sendConfigImpl(Configuration::Group const& group) override;
@@ -61,6 +66,7 @@ private:
     mutable std::mutex mutex_;
     HttpRequest::Settings settings_;
     SmartPtr<HttpRequest::ConnectionCache> cache_;  // made by the first request
+    std::atomic<std::uint64_t> requestsMade_{0};    // atomic, not guarded
 };
 
 }  // namespace trelm

@@ -75,6 +75,15 @@ uError ContactCursor::derivedStart() {
     bool canMatch = true;
     for (IQueryItems::Constraint const& c : constraints_) {
         String const& name = c.key.name();
+        if (name == kServiceIdKey && c.function == IQueryItems::Constraint::GreaterThan) {
+            // The contacts after this one in the cursor's own order, so that a walk can continue
+            // from a known contact with the same keyset condition its pages use.
+            String id;
+            if (uError err = c.value.as(id); err.failed()) return TRELM_WRAP(kInvalid, err);
+            if (!isDecimal(id)) return TRELM_ERROR_MSG(kInvalid, "a contact service id is not a number");
+            after_ = id;
+            continue;
+        }
         if (name == kServiceIdKey) {
             Vector<String> ids;
             uError err;
@@ -154,6 +163,7 @@ uError ContactCursor::generateBaseQuery(String const& fields, RecordPtr const& k
         TRELM_RETURN_IF_ERROR(library_->getUserId(userId));
         text += userId + "')";
     }
+    if (!after_.empty()) text += " and (" + String(kOrderExpression) + " > '" + after_ + " ')";
     if (!keyset.empty()) text += " and (" + keyset + ")";
     if (ordered) {
         text += " order by ";

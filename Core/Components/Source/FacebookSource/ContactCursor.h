@@ -52,6 +52,9 @@ private:
 
     String baseCondition_;
     bool conditionGiven_ = false;  // baseCondition_ names the users; else the friends of the user
+    // From a GreaterThan constraint on the service id: only the contacts after that id in the
+    // cursor's order (a sync continuing where an earlier walk stopped); empty: from the first.
+    String after_;
     // The keys every contact record carries with the same value ("core_contact_service",
     // "core_object_type" and the base fields): each record starts as a copy of this one.
     Record prototype_;

@@ -1,0 +1,432 @@
+#include "ItemStore.h"
+
+#include <fcntl.h>
+#include <sqlite3.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <ctime>
+
+#include <nlohmann/json.hpp>
+
+#include "WipeMessage.h"
+#include "trelm/GUID.h"
+
+namespace trelm {
+namespace host {
+
+namespace {
+
+using json = nlohmann::ordered_json;
+
+char const kMemory[] = ":memory:";
+
+char const kSchema[] =
+    "CREATE TABLE IF NOT EXISTS item ("
+    " account TEXT NOT NULL, object_type INTEGER NOT NULL, service_id TEXT NOT NULL,"
+    " host_id TEXT NOT NULL UNIQUE, source TEXT NOT NULL, fields TEXT NOT NULL,"
+    " first_seen INTEGER NOT NULL, last_seen INTEGER NOT NULL, deleted INTEGER NOT NULL DEFAULT 0,"
+    " seen_pass INTEGER NOT NULL,"
+    " PRIMARY KEY (account, object_type, service_id)) WITHOUT ROWID;"
+    "CREATE INDEX IF NOT EXISTS item_source ON item (source);"
+    "CREATE TABLE IF NOT EXISTS pass ("
+    " source TEXT NOT NULL, account TEXT NOT NULL, object_type INTEGER NOT NULL,"
+    " pass INTEGER NOT NULL, open INTEGER NOT NULL, resume TEXT NOT NULL, boundaries TEXT NOT NULL,"
+    " rows INTEGER NOT NULL, PRIMARY KEY (source, account, object_type)) WITHOUT ROWID;";
+
+uError sqliteError(sqlite3* db, char const* what) {
+    return TRELM_ERROR_MSG(kFailure, String("item store: ") + what + ": " +
+                                         (db != nullptr ? sqlite3_errmsg(db) : "out of memory"));
+}
+
+// A prepared statement, finalised when it goes out of scope.
+class Statement {
+public:
+    Statement(sqlite3* db, char const* sql) : db_(db) {
+        if (sqlite3_prepare_v2(db, sql, -1, &stmt_, nullptr) != SQLITE_OK) stmt_ = nullptr;
+    }
+    ~Statement() { sqlite3_finalize(stmt_); }
+    Statement(Statement const&) = delete;
+    Statement& operator=(Statement const&) = delete;
+
+    uError ready() const { return stmt_ != nullptr ? TRELM_OK() : sqliteError(db_, "prepare"); }
+    Statement& reset() {
+        sqlite3_reset(stmt_);
+        sqlite3_clear_bindings(stmt_);
+        return *this;
+    }
+    Statement& text(int index, std::string const& value) {
+        sqlite3_bind_text(stmt_, index, value.data(), static_cast<int>(value.size()), SQLITE_TRANSIENT);
+        return *this;
+    }
+    Statement& text(int index, String const& value) { return text(index, value.str()); }
+    Statement& integer(int index, std::int64_t value) {
+        sqlite3_bind_int64(stmt_, index, value);
+        return *this;
+    }
+    // SQLITE_ROW, SQLITE_DONE or an error code.
+    int step() { return sqlite3_step(stmt_); }
+    uError run(char const* what) { return step() == SQLITE_DONE ? TRELM_OK() : sqliteError(db_, what); }
+    std::string column(int index) const {
+        auto const* text = reinterpret_cast<char const*>(sqlite3_column_text(stmt_, index));
+        return text != nullptr ? std::string(text, static_cast<std::size_t>(sqlite3_column_bytes(stmt_, index))) : "";
+    }
+    std::int64_t columnInt(int index) const { return sqlite3_column_int64(stmt_, index); }
+
+private:
+    sqlite3* db_;
+    sqlite3_stmt* stmt_ = nullptr;
+};
+
+uError exec(sqlite3* db, char const* sql) {
+    if (sqlite3_exec(db, sql, nullptr, nullptr, nullptr) != SQLITE_OK) return sqliteError(db, sql);
+    return TRELM_OK();
+}
+
+// Rolled back unless committed.
+class Transaction {
+public:
+    explicit Transaction(sqlite3* db) : db_(db) {}
+    ~Transaction() {
+        if (open_) sqlite3_exec(db_, "ROLLBACK", nullptr, nullptr, nullptr);
+    }
+    uError begin() {
+        uError e = exec(db_, "BEGIN IMMEDIATE");
+        open_ = e.ok();
+        return e;
+    }
+    uError commit() {
+        uError e = exec(db_, "COMMIT");
+        if (e.ok()) open_ = false;
+        return e;
+    }
+
+private:
+    sqlite3* db_;
+    bool open_ = false;
+};
+
+// Made with mode 0600 before SQLite opens it (SQLite would make it 0644 minus the umask); an
+// existing file is narrowed to 0600.
+uError createPrivateFile(String const& path) {
+    int fd = ::open(path.cStr(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600);
+    if (fd < 0) return TRELM_ERROR_MSG(kFailure, "cannot create the item store " + path + ": " + std::strerror(errno));
+    struct stat st {};
+    uError result = TRELM_OK();
+    if (::fstat(fd, &st) != 0 || ((st.st_mode & 07777) != 0600 && ::fchmod(fd, 0600) != 0)) {
+        result = TRELM_ERROR_MSG(kFailure, "cannot make the item store " + path + " private: " + std::strerror(errno));
+    }
+    ::close(fd);
+    return result;
+}
+
+json valueToJson(Variant const& value) {
+    switch (value.type()) {
+        case Variant::Empty: return nullptr;
+        case Variant::Bool: {
+            bool b = false;
+            value.as(b).ignore();  // the type was just checked
+            return b;
+        }
+        case Variant::Int32:
+        case Variant::Int64: return value.asInt64();
+        case Variant::UInt32: return value.asUInt32();
+        case Variant::IntList: {
+            Vector<int> list;
+            value.as(list).ignore();  // the type was just checked
+            json array = json::array();
+            for (int n : list) array.push_back(n);
+            return array;
+        }
+        case Variant::StringList: {
+            Vector<String> list;
+            value.as(list).ignore();  // the type was just checked
+            json array = json::array();
+            for (String const& s : list) array.push_back(s.str());
+            return array;
+        }
+        case Variant::String:
+        case Variant::Guid: break;
+    }
+    return value.asString().str();
+}
+
+std::string boundariesText(std::vector<std::int64_t> const& seconds) {
+    std::string text;
+    for (std::int64_t s : seconds) text += (text.empty() ? "" : ",") + std::to_string(s);
+    return text;
+}
+
+std::vector<std::int64_t> parseBoundaries(std::string const& text) {
+    std::vector<std::int64_t> seconds;
+    std::size_t begin = 0;
+    while (begin < text.size()) {
+        std::size_t end = text.find(',', begin);
+        if (end == std::string::npos) end = text.size();
+        seconds.push_back(std::stoll(text.substr(begin, end - begin)));
+        begin = end + 1;
+    }
+    return seconds;
+}
+
+std::int64_t now() { return static_cast<std::int64_t>(std::time(nullptr)); }
+
+}  // namespace
+
+ItemStore::ItemStore(String name, String componentId) : Component(std::move(name), std::move(componentId)) {}
+
+ItemStore::~ItemStore() { closeLocked(); }
+
+std::string ItemStore::encode(Record const& fields) {
+    json object = json::object();
+    for (auto const& [key, value] : fields) object[key.str()] = valueToJson(value);
+    // Texts from plug-ins are byte strings; replacing invalid UTF-8 keeps the column valid JSON.
+    return object.dump(-1, ' ', false, json::error_handler_t::replace);
+}
+
+uError ItemStore::open(String const& path) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return openLocked(path);
+}
+
+void ItemStore::close() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    closeLocked();
+}
+
+void ItemStore::closeLocked() {
+    if (db_ != nullptr) sqlite3_close_v2(db_);
+    db_ = nullptr;
+    path_ = String();
+}
+
+uError ItemStore::openLocked(String const& path) {
+    closeLocked();
+    if (path.empty()) return TRELM_ERROR_MSG(kInvalid, "empty item store path");
+    if (path != kMemory) TRELM_RETURN_IF_ERROR(createPrivateFile(path));
+    sqlite3* db = nullptr;
+    if (sqlite3_open_v2(path.cStr(), &db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE, nullptr) != SQLITE_OK) {
+        uError e = sqliteError(db, "cannot open");
+        sqlite3_close_v2(db);
+        return TRELM_WRAP_MSG(kFailure, e,
+                              "the item store " + path + " cannot be used; move it away or delete it to sync afresh");
+    }
+    sqlite3_busy_timeout(db, 5000);
+    // A killed host loses at most the window it was writing; the journal keeps the rest whole.
+    // Committed windows survive the process at once; only a power loss may take the last few.
+    uError e = exec(db, "PRAGMA journal_mode=WAL");
+    if (e.ok()) e = exec(db, "PRAGMA synchronous=NORMAL");
+    if (e.ok()) e = exec(db, kSchema);
+    if (e.failed()) {
+        sqlite3_close_v2(db);
+        return TRELM_WRAP_MSG(kFailure, e,
+                              "the item store " + path + " cannot be used; move it away or delete it to sync afresh");
+    }
+    db_ = db;
+    path_ = path;
+    return TRELM_OK();
+}
+
+uError ItemStore::usableLocked() const {
+    if (db_ == nullptr) return TRELM_ERROR_MSG(kFailure, "the item store is not open");
+    return TRELM_OK();
+}
+
+uError ItemStore::sendConfigImpl(Configuration::Group const& group) {
+    String path(kMemory);
+    Variant v = group.get(String("path"));
+    if (!v.empty()) {
+        uError e = v.as(path);
+        if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "configuration key path is not a string");
+    }
+    std::lock_guard<std::mutex> lock(mutex_);
+    if (db_ != nullptr && path == path_) return TRELM_OK();
+    return openLocked(path);
+}
+
+uError ItemStore::handleMessage(IMessage& msg) {
+    if (msg.type() != WipeMessage::kType) return TRELM_OK();
+    auto const* wipeMessage = dynamic_cast<WipeMessage const*>(&msg);
+    if (wipeMessage == nullptr) return TRELM_ERROR(kInvalid);
+    for (auto const& [tag, value] : wipeMessage->params) {
+        (void)value;
+        unsigned items = 0;
+        TRELM_RETURN_IF_ERROR(wipe(tag, items));
+        std::lock_guard<std::mutex> lock(mutex_);
+        wipes_.push_back(Wipe{tag, items});
+    }
+    return TRELM_OK();
+}
+
+uError ItemStore::openPass(Scope const& scope, Pass& pass) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    TRELM_RETURN_IF_ERROR(usableLocked());
+    Statement select(db_, "SELECT pass, open, resume, boundaries, rows FROM pass"
+                          " WHERE source = ?1 AND account = ?2 AND object_type = ?3");
+    TRELM_RETURN_IF_ERROR(select.ready());
+    select.text(1, scope.source).text(2, scope.account).integer(3, scope.type);
+    Pass found;
+    int rc = select.step();
+    if (rc == SQLITE_ROW) {
+        found.id = select.columnInt(0);
+        if (select.columnInt(1) != 0) {
+            found.continued = true;
+            found.resume = select.column(2);
+            found.boundaries = parseBoundaries(select.column(3));
+            found.rows = select.columnInt(4);
+            pass = std::move(found);
+            return TRELM_OK();
+        }
+    } else if (rc != SQLITE_DONE) {
+        return sqliteError(db_, "reading a pass");
+    }
+    found.id += 1;
+    Statement open(db_, "INSERT OR REPLACE INTO pass (source, account, object_type, pass, open, resume, boundaries, rows)"
+                        " VALUES (?1, ?2, ?3, ?4, 1, '', '', 0)");
+    TRELM_RETURN_IF_ERROR(open.ready());
+    open.text(1, scope.source).text(2, scope.account).integer(3, scope.type).integer(4, found.id);
+    TRELM_RETURN_IF_ERROR(open.run("opening a pass"));
+    pass = std::move(found);
+    return TRELM_OK();
+}
+
+uError ItemStore::commitWindow(Scope const& scope, Pass const& pass, std::vector<Incoming> const& rows,
+                               std::vector<std::string> const& firstSeenKeys, Counts& counts) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    TRELM_RETURN_IF_ERROR(usableLocked());
+    Transaction tx(db_);
+    TRELM_RETURN_IF_ERROR(tx.begin());
+    Statement select(db_, "SELECT fields, deleted, seen_pass FROM item"
+                          " WHERE account = ?1 AND object_type = ?2 AND service_id = ?3");
+    Statement insert(db_, "INSERT INTO item (account, object_type, service_id, host_id, source, fields, first_seen,"
+                          " last_seen, deleted, seen_pass) VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?7, 0, ?8)");
+    Statement update(db_, "UPDATE item SET fields = ?4, last_seen = ?5, deleted = 0, seen_pass = ?6, source = ?7"
+                          " WHERE account = ?1 AND object_type = ?2 AND service_id = ?3");
+    TRELM_RETURN_IF_ERROR(select.ready());
+    TRELM_RETURN_IF_ERROR(insert.ready());
+    TRELM_RETURN_IF_ERROR(update.ready());
+    std::int64_t const seenAt = now();
+    Counts window;
+    for (Incoming const& row : rows) {
+        std::string fields = encode(row.fields);
+        select.reset().text(1, scope.account).integer(2, scope.type).text(3, row.serviceId);
+        int const rc = select.step();
+        if (rc == SQLITE_DONE) {
+            insert.reset().text(1, scope.account).integer(2, scope.type).text(3, row.serviceId);
+            insert.text(4, GUID::generate().toString()).text(5, scope.source).text(6, fields);
+            insert.integer(7, seenAt).integer(8, pass.id);
+            TRELM_RETURN_IF_ERROR(insert.run("adding an item"));
+            ++window.added;
+            continue;
+        }
+        if (rc != SQLITE_ROW) return sqliteError(db_, "reading an item");
+        std::string const stored = select.column(0);
+        bool const wasDeleted = select.columnInt(1) != 0;
+        bool const seenBefore = select.columnInt(2) == pass.id;
+        if (!firstSeenKeys.empty()) {
+            json const old = json::parse(stored, nullptr, false);
+            json now = json::parse(fields, nullptr, false);
+            for (std::string const& key : firstSeenKeys) {
+                if (old.is_object() && old.contains(key) && now.is_object()) now[key] = old[key];
+            }
+            fields = now.dump(-1, ' ', false, json::error_handler_t::replace);
+        }
+        bool const same = fields == stored && !wasDeleted;
+        update.reset().text(1, scope.account).integer(2, scope.type).text(3, row.serviceId);
+        update.text(4, fields).integer(5, seenAt).integer(6, pass.id).text(7, scope.source);
+        TRELM_RETURN_IF_ERROR(update.run("updating an item"));
+        if (seenBefore && same) continue;  // a row seen again in the same pass counts once
+        ++(same ? window.unchanged : window.changed);
+    }
+    Statement progress(db_, "UPDATE pass SET resume = ?5, boundaries = ?6, rows = ?7"
+                            " WHERE source = ?1 AND account = ?2 AND object_type = ?3 AND pass = ?4 AND open = 1");
+    TRELM_RETURN_IF_ERROR(progress.ready());
+    progress.text(1, scope.source).text(2, scope.account).integer(3, scope.type).integer(4, pass.id);
+    progress.text(5, pass.resume).text(6, boundariesText(pass.boundaries)).integer(7, pass.rows);
+    TRELM_RETURN_IF_ERROR(progress.run("noting the pass's progress"));
+    if (sqlite3_changes(db_) != 1) {
+        return TRELM_ERROR_MSG(kFailure, "item store: the pass was closed or wiped while it was written");
+    }
+    TRELM_RETURN_IF_ERROR(tx.commit());
+    counts.added += window.added;
+    counts.changed += window.changed;
+    counts.unchanged += window.unchanged;
+    return TRELM_OK();
+}
+
+uError ItemStore::completePass(Scope const& scope, Pass const& pass, Counts& counts) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    TRELM_RETURN_IF_ERROR(usableLocked());
+    Transaction tx(db_);
+    TRELM_RETURN_IF_ERROR(tx.begin());
+    Statement remove(db_, "UPDATE item SET deleted = 1"
+                          " WHERE account = ?1 AND object_type = ?2 AND deleted = 0 AND seen_pass <> ?3");
+    TRELM_RETURN_IF_ERROR(remove.ready());
+    remove.text(1, scope.account).integer(2, scope.type).integer(3, pass.id);
+    TRELM_RETURN_IF_ERROR(remove.run("marking removed items"));
+    unsigned const removed = static_cast<unsigned>(sqlite3_changes(db_));
+    Statement close(db_, "UPDATE pass SET open = 0, resume = '', boundaries = '', rows = ?5"
+                         " WHERE source = ?1 AND account = ?2 AND object_type = ?3 AND pass = ?4");
+    TRELM_RETURN_IF_ERROR(close.ready());
+    close.text(1, scope.source).text(2, scope.account).integer(3, scope.type).integer(4, pass.id).integer(5, pass.rows);
+    TRELM_RETURN_IF_ERROR(close.run("closing the pass"));
+    TRELM_RETURN_IF_ERROR(tx.commit());
+    counts.removed += removed;
+    return TRELM_OK();
+}
+
+uError ItemStore::list(String const& account, int type, bool withRemoved, std::vector<Item>& out) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    TRELM_RETURN_IF_ERROR(usableLocked());
+    Statement plain(db_, "SELECT host_id, account, object_type, service_id, fields, first_seen, last_seen, deleted"
+                         " FROM item WHERE object_type = ?1 AND (?2 = '' OR account = ?2) AND (?3 OR deleted = 0)"
+                         " ORDER BY first_seen, account, service_id");
+    TRELM_RETURN_IF_ERROR(plain.ready());
+    plain.integer(1, type).text(2, account).integer(3, withRemoved ? 1 : 0);
+    std::vector<Item> items;
+    int rc = SQLITE_ROW;
+    while ((rc = plain.step()) == SQLITE_ROW) {
+        Item item;
+        item.hostId = String(plain.column(0));
+        item.account = String(plain.column(1));
+        item.type = static_cast<int>(plain.columnInt(2));
+        item.serviceId = String(plain.column(3));
+        item.fields = plain.column(4);
+        item.firstSeen = plain.columnInt(5);
+        item.lastSeen = plain.columnInt(6);
+        item.deleted = plain.columnInt(7) != 0;
+        items.push_back(std::move(item));
+    }
+    if (rc != SQLITE_DONE) return sqliteError(db_, "listing items");
+    out = std::move(items);
+    return TRELM_OK();
+}
+
+uError ItemStore::wipe(String const& source, unsigned& items) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    TRELM_RETURN_IF_ERROR(usableLocked());
+    Transaction tx(db_);
+    TRELM_RETURN_IF_ERROR(tx.begin());
+    Statement removeItems(db_, "DELETE FROM item WHERE source = ?1");
+    Statement removePasses(db_, "DELETE FROM pass WHERE source = ?1");
+    TRELM_RETURN_IF_ERROR(removeItems.ready());
+    TRELM_RETURN_IF_ERROR(removePasses.ready());
+    removeItems.text(1, source);
+    TRELM_RETURN_IF_ERROR(removeItems.run("wiping items"));
+    unsigned const count = static_cast<unsigned>(sqlite3_changes(db_));
+    removePasses.text(1, source);
+    TRELM_RETURN_IF_ERROR(removePasses.run("wiping passes"));
+    TRELM_RETURN_IF_ERROR(tx.commit());
+    items = count;
+    return TRELM_OK();
+}
+
+std::vector<ItemStore::Wipe> ItemStore::wipes() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return wipes_;
+}
+
+}  // namespace host
+}  // namespace trelm

@@ -1,0 +1,187 @@
+#include "SyncReport.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <ctime>
+
+#include <nlohmann/json.hpp>
+
+namespace trelm {
+namespace host {
+
+namespace {
+
+using json = nlohmann::ordered_json;
+
+void writeLine(std::ostream& out, json const& object) {
+    out << object.dump(-1, ' ', false, json::error_handler_t::replace) << '\n';
+}
+
+std::string utc(std::int64_t seconds) {
+    std::time_t const t = static_cast<std::time_t>(seconds);
+    std::tm parts{};
+    gmtime_r(&t, &parts);
+    char text[32];
+    std::strftime(text, sizeof text, "%Y-%m-%d %H:%M:%S", &parts);
+    return text;
+}
+
+}  // namespace
+
+SyncReport::SyncReport(Printer::Format format, std::ostream& out, std::ostream& progress, bool terminal)
+    : format_(format), out_(out), progress_(progress), showProgress_(terminal && format == Printer::Format::Table) {}
+
+void SyncReport::wiped(String const& tag, unsigned items) {
+    if (format_ == Printer::Format::JsonLines) {
+        writeLine(out_, {{"type", "wiped"}, {"tag", tag.str()}, {"items", items}});
+    } else {
+        out_ << "wiped     " << items << " items of " << tag << " (another person signed in)\n";
+    }
+    out_.flush();
+}
+
+void SyncReport::begin(std::string const& kind, int type, ItemStore::Pass const& pass, bool restart) {
+    kind_ = kind;
+    started_ = std::chrono::steady_clock::now();
+    shown_ = {};
+    if (format_ == Printer::Format::JsonLines) {
+        json from = nullptr;
+        if (!pass.resume.empty()) from = pass.resume;
+        writeLine(out_, {{"type", "sync"},
+                         {"kind", kind},
+                         {"object_type", type},
+                         {"pass", pass.id},
+                         {"continued", pass.continued},
+                         {"from", from},
+                         {"rows_before", pass.rows},
+                         {"restart", pass.continued && restart}});
+    } else if (pass.continued) {
+        out_ << "continue  " << kind << ": an earlier sync stopped after " << pass.rows << " rows; ";
+        if (restart) {
+            out_ << "this kind cannot continue where it stopped, so it is read again from the start\n";
+        } else if (pass.resume.empty()) {
+            out_ << "it continues from the first row\n";
+        } else {
+            out_ << "it continues from " << pass.resume << " without reading the committed windows again\n";
+        }
+    }
+    out_.flush();
+}
+
+void SyncReport::progress(std::size_t rows, std::size_t read, std::optional<unsigned> total) {
+    if (!showProgress_) return;
+    auto const now = std::chrono::steady_clock::now();
+    if (now - shown_ < std::chrono::milliseconds(200)) return;  // a few updates a second at most
+    double const seconds = std::chrono::duration<double>(now - started_).count();
+    char line[160];
+    std::string of = total ? " of " + std::to_string(*total) : std::string();
+    std::snprintf(line, sizeof line, "\r%s: %zu rows%s, %.0f rows/s ", kind_.c_str(), rows, of.c_str(),
+                  seconds > 0 ? read / seconds : 0.0);
+    progress_ << line << std::flush;
+    lineShown_ = true;
+    shown_ = now;
+}
+
+void SyncReport::endProgress() {
+    if (!lineShown_) return;
+    progress_ << "\r\033[K" << std::flush;
+    lineShown_ = false;
+}
+
+void SyncReport::summary(KindSummary const& summary) {
+    endProgress();
+    if (format_ == Printer::Format::Table) {
+        summaries_.push_back(summary);
+        return;
+    }
+    json error = nullptr;
+    if (!summary.error.empty()) error = summary.error;
+    writeLine(out_, {{"type", "synced"},
+                     {"kind", summary.kind},
+                     {"object_type", summary.type},
+                     {"pass", summary.pass},
+                     {"complete", summary.complete},
+                     {"rows", summary.rows},
+                     {"added", summary.counts.added},
+                     {"changed", summary.counts.changed},
+                     {"unchanged", summary.counts.unchanged},
+                     {"removed", summary.counts.removed},
+                     {"boundary_seconds", summary.boundarySeconds},
+                     {"recovered", summary.recovered},
+                     {"requests", summary.requests},
+                     {"error", error}});
+    out_.flush();
+}
+
+void SyncReport::finish() {
+    endProgress();
+    if (format_ == Printer::Format::Table && !summaries_.empty()) {
+        std::vector<std::vector<std::string>> rows{
+            {"KIND", "ROWS", "ADDED", "CHANGED", "UNCHANGED", "REMOVED", "REQUESTS", "PASS"}};
+        for (KindSummary const& s : summaries_) {
+            std::string state = std::to_string(s.pass) + (s.complete ? " complete" : " stopped, continues next time");
+            if (s.recovered > 0) state += ", " + std::to_string(s.recovered) + " posts of boundary seconds recovered";
+            rows.push_back({s.kind, std::to_string(s.rows), std::to_string(s.counts.added),
+                            std::to_string(s.counts.changed), std::to_string(s.counts.unchanged),
+                            std::to_string(s.counts.removed), std::to_string(s.requests), state});
+        }
+        std::vector<std::size_t> width(rows.front().size(), 0);
+        for (auto const& row : rows) {
+            for (std::size_t c = 0; c < row.size(); ++c) width[c] = std::max(width[c], row[c].size());
+        }
+        for (auto const& row : rows) {
+            std::string line;
+            for (std::size_t c = 0; c < row.size(); ++c) {
+                line += row[c];
+                if (c + 1 < row.size()) line += std::string(width[c] - row[c].size() + 2, ' ');
+            }
+            out_ << line << '\n';
+        }
+    }
+    summaries_.clear();
+    out_.flush();
+}
+
+void SyncReport::item(std::size_t index, ItemStore::Item const& item) {
+    json fields = json::parse(item.fields, nullptr, false);
+    if (format_ == Printer::Format::JsonLines) {
+        writeLine(out_, {{"type", "item"},
+                         {"index", index},
+                         {"host_id", item.hostId.str()},
+                         {"account", item.account.str()},
+                         {"object_type", item.type},
+                         {"service_id", item.serviceId.str()},
+                         {"first_seen", item.firstSeen},
+                         {"last_seen", item.lastSeen},
+                         {"deleted", item.deleted},
+                         {"fields", fields}});
+        return;
+    }
+    out_ << '#' << index << "  " << item.hostId << (item.deleted ? "  (removed)" : "") << '\n';
+    std::vector<std::pair<std::string, std::string>> lines{
+        {"service_id", item.serviceId.str()},
+        {"account", item.account.str()},
+        {"first_seen", utc(item.firstSeen)},
+        {"last_seen", utc(item.lastSeen)},
+    };
+    if (fields.is_object()) {
+        for (auto const& [key, value] : fields.items()) {
+            lines.emplace_back(key, value.is_string() ? value.get<std::string>() : value.dump());
+        }
+    }
+    std::size_t width = 0;
+    for (auto const& line : lines) width = std::max(width, line.first.size());
+    for (auto const& [key, value] : lines) out_ << "  " << key << std::string(width - key.size() + 2, ' ') << value << '\n';
+}
+
+void SyncReport::items(int type, std::size_t count) {
+    if (format_ == Printer::Format::JsonLines) {
+        writeLine(out_, {{"type", "items"}, {"object_type", type}, {"count", count}});
+    } else {
+        out_ << "stored    " << count << (count == 1 ? " item" : " items") << '\n';
+    }
+    out_.flush();
+}
+
+}  // namespace host
+}  // namespace trelm

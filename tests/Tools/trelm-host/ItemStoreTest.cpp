@@ -1,0 +1,202 @@
+// The host's item store on its own: counting, host ids and removals over passes, a pass kept
+// open across runs, wipes, and the conditions of `items`.
+#include <sys/stat.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <map>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "ErrorAssertions.h"
+#include "ItemQuery.h"
+#include "ItemStore.h"
+#include "ItemsCommand.h"
+#include "WipeMessage.h"
+
+using trelm::String;
+using trelm::Variant;
+using trelm::host::ItemStore;
+
+namespace {
+
+class ItemStoreTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        char pattern[] = "/tmp/item-store-test-XXXXXX";
+        ASSERT_NE(mkdtemp(pattern), nullptr);
+        folder_ = pattern;
+        ASSERT_OK(store_.open(String(path())));
+    }
+    void TearDown() override {
+        store_.close();
+        std::filesystem::remove_all(folder_);
+    }
+    std::string path() const { return folder_ + "/items.db"; }
+
+    // One window of rows "sid" -> value of the field "v".
+    ItemStore::Counts commit(ItemStore::Pass const& pass, std::map<std::string, int> const& rows,
+                             ItemStore::Scope const& scope) {
+        std::vector<ItemStore::Incoming> incoming;
+        for (auto const& [sid, value] : rows) {
+            incoming.push_back({String(sid), ItemStore::Record{{"v", Variant(value)}, {"t", Variant(value)}}});
+        }
+        ItemStore::Counts counts;
+        EXPECT_OK(store_.commitWindow(scope, pass, incoming, {}, counts));
+        return counts;
+    }
+    std::map<std::string, ItemStore::Item> items(bool withRemoved = true) {
+        std::vector<ItemStore::Item> list;
+        EXPECT_OK(store_.list(String(), 2, withRemoved, list));
+        std::map<std::string, ItemStore::Item> bySid;
+        for (ItemStore::Item const& item : list) bySid[item.serviceId.str()] = item;
+        return bySid;
+    }
+
+    std::string folder_;
+    ItemStore store_;
+    ItemStore::Scope const contacts_{String("facebook"), String("100"), 2};
+};
+
+TEST_F(ItemStoreTest, PassesCountEachRowOnceKeepHostIdsAndRemoveWhatACompletePassMissed) {
+    struct Step {
+        std::vector<std::map<std::string, int>> windows;
+        unsigned added, changed, unchanged, removed;
+        std::vector<std::string> live;
+    };
+    Step const steps[] = {
+        // b arrives twice in one pass (a window read again after a resume): counted once.
+        {{{{"a", 1}, {"b", 1}}, {{"b", 1}, {"c", 1}}}, 3, 0, 0, 0, {"a", "b", "c"}},
+        {{{{"a", 2}, {"b", 1}}}, 0, 1, 1, 1, {"a", "b"}},
+        // c comes back: the same host id, counted changed; b is gone now.
+        {{{{"c", 1}}, {{"a", 2}}}, 0, 1, 1, 1, {"a", "c"}},
+    };
+    std::map<std::string, String> hostIds;
+    for (std::size_t i = 0; i < std::size(steps); ++i) {
+        SCOPED_TRACE("pass " + std::to_string(i + 1));
+        ItemStore::Pass pass;
+        ASSERT_OK(store_.openPass(contacts_, pass));
+        EXPECT_EQ(pass.id, static_cast<std::int64_t>(i + 1));
+        EXPECT_FALSE(pass.continued);
+        ItemStore::Counts total;
+        for (auto const& window : steps[i].windows) {
+            ItemStore::Counts counts = commit(pass, window, contacts_);
+            total.added += counts.added;
+            total.changed += counts.changed;
+            total.unchanged += counts.unchanged;
+        }
+        // Before the pass completes nothing is removed.
+        EXPECT_EQ(items(false).size(), 3u);
+        ASSERT_OK(store_.completePass(contacts_, pass, total));
+        EXPECT_EQ(total.added, steps[i].added);
+        EXPECT_EQ(total.changed, steps[i].changed);
+        EXPECT_EQ(total.unchanged, steps[i].unchanged);
+        EXPECT_EQ(total.removed, steps[i].removed);
+        std::vector<std::string> live;
+        for (auto const& [sid, item] : items(false)) live.push_back(sid);
+        EXPECT_EQ(live, steps[i].live);
+        for (auto const& [sid, item] : items()) {
+            auto [known, fresh] = hostIds.emplace(sid, item.hostId);
+            if (!fresh) {
+                EXPECT_EQ(known->second, item.hostId) << sid;
+            }
+        }
+    }
+    EXPECT_EQ(items().at("a").fields, R"({"t":2,"v":2})");
+}
+
+TEST_F(ItemStoreTest, AnOpenPassIsContinuedByTheNextRunWithItsProgress) {
+    ItemStore::Pass pass;
+    ASSERT_OK(store_.openPass(contacts_, pass));
+    pass.resume = "core_object_time<=5";
+    pass.boundaries = {7, 5};
+    pass.rows = 2;
+    commit(pass, {{"a", 1}, {"b", 1}}, contacts_);
+    store_.close();
+    ASSERT_OK(store_.open(String(path())));
+
+    ItemStore::Pass again;
+    ASSERT_OK(store_.openPass(contacts_, again));
+    EXPECT_TRUE(again.continued);
+    EXPECT_EQ(again.id, pass.id);
+    EXPECT_EQ(again.resume, pass.resume);
+    EXPECT_EQ(again.boundaries, pass.boundaries);
+    EXPECT_EQ(again.rows, 2);
+    ItemStore::Counts counts;
+    ASSERT_OK(store_.completePass(contacts_, again, counts));
+
+    ItemStore::Pass next;
+    ASSERT_OK(store_.openPass(contacts_, next));
+    EXPECT_EQ(next.id, pass.id + 1);
+    EXPECT_FALSE(next.continued);
+    EXPECT_TRUE(next.resume.empty());
+    EXPECT_TRUE(next.boundaries.empty());
+}
+
+TEST_F(ItemStoreTest, FirstSeenKeysKeepTheirFirstValue) {
+    ItemStore::Pass pass;
+    ASSERT_OK(store_.openPass(contacts_, pass));
+    commit(pass, {{"a", 1}}, contacts_);
+    ItemStore::Counts first;
+    ASSERT_OK(store_.completePass(contacts_, pass, first));
+    ASSERT_OK(store_.openPass(contacts_, pass));
+    // The source made "t" up anew; "v" is the same: nothing changed.
+    std::vector<ItemStore::Incoming> rows{{String("a"), ItemStore::Record{{"v", Variant(1)}, {"t", Variant(9)}}}};
+    ItemStore::Counts counts;
+    ASSERT_OK(store_.commitWindow(contacts_, pass, rows, {"t"}, counts));
+    EXPECT_EQ(counts.unchanged, 1u);
+    EXPECT_EQ(items().at("a").fields, R"({"t":1,"v":1})");
+}
+
+TEST_F(ItemStoreTest, WipeMessageRemovesTheNamedSourcesItemsAndTheFileIsPrivate) {
+    ItemStore::Scope const other{String("other"), String("7"), 2};
+    ItemStore::Pass mine, theirs;
+    ASSERT_OK(store_.openPass(contacts_, mine));
+    ASSERT_OK(store_.openPass(other, theirs));
+    commit(mine, {{"a", 1}, {"b", 1}}, contacts_);
+    commit(theirs, {{"z", 1}}, other);
+
+    trelm::WipeMessage wipe(trelm::Map<String, String>{{String("facebook"), String()}});
+    ASSERT_OK(store_.onMessage(wipe));
+    ASSERT_EQ(store_.wipes().size(), 1u);
+    EXPECT_EQ(store_.wipes()[0].source, "facebook");
+    EXPECT_EQ(store_.wipes()[0].items, 2u);
+    std::map<std::string, ItemStore::Item> left = items();
+    ASSERT_EQ(left.size(), 1u);
+    EXPECT_EQ(left.begin()->first, "z");
+    ItemStore::Pass fresh;
+    ASSERT_OK(store_.openPass(contacts_, fresh));
+    EXPECT_EQ(fresh.id, 1) << "the wiped source starts over";
+
+    struct stat st {};
+    ASSERT_EQ(stat(path().c_str(), &st), 0);
+    EXPECT_EQ(st.st_mode & 0777, 0600u);
+}
+
+TEST(ItemsCommandTest, ConditionsCompareEachFieldByItsKind) {
+    std::string const fields = R"({"n":5,"s":"abc","b":false,"none":null})";
+    struct Case {
+        char const* condition;
+        bool matches;
+    };
+    Case const cases[] = {
+        {"n=5", true},    {"n>4", true},      {"n<5", false},      {"n<=5", true},  {"n=4,5", true},
+        {"n=3,4", false}, {"n!=5", false},    {"n=x", false},      {"s=abc", true}, {"s!=abc", false},
+        {"s>abb", true},  {"s=x,abc", true},  {"b=false", true},   {"b=1", false},  {"missing=1", false},
+        {"none=1", false},
+    };
+    trelm::host::ItemQuery::Kind const& kind = *trelm::host::ItemQuery::findKind("contacts");
+    for (Case const& c : cases) {
+        SCOPED_TRACE(c.condition);
+        trelm::host::ItemQuery query(kind);
+        ASSERT_OK(query.where(c.condition));
+        trelm::IQueryItems::StartQueryMessage msg;
+        ASSERT_OK(query.fill(msg));
+        ASSERT_EQ(msg.constraints.size(), 2u);
+        EXPECT_EQ(trelm::host::ItemsCommand::matches(fields, msg.constraints[1]), c.matches);
+    }
+}
+
+}  // namespace

@@ -1,0 +1,354 @@
+// trelm-host sync and items, run as a user runs them against a service emulator the test starts
+// itself (its data in a file of the scratch folder, so that the test can take items away between
+// runs); what the store holds is checked against the emulator's data and its request log.
+#include <signal.h>
+#include <sqlite3.h>
+
+#include <fstream>
+#include <map>
+#include <memory>
+#include <set>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include "Emulator.h"
+#include "ProgramRunner.h"
+#include "trelm/FStreamParseObj.h"
+
+using nlohmann::json;
+
+namespace {
+
+std::string const kDemo = std::to_string(emu::DemoAccount::uid);
+char const* const kContactWindow = "from user where uid in (select uid2 from friend where uid1=";
+
+class SyncCommandTest : public ::testing::Test {
+protected:
+    void start(emu::GeneratorOptions generator = {}) {
+        emu::Emulator::Options options;
+        options.threads = 4;
+        options.databasePath = serviceDatabase();
+        options.generator = generator;
+        emulator_ = std::make_unique<emu::Emulator>(options);
+        std::string error;
+        ASSERT_TRUE(emulator_->start(error)) << error;
+    }
+
+    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& config = TRELM_HOST_DEMO_CONFIG,
+                               int signal = 0, int afterMs = 0) {
+        std::vector<std::string> args{
+            "--format", "json", "--state-dir", runner_.folder() + "/state", "--no-emulator",
+            "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
+            "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
+            "--ca-file", emulator_->caFile(), "--config", config, "--plugin", TRELMFACEBOOK_MODULE};
+        args.insert(args.end(), command.begin(), command.end());
+        return runner_.run(TRELM_HOST_PROGRAM, args, {}, signal, afterMs);
+    }
+
+    // Each kind's summary line of a sync, by kind.
+    static std::map<std::string, json> synced(ProgramRunner::Result const& result) {
+        std::map<std::string, json> byKind;
+        for (json const& line : linesOfType(result, "synced")) byKind[line["kind"]] = line;
+        return byKind;
+    }
+
+    // The stored items of `kind`: service id to the item line.
+    std::map<std::string, json> stored(std::string const& kind, bool removed = false) {
+        std::vector<std::string> command{"items", kind};
+        if (removed) command.push_back("--removed");
+        ProgramRunner::Result result = host(command);
+        EXPECT_EQ(result.exitCode, 0) << result.err;
+        std::map<std::string, json> items;
+        for (json const& item : linesOfType(result, "item")) {
+            EXPECT_TRUE(items.emplace(item["service_id"], item).second) << "stored twice: " << item["service_id"];
+        }
+        return items;
+    }
+
+    // The service ids of a kind as the emulator holds them for `uid`.
+    std::set<std::string> serviceIds(std::string const& kind, std::int64_t uid = emu::DemoAccount::uid) {
+        std::set<std::string> ids;
+        if (kind == "status") {
+            emu::XmlNode root("stream_get_response");
+            EXPECT_FALSE(emulator_->store().streamGet(uid, std::to_string(uid), "0", "0", "100000", root));
+            trelm::Vector<trelm::Map<trelm::String, trelm::String>> rows;
+            unsigned total = 0;
+            EXPECT_TRUE(trelm::FStreamParseObj().parse(emu::renderDocument(root), rows, total).ok());
+            for (auto const& row : rows) {
+                if (!row.contains("is_status")) continue;
+                std::string const id = row.search("post_id")->str();
+                ids.insert(id.substr(id.find('_') + 1));
+            }
+            return ids;
+        }
+        std::string const me = std::to_string(uid);
+        std::map<std::string, std::pair<std::string, std::string>> const statements{
+            {"contacts", {"select uid from user where uid in (select uid2 from friend where uid1 = " + me + ")", ""}},
+            {"photos",
+             {"select pid from photo where aid in (select aid from album where owner in (select uid2 from friend "
+              "where uid1 = " + me + "))", ""}},
+            {"media", {"select pid from photo where owner = " + me, ""}},
+            {"albums", {"select aid from album where owner = " + me, ""}},
+            {"friend-requests", {"select uid_from from friend_request where uid_to = " + me, "FriendRequest: "}},
+            {"photo-tags", {"select pid, subject from photo_tag where subject = " + me, ""}},
+            {"messages",
+             {"select thread_id, message_id from message where thread_id in (select thread_id from thread where "
+              "folder_id = 0)", ""}},
+        };
+        auto const& [statement, prefix] = statements.at(kind);
+        emu::XmlNode root("fql_query_response");
+        EXPECT_FALSE(emulator_->store().fqlQuery(uid, statement, root).has_value()) << statement;
+        for (emu::XmlNode const& row : root.children) {
+            std::string id = prefix;
+            for (emu::XmlNode const& field : row.children) {
+                id += (id.size() > prefix.size() ? (kind == "messages" ? "-" : " ") : "") + field.text;
+            }
+            ids.insert(id);
+        }
+        return ids;
+    }
+
+    void removeFriend(std::string const& uid) {
+        sqlite3* db = nullptr;
+        ASSERT_EQ(sqlite3_open(serviceDatabase().c_str(), &db), SQLITE_OK);
+        std::string const sql = "DELETE FROM friend WHERE (uid1 = " + kDemo + " AND uid2 = " + uid + ") OR (uid1 = " +
+                                uid + " AND uid2 = " + kDemo + ")";
+        EXPECT_EQ(sqlite3_exec(db, sql.c_str(), nullptr, nullptr, nullptr), SQLITE_OK) << sqlite3_errmsg(db);
+        EXPECT_EQ(sqlite3_changes(db), 2);
+        sqlite3_close(db);
+    }
+    std::string serviceDatabase() const { return runner_.folder() + "/service.db"; }
+
+    void fault(std::string const& method, emu::FaultRule const& rule) { emulator_->faults().set(method, rule); }
+
+    ProgramRunner runner_;
+    std::unique_ptr<emu::Emulator> emulator_;
+};
+
+std::set<std::string> keys(std::map<std::string, json> const& items) {
+    std::set<std::string> out;
+    for (auto const& [id, item] : items) out.insert(id);
+    return out;
+}
+
+TEST_F(SyncCommandTest, FirstSyncStoresEveryItemOnceAndTheSecondChangesNothingAndKeepsHostIds) {
+    start();
+    ProgramRunner::Result first = host({"sync"});
+    ASSERT_EQ(first.exitCode, 0) << first.err;
+    std::map<std::string, json> const summaries = synced(first);
+    ASSERT_EQ(summaries.size(), 8u);
+    std::map<std::string, std::map<std::string, json>> before;
+    for (auto const& [kind, summary] : summaries) {
+        SCOPED_TRACE(kind);
+        std::set<std::string> const expected = serviceIds(kind);
+        EXPECT_FALSE(expected.empty());
+        EXPECT_TRUE(summary["complete"]);
+        EXPECT_EQ(summary["added"], expected.size());
+        EXPECT_EQ(summary["changed"], 0);
+        before[kind] = stored(kind);
+        EXPECT_EQ(keys(before[kind]), expected);
+    }
+
+    ProgramRunner::Result second = host({"sync"});
+    ASSERT_EQ(second.exitCode, 0) << second.err;
+    for (auto const& [kind, summary] : synced(second)) {
+        SCOPED_TRACE(kind);
+        EXPECT_TRUE(summary["complete"]);
+        EXPECT_EQ(summary["added"], 0);
+        EXPECT_EQ(summary["changed"], 0);
+        EXPECT_EQ(summary["removed"], 0);
+        EXPECT_EQ(summary["unchanged"], before[kind].size());
+        std::map<std::string, json> const after = stored(kind);
+        ASSERT_EQ(keys(after), keys(before[kind]));
+        for (auto const& [id, item] : after) {
+            EXPECT_EQ(item["host_id"], before[kind][id]["host_id"]) << id;
+            EXPECT_EQ(item["fields"], before[kind][id]["fields"]) << id;
+        }
+    }
+}
+
+TEST_F(SyncCommandTest, RemovedFriendIsMarkedOnlyAfterACompletePass) {
+    emu::GeneratorOptions generator;
+    generator.demoFriends = 400;  // windows of 150, 150 and 100
+    generator.users = 1000;
+    start(generator);
+    ASSERT_EQ(host({"sync", "contacts"}).exitCode, 0);
+    std::map<std::string, json> const before = stored("contacts");
+    ASSERT_EQ(before.size(), 400u);
+    std::string const gone = before.begin()->first;
+    removeFriend(gone);
+
+    // The third window fails and the pass stops there: nothing may be marked removed.
+    emu::FaultRule third;
+    third.every = 3;
+    third.errorCode = 1;
+    fault("fql.query", third);
+    ProgramRunner::Result partial = host({"sync", "contacts"});
+    EXPECT_EQ(partial.exitCode, 3);
+    EXPECT_NE(partial.err.find("the next sync continues where each stopped"), std::string::npos) << partial.err;
+    json summary = synced(partial)["contacts"];
+    EXPECT_FALSE(summary["complete"]);
+    EXPECT_EQ(summary["removed"], 0);
+    EXPECT_TRUE(stored("contacts").count(gone));
+
+    emulator_->faults().clearAll();
+    ProgramRunner::Result rest = host({"sync", "contacts"});
+    ASSERT_EQ(rest.exitCode, 0) << rest.err;
+    json const begun = linesOfType(rest, "sync").at(0);
+    EXPECT_TRUE(begun["continued"]);
+    EXPECT_EQ(begun["rows_before"], 300);
+    summary = synced(rest)["contacts"];
+    EXPECT_TRUE(summary["complete"]);
+    EXPECT_EQ(summary["removed"], 1);
+    std::map<std::string, json> const after = stored("contacts", true);
+    ASSERT_EQ(after.size(), 400u);
+    EXPECT_TRUE(after.at(gone)["deleted"]);
+    EXPECT_EQ(after.at(gone)["host_id"], before.at(gone)["host_id"]);
+    EXPECT_EQ(stored("contacts").size(), 399u);
+}
+
+// How a sync of 5,000 contacts is stopped: a service error on the third window, or SIGKILL while
+// the windows come slowly.
+struct Interruption {
+    char const* name;
+    bool kill;
+};
+
+class InterruptedSyncTest : public SyncCommandTest, public ::testing::WithParamInterface<Interruption> {};
+
+TEST_P(InterruptedSyncTest, NextSyncAsksOnlyForTheWindowsNotCommittedAndStoresEachContactOnce) {
+    emu::GeneratorOptions generator;
+    generator.demoFriends = 5000;
+    generator.users = 10100;
+    start(generator);
+    emu::FaultRule rule;
+    if (GetParam().kill) {
+        rule.delayMs = 150;
+    } else {
+        rule.every = 3;
+        rule.errorCode = 1;
+    }
+    fault("fql.query", rule);
+    ProgramRunner::Result stopped = host({"sync", "contacts"}, TRELM_HOST_DEMO_CONFIG, GetParam().kill ? SIGKILL : 0, 1500);
+    EXPECT_NE(stopped.exitCode, 0);
+    std::map<std::string, json> const committed = stored("contacts");
+    if (!GetParam().kill) {
+        EXPECT_EQ(committed.size(), 300u) << "the two windows before the failed one";
+    }
+    ASSERT_GT(committed.size(), 0u);
+    ASSERT_LT(committed.size(), 5000u);
+    std::string const last = *keys(committed).rbegin();  // the windows come in the text order of the ids
+
+    emulator_->faults().clearAll();
+    emulator_->log().clear();
+    ProgramRunner::Result rest = host({"sync", "contacts"});
+    ASSERT_EQ(rest.exitCode, 0) << rest.err;
+    EXPECT_EQ(linesOfType(rest, "sync").at(0)["from"], "core_contact_service_id>" + last);
+
+    std::vector<std::string> windows;
+    for (emu::LoggedRequest const& request : emulator_->log().entriesFor("fql.query")) {
+        if (request.fql.find(kContactWindow) != std::string::npos) windows.push_back(request.fql);
+    }
+    std::size_t const remaining = 5000 - committed.size();
+    EXPECT_EQ(windows.size(), remaining / 150 + 1);
+    ASSERT_FALSE(windows.empty());
+    EXPECT_NE(windows.front().find("concat(uid,' ') > '" + last + " '"), std::string::npos) << windows.front();
+    for (std::string const& statement : windows) {
+        EXPECT_NE(statement.find("> '" + last + " '"), std::string::npos) << "a committed window asked again: " << statement;
+    }
+    EXPECT_EQ(synced(rest)["contacts"]["added"], remaining);
+    EXPECT_EQ(keys(stored("contacts")), serviceIds("contacts"));
+}
+
+INSTANTIATE_TEST_SUITE_P(Stops, InterruptedSyncTest,
+                         ::testing::Values(Interruption{"ServiceError", false}, Interruption{"Killed", true}),
+                         [](auto const& info) { return std::string(info.param.name); });
+
+// The kinds that come newest first continue at the time of the last row committed.
+struct TimedKind {
+    char const* kind;
+    char const* method;  // the call that fails on its third use
+};
+
+class StoppedTimedSyncTest : public SyncCommandTest, public ::testing::WithParamInterface<TimedKind> {};
+
+TEST_P(StoppedTimedSyncTest, ContinuesFromTheLastCommittedTimeAndEndsWithEveryItemOnce) {
+    start();
+    emu::FaultRule third;
+    third.every = 3;
+    third.errorCode = 1;
+    fault(GetParam().method, third);
+    ProgramRunner::Result stopped = host({"sync", GetParam().kind});
+    EXPECT_EQ(stopped.exitCode, 3);
+    std::size_t const committed = stored(GetParam().kind).size();
+    ASSERT_GT(committed, 0u);
+
+    emulator_->faults().clearAll();
+    ProgramRunner::Result rest = host({"sync", GetParam().kind});
+    ASSERT_EQ(rest.exitCode, 0) << rest.err;
+    json const begun = linesOfType(rest, "sync").at(0);
+    EXPECT_TRUE(begun["continued"]);
+    EXPECT_EQ(begun["from"].get<std::string>().rfind("core_object_time<=", 0), 0u) << begun;
+    std::set<std::string> const expected = serviceIds(GetParam().kind);
+    EXPECT_EQ(synced(rest)[GetParam().kind]["added"], expected.size() - committed);
+    EXPECT_EQ(keys(stored(GetParam().kind)), expected);
+}
+
+INSTANTIATE_TEST_SUITE_P(Kinds, StoppedTimedSyncTest,
+                         ::testing::Values(TimedKind{"status", "stream.get"}, TimedKind{"photos", "fql.query"}),
+                         [](auto const& info) { return std::string(info.param.kind); });
+
+TEST_F(SyncCommandTest, PostsSharingASecondWithAWindowsLastPostAreStoredOnce) {
+    emu::GeneratorOptions generator;
+    generator.postsPerSecond = 6;
+    generator.postsPerUser = 8;
+    start(generator);
+    ProgramRunner::Result result = host({"sync", "status"});
+    ASSERT_EQ(result.exitCode, 0) << result.err;
+    json const summary = synced(result)["status"];
+    EXPECT_GT(summary["boundary_seconds"], 0);
+    EXPECT_GT(summary["recovered"], 0) << "the cursor alone leaves posts of its windows' last seconds out";
+    std::set<std::string> const expected = serviceIds("status");
+    EXPECT_EQ(summary["added"], expected.size());
+    EXPECT_EQ(keys(stored("status")), expected);
+}
+
+TEST_F(SyncCommandTest, AnotherPersonsSignInWipesTheStoreAndTheSameOneAgainDoesNot) {
+    start();
+    ASSERT_EQ(host({"sync", "contacts"}).exitCode, 0);
+    std::size_t const demoContacts = stored("contacts").size();
+
+    std::ifstream in(TRELM_HOST_DEMO_CONFIG);
+    json config = json::parse(in);
+    config["components"][0]["config"]["facebook_source_login"] = emu::SecondAccount::email;
+    config["components"][0]["config"]["facebook_source_password"] = emu::SecondAccount::password;
+    std::string const second = runner_.writeFile("second.json", config.dump());
+    std::int64_t const secondUid = *emulator_->store().checkLogin(emu::SecondAccount::email, emu::SecondAccount::password);
+
+    ProgramRunner::Result switched = host({"sync", "contacts"}, second);
+    ASSERT_EQ(switched.exitCode, 0) << switched.err;
+    std::vector<json> wiped = linesOfType(switched, "wiped");
+    ASSERT_EQ(wiped.size(), 1u);
+    EXPECT_EQ(wiped[0]["items"], demoContacts);
+    std::map<std::string, json> const theirs = stored("contacts");
+    EXPECT_EQ(keys(theirs), serviceIds("contacts", secondUid));
+    for (auto const& [id, item] : theirs) EXPECT_EQ(item["account"], std::to_string(secondUid)) << id;
+    EXPECT_EQ(synced(switched)["contacts"]["added"], theirs.size());
+
+    // The same person signing in again (the stored session dropped) keeps every item.
+    ASSERT_EQ(host({"state", "reset", "facebook", "facebook_source_session_id"}, second).exitCode, 0);
+    ProgramRunner::Result again = host({"sync", "contacts"}, second);
+    ASSERT_EQ(again.exitCode, 0) << again.err;
+    EXPECT_EQ(linesOfType(again, "login").at(0)["session"], "new");
+    EXPECT_TRUE(linesOfType(again, "wiped").empty());
+    EXPECT_EQ(synced(again)["contacts"]["unchanged"], theirs.size());
+    std::map<std::string, json> const kept = stored("contacts");
+    ASSERT_EQ(keys(kept), keys(theirs));
+    for (auto const& [id, item] : kept) EXPECT_EQ(item["host_id"], theirs.at(id)["host_id"]) << id;
+}
+
+}  // namespace
