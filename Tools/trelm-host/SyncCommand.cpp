@@ -1,6 +1,12 @@
 #include "SyncCommand.h"
 
+#include <fcntl.h>
+#include <sys/file.h>
+#include <unistd.h>
+
 #include <algorithm>
+#include <cerrno>
+#include <cstring>
 #include <functional>
 #include <iostream>
 #include <optional>
@@ -16,6 +22,38 @@ namespace host {
 namespace {
 
 char const* const kTime = "core_object_time";
+
+// Held for the whole of a sync: two syncs of one state folder would close each other's passes.
+// The lock is an flock on a file beside the store, so it goes with the process however it ends.
+class SyncLock {
+public:
+    SyncLock() = default;
+    SyncLock(SyncLock const&) = delete;
+    SyncLock& operator=(SyncLock const&) = delete;
+    ~SyncLock() {
+        if (fd_ >= 0) ::close(fd_);
+    }
+
+    // Takes the lock of `folder`, waiting (and saying so on `err`) while another sync holds it.
+    uError take(std::string const& folder, std::ostream& err) {
+        std::string const path = folder + "/sync.lock";
+        fd_ = ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600);
+        if (fd_ < 0) {
+            return TRELM_ERROR_MSG(kFailure, "cannot open " + path + ": " + std::strerror(errno));
+        }
+        if (::flock(fd_, LOCK_EX | LOCK_NB) == 0) return TRELM_OK();
+        err << "another sync of " << folder << " is running; waiting for it to end" << std::endl;
+        while (::flock(fd_, LOCK_EX) != 0) {
+            if (errno != EINTR) {
+                return TRELM_ERROR_MSG(kFailure, "cannot lock " + path + ": " + std::strerror(errno));
+            }
+        }
+        return TRELM_OK();
+    }
+
+private:
+    int fd_ = -1;
+};
 
 std::string kindList() {
     std::string list;
@@ -66,6 +104,8 @@ uError SyncCommand::serviceId(int type, ItemQuery::Record const& row, String& id
 }
 
 uError SyncCommand::run(SourceClient& client, HostSession& session, SyncReport& report) {
+    SyncLock lock;
+    TRELM_RETURN_IF_ERROR(lock.take(session.stateDir(), std::cerr));
     IServiceSource::GetUserSidMessage user;
     uError e = user.send(client.sourceName());
     if (e.failed() || user.result.empty()) {

@@ -12,6 +12,8 @@
 #include <string>
 #include <vector>
 
+#include <future>
+
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
@@ -39,14 +41,14 @@ protected:
     }
 
     ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& config = TRELM_HOST_DEMO_CONFIG,
-                               int signal = 0, int afterMs = 0) {
+                               int signal = 0, int afterMs = 0, ProgramRunner const* runner = nullptr) {
         std::vector<std::string> args{
             "--format", "json", "--state-dir", runner_.folder() + "/state", "--no-emulator",
             "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
             "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
             "--ca-file", emulator_->caFile(), "--config", config, "--plugin", TRELMFACEBOOK_MODULE};
         args.insert(args.end(), command.begin(), command.end());
-        return runner_.run(TRELM_HOST_PROGRAM, args, {}, signal, afterMs);
+        return (runner == nullptr ? runner_ : *runner).run(TRELM_HOST_PROGRAM, args, {}, signal, afterMs);
     }
 
     // Each kind's summary line of a sync, by kind.
@@ -153,8 +155,15 @@ TEST_F(SyncCommandTest, FirstSyncStoresEveryItemOnceAndTheSecondChangesNothingAn
         EXPECT_EQ(keys(before[kind]), expected);
     }
 
+    // Two syncs of one store at once: the second waits for the first, and neither spoils the
+    // other's passes.
+    ProgramRunner otherRunner;
+    auto other = std::async(std::launch::async,
+                            [&] { return host({"sync"}, TRELM_HOST_DEMO_CONFIG, 0, 0, &otherRunner); });
     ProgramRunner::Result second = host({"sync"});
+    ProgramRunner::Result const third = other.get();
     ASSERT_EQ(second.exitCode, 0) << second.err;
+    ASSERT_EQ(third.exitCode, 0) << third.err;
     for (auto const& [kind, summary] : synced(second)) {
         SCOPED_TRACE(kind);
         EXPECT_TRUE(summary["complete"]);
