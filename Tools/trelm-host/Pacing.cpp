@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cstdio>
+#include <optional>
 #include <random>
 #include <thread>
 
@@ -20,13 +21,16 @@ bool Pacing::transient(uError const& error) {
 
 uError Pacing::run(char const* what, std::function<uError()> const& step, std::ostream& log,
                    std::function<void(double)> const& sleep) const {
-    std::mt19937 random{std::random_device{}()};
+    // Seeded only when a step has to wait: every cursor step runs through here, and seeding from
+    // std::random_device costs more than a whole step.
+    std::optional<std::mt19937> random;
     double waited = 0;
     double wait = firstWaitSeconds;
     for (unsigned attempt = 1;; ++attempt) {
         uError const result = step();
         if (!result.failed() || !transient(result) || attempt >= attempts) return result;
-        double const jittered = wait * std::uniform_real_distribution<double>(0.5, 1.0)(random);
+        if (!random) random.emplace(std::random_device{}());
+        double const jittered = wait * std::uniform_real_distribution<double>(0.5, 1.0)(*random);
         if (waited + jittered > maxTotalSeconds) return result;
         unsigned code = kServiceUnavailable;
         for (uError const* level = &result; level != nullptr; level = level->cause()) {
