@@ -43,11 +43,11 @@ struct XMLParser::Run {
             uError e = run->attributes.pushBack(String(*a));
             if (e.failed()) return run->fail(e);
         }
+        run->name.assign(name, static_cast<unsigned>(std::strlen(name)));
         run->marks.push_back(p.path_.size());
         p.path_ += '.';
-        p.path_ += name;
+        p.path_ += run->name;
         ++p.depth_;
-        run->name.assign(name, static_cast<unsigned>(std::strlen(name)));
         uError e = p.start(run->name, run->attributes);
         if (e.failed()) run->fail(e);
     }

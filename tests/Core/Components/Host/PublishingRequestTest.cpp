@@ -21,14 +21,14 @@
 namespace trelm {
 namespace {
 
-// A plain HTTP server on 127.0.0.1 whose first connection dies under its client: it answers
-// the first request on it (keeping the connection open, as any server would), reads the second
-// one whole and closes the connection without answering. Every other connection is answered
-// normally. It counts the bodies it has read.
-// Thread safety: bodies() may be called while connections are served.
+// A plain HTTP server on 127.0.0.1 that keeps its connections open between requests. With
+// `firstDies`, its first connection dies under its client: it answers the first request on it,
+// reads the second one whole and closes the connection without answering. It counts the
+// connections it accepted and the bodies it has read.
+// Thread safety: bodies() and connections() may be called while connections are served.
 class DyingConnectionServer {
 public:
-    DyingConnectionServer() {
+    explicit DyingConnectionServer(bool firstDies = true) : firstDies_(firstDies) {
         listener_ = ::socket(AF_INET, SOCK_STREAM, 0);
         sockaddr_in address{};
         address.sin_family = AF_INET;
@@ -55,6 +55,8 @@ public:
 
     std::string url() const { return "http://127.0.0.1:" + std::to_string(port_) + "/publish"; }
 
+    int connections() const { return accepted_.load(); }
+
     // How many times each body was read.
     std::map<std::string, int> bodies() const {
         std::lock_guard<std::mutex> lock(mutex_);
@@ -66,12 +68,13 @@ private:
         for (int index = 0;; ++index) {
             int fd = ::accept(listener_, nullptr, nullptr);
             if (fd < 0) return;
+            ++accepted_;
             {
                 std::lock_guard<std::mutex> lock(mutex_);
                 open_.push_back(fd);
             }
             // Only the acceptor touches connections_ until the destructor joins it.
-            connections_.emplace_back([this, fd, index] { serve(fd, index == 0); });
+            connections_.emplace_back([this, fd, index] { serve(fd, firstDies_ && index == 0); });
         }
     }
 
@@ -112,6 +115,8 @@ private:
         ::shutdown(fd, SHUT_RDWR);
     }
 
+    bool const firstDies_;
+    std::atomic<int> accepted_{0};
     int listener_ = -1;
     int port_ = 0;
     std::thread acceptor_;
@@ -147,6 +152,29 @@ TEST(PublishingRequestTest, IsNeverResentAfterAKeptConnectionDies) {
         EXPECT_OK(post(factory, server.url(), "second", c.publishing));
         EXPECT_EQ(server.bodies()["n=second"], c.timesSeen);
         EXPECT_EQ(server.bodies()["n=first"], 1);
+    }
+}
+
+// The factory's requests take their libcurl handles from a pool: a handle that carried a
+// publishing request must not make the ordinary requests after it open new connections too.
+TEST(PublishingRequestTest, OnlyPublishingRequestsOpenNewConnections) {
+    struct Case {
+        std::vector<bool> publishing;  // one request each, in order
+        int connections;
+    } const cases[] = {
+        {{false, false, false}, 1},
+        {{true, false, false}, 1},  // the ordinary ones reuse the publishing one's connection
+        {{false, true, false}, 2},
+        {{true, false, true, false}, 2},
+        {{true, true, true}, 3},
+    };
+    for (Case const& c : cases) {
+        DyingConnectionServer server(false);
+        HttpRequestFactory factory;
+        for (bool publishing : c.publishing) {
+            ASSERT_OK(post(factory, server.url(), "n", publishing));
+        }
+        EXPECT_EQ(server.connections(), c.connections) << ::testing::PrintToString(c.publishing);
     }
 }
 
