@@ -57,8 +57,10 @@ uError FacebookSource::MappingCache::getGuid(String const& tag, SidMapKey const&
     }
 
     TRELM_CACHE_LOCK(lock);
-    auto const found = sidMap_.find(key);
-    if (found == sidMap_.end() && !create) return TRELM_ERROR(kNotFound);
+    // One search serves both the lookup and, for a new key, the insertion just before `at`.
+    auto const at = sidMap_.lower_bound(key);
+    bool const known = at != sidMap_.end() && !(key < at->first);
+    if (!known && !create) return TRELM_ERROR(kNotFound);
 
     // A key that sidMap_ lacks is in no tag's set, so for a new key the insertion always adds it;
     // for a known one the insertion tells whether the tag held it.
@@ -71,17 +73,18 @@ uError FacebookSource::MappingCache::getGuid(String const& tag, SidMapKey const&
             return TRELM_ERROR(kOutOfMemory);
         }
     }
-    auto inserted = tagSet->second.insert(std::move(memberNode));
-    bool const added = inserted.inserted;
-    if (!added) memberNode = std::move(inserted.node);  // freed after unlocking
+    // A cursor registers its ids mostly in ascending order, so the end is tried first; a node
+    // that is not taken stays in memberNode and is freed after unlocking.
+    tagSet->second.insert(tagSet->second.end(), std::move(memberNode));
+    bool const added = memberNode.empty();
 
-    if (found != sidMap_.end()) {
-        if (added) ++found->second.refCount;
-        guid = found->second.guid;
+    if (known) {
+        if (added) ++at->second.refCount;
+        guid = at->second.guid;
         return TRELM_OK();
     }
     guid = entryNode.mapped().guid;
-    sidMap_.insert(std::move(entryNode));
+    sidMap_.insert(at, std::move(entryNode));
     return TRELM_OK();
 }
 
@@ -120,14 +123,14 @@ uError FacebookSource::MappingCache::setItem(String const& tag, Metadata::Key co
     bool const added = inserted.inserted;
     if (!added) memberNode = std::move(inserted.node);  // freed after unlocking
 
-    auto const found = objMap_.find(guid);
-    if (found != objMap_.end()) {
-        replaced = std::move(found->second.item);
-        found->second.item = item;
-        if (added) ++found->second.refCount;
+    auto const at = objMap_.lower_bound(guid);
+    if (at != objMap_.end() && !(guid < at->first)) {
+        replaced = std::move(at->second.item);
+        at->second.item = item;
+        if (added) ++at->second.refCount;
         return TRELM_OK();
     }
-    objMap_.insert(std::move(entryNode));
+    objMap_.insert(at, std::move(entryNode));
     return TRELM_OK();
 }
 
