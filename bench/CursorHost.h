@@ -94,6 +94,8 @@ public:
         emulator_ = std::make_unique<emu::Emulator>(options);
         std::string error;
         if (!emulator_->start(error)) fail("emulator", error);
+        // Logged only while a walk is recorded: the log costs time and memory.
+        emulator_->log().setEnabled(false);
 
         connectTo_ = "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort());
         http_.setConnectTo({trelm::String(connectTo_)});
@@ -130,12 +132,19 @@ public:
     CursorHost(CursorHost const&) = delete;
     CursorHost& operator=(CursorHost const&) = delete;
 
-    // Reads every row of a new cursor for `query`; `rows` receives the number read.
-    trelm::uError walk(Query const& query, unsigned& rows) {
+    // A new cursor for `query`.
+    trelm::uError open(Query const& query, trelm::SmartPtr<trelm::IQueryItems::ICursor>& cursor) {
         trelm::IQueryItems::StartQueryMessage msg(query.ordering, query.constraints);
         TRELM_RETURN_IF_ERROR(source_->onMessage(msg));
-        trelm::SmartPtr<trelm::IQueryItems::ICursor> cursor = msg.cursor;
-        if (!cursor) return TRELM_ERROR(trelm::kFailure);
+        if (!msg.cursor) return TRELM_ERROR(trelm::kFailure);
+        cursor = msg.cursor;
+        return TRELM_OK();
+    }
+
+    // Reads every row of a new cursor for `query`; `rows` receives the number read.
+    trelm::uError walk(Query const& query, unsigned& rows) {
+        trelm::SmartPtr<trelm::IQueryItems::ICursor> cursor;
+        TRELM_RETURN_IF_ERROR(open(query, cursor));
         TRELM_RETURN_IF_ERROR(cursor->jumpBeginning());
         rows = 0;
         for (int moved = 1; moved > 0;) {
