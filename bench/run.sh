@@ -137,6 +137,10 @@ report cursor/contacts_walk/real_time curl/contacts_replay/real_time page
 report cursor/contacts_walk/real_time curl/contacts_replay/real_time pagecpu
 report cursor/stream_walk/real_time curl/stream_replay/real_time page
 report cursor/stream_walk/real_time curl/stream_replay/real_time pagecpu
+for kind in photo_events messages albums media photo_tags friend_requests; do
+  report cursor/${kind}_walk/real_time curl/${kind}_replay/real_time page
+  report cursor/${kind}_walk/real_time curl/${kind}_replay/real_time pagecpu
+done
 report sync/full_sync/real_time walk/every_kind/real_time wall
 report engine/contact_page sqlite_xml/contact_page cpu
 report engine/count sqlite_xml/count cpu

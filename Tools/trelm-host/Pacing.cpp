@@ -21,7 +21,8 @@ bool Pacing::transient(uError const& error) {
 
 uError Pacing::run(char const* what, std::function<uError()> const& step, std::ostream& log,
                    std::function<void(double)> const& sleep) const {
-    // Seeded only when a wait comes: opening the random device costs more than a cursor step.
+    // Seeded only when a step has to wait: every cursor step runs through here, and seeding from
+    // std::random_device costs more than a whole step.
     std::optional<std::mt19937> random;
     double waited = 0;
     double wait = firstWaitSeconds;

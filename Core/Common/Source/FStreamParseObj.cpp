@@ -13,12 +13,19 @@ char const kPhotoPath[] = ".stream_get_response.posts.stream_post.attachment.med
 // Type of a status update post.
 char const kStatusType[] = "46";
 
-// Copies src[key] to dst[as] when present.
-uError copyField(Map<String, String> const& src, char const* key, Map<String, String>& dst, char const* as) {
-    String const* value = src.search(String(key));
+// Moves src[key] to dst[as] when present (src is cleared before it is used again).
+uError copyField(Map<String, String>& src, char const* key, Map<String, String>& dst, char const* as) {
+    String* value = src.search(String(key));
     if (value == nullptr) return TRELM_OK();
-    return dst.insert(String(as), *value);
+    return dst.insert(String(as), std::move(*value));
 }
+
+// The leaves of a post and of a medium that a row can take; the others are not kept.
+bool isKeptPostField(String const& name) {
+    return name == "type" || name == "post_id" || name == "source_id" || name == "created_time" || name == "message";
+}
+bool isKeptMediumField(String const& name) { return name == "type" || name == "src" || name == "alt"; }
+bool isKeptPhotoField(String const& name) { return name == "pid" || name == "aid" || name == "owner"; }
 
 }  // namespace
 
@@ -64,15 +71,16 @@ uError FStreamParseObj::end(String const& name) {
     // path() is the parent's path here.
     String const& parent = path();
     if (parent == kPostPath) {
-        if (leaf) return post_.insert(name, text_);
+        if (leaf && isKeptPostField(name)) return post_.insert(name, std::move(text_));
     } else if (parent == kMediumPath) {
-        if (leaf) return medium_.insert(name, text_);
+        if (leaf && isKeptMediumField(name)) return medium_.insert(name, std::move(text_));
     } else if (parent == kPhotoPath) {
-        if (leaf) return medium_.insert("photo." + name, text_);
+        if (leaf && isKeptPhotoField(name)) return medium_.insert("photo." + name, std::move(text_));
     } else if (parent == kMediaPath && name == "stream_media") {
         String const* type = medium_.search(String("type"));
         if (!havePhoto_ && type != nullptr && *type == "photo") {
-            photoMedium_ = medium_;
+            // medium_ is cleared when the next medium starts.
+            photoMedium_ = std::move(medium_);
             havePhoto_ = true;
         }
     } else if (parent == kPostsPath && name == "stream_post") {

@@ -6,7 +6,9 @@
 #include <array>
 #include <cstring>
 #include <mutex>
+#include <new>
 #include <string>
+#include <vector>
 
 namespace trelm {
 
@@ -32,6 +34,24 @@ size_t appendBody(char* data, size_t size, size_t n, void* user) {
     return size * n;
 }
 
+// Appends `text` url-encoded as curl_easy_escape does: letters, digits and "-._~" as they are,
+// every other byte as %XX with upper-case digits. Done here to spare two allocations per field.
+void appendEscaped(std::string& out, std::string const& text) {
+    static constexpr char kHex[] = "0123456789ABCDEF";
+    for (char ch : text) {
+        auto const c = static_cast<unsigned char>(ch);
+        bool const plain = (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '-' ||
+                           c == '.' || c == '_' || c == '~';
+        if (plain) {
+            out += ch;
+        } else {
+            out += '%';
+            out += kHex[c >> 4];
+            out += kHex[c & 0x0f];
+        }
+    }
+}
+
 }  // namespace
 
 // ---------------------------------------------------------------------------------------------
@@ -43,6 +63,43 @@ struct HttpRequest::ConnectionCache::Impl {
     // state), indexed by curl_lock_data; each guards that kind inside the share handle.
     std::array<std::mutex, CURL_LOCK_DATA_LAST> locks;
 
+    // Easy handles of finished exchanges, reset and detached from the share, kept for the next
+    // requests: making a handle per request costs a large allocation and its set-up.
+    static constexpr std::size_t kMaxIdle = 8;
+    std::mutex idleMutex;  // guards idle
+    std::vector<CURL*> idle;
+
+    // A handle from the pool, or a new one; null when libcurl cannot make one.
+    CURL* takeHandle() {
+        {
+            std::lock_guard<std::mutex> lock(idleMutex);
+            if (!idle.empty()) {
+                CURL* easy = idle.back();
+                idle.pop_back();
+                return easy;
+            }
+        }
+        return curl_easy_init();
+    }
+
+    // Takes `easy` back after its exchange: its connection is already in the share's cache.
+    void giveHandle(CURL* easy) {
+        curl_easy_setopt(easy, CURLOPT_SHARE, nullptr);
+        curl_easy_reset(easy);
+        {
+            std::lock_guard<std::mutex> lock(idleMutex);
+            if (idle.size() < kMaxIdle) {
+                try {
+                    idle.push_back(easy);
+                    return;
+                } catch (std::bad_alloc const&) {
+                    // fall through: the handle is simply released
+                }
+            }
+        }
+        curl_easy_cleanup(easy);
+    }
+
     static void lock(CURL*, curl_lock_data data, curl_lock_access, void* user) {
         static_cast<Impl*>(user)->locks[static_cast<std::size_t>(data)].lock();
     }
@@ -51,6 +108,8 @@ struct HttpRequest::ConnectionCache::Impl {
     }
 
     ~Impl() {
+        // No request is left (each keeps the cache alive), so nothing else touches the pool.
+        for (CURL* easy : idle) curl_easy_cleanup(easy);
         if (share != nullptr) curl_share_cleanup(share);
     }
 };
@@ -96,13 +155,18 @@ struct HttpRequest::Impl {
     std::string response;
     long status = 0;
     bool completed = false;
+    bool publishing = false;
     char errorText[CURL_ERROR_SIZE] = {};
 
-    // Frees what one transfer needed; the easy handle goes back last so that its connection
-    // returns to the cache.
+    // Frees what one transfer needed; the easy handle goes back last (to the cache's pool, or
+    // released when the request has no cache) so that its connection returns to the cache.
     void releaseHandle() {
         if (easy != nullptr) {
-            curl_easy_cleanup(easy);
+            if (cache) {
+                cache->impl_->giveHandle(easy);
+            } else {
+                curl_easy_cleanup(easy);
+            }
             easy = nullptr;
         }
         if (mime != nullptr) {
@@ -127,21 +191,16 @@ struct HttpRequest::Impl {
 };
 
 uError HttpRequest::Impl::encodeFields() {
-    body.clear();
-    for (auto const& [key, value] : fields) {
-        char* k = curl_easy_escape(easy, key.cStr(), static_cast<int>(key.size()));
-        char* v = curl_easy_escape(easy, value.cStr(), static_cast<int>(value.size()));
-        if (k == nullptr || v == nullptr) {
-            curl_free(k);
-            curl_free(v);
-            return TRELM_ERROR(kOutOfMemory);
+    try {
+        body.clear();
+        for (auto const& [key, value] : fields) {
+            if (!body.empty()) body += '&';
+            appendEscaped(body, key.str());
+            body += '=';
+            appendEscaped(body, value.str());
         }
-        if (!body.empty()) body += '&';
-        body += k;
-        body += '=';
-        body += v;
-        curl_free(k);
-        curl_free(v);
+    } catch (std::bad_alloc const&) {
+        return TRELM_ERROR(kOutOfMemory);
     }
     curl_easy_setopt(easy, CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(body.size()));
     curl_easy_setopt(easy, CURLOPT_POSTFIELDS, body.c_str());
@@ -193,6 +252,11 @@ uError HttpRequest::Impl::configure() {
     curl_easy_setopt(easy, CURLOPT_WRITEFUNCTION, &appendBody);
     curl_easy_setopt(easy, CURLOPT_WRITEDATA, &response);
     if (cache) curl_easy_setopt(easy, CURLOPT_SHARE, cache->impl_->share);
+    if (publishing) {
+        // libcurl re-sends a request whose reused connection turns out dead; a publishing call
+        // must not go out twice, so it never goes on a reused connection.
+        curl_easy_setopt(easy, CURLOPT_FRESH_CONNECT, 1L);
+    }
 
     for (String const& entry : settings.connectTo) {
         curl_slist* next = curl_slist_append(connectTo, entry.cStr());
@@ -228,6 +292,12 @@ uError HttpRequest::setup(String const& url) {
     impl_->response.clear();
     impl_->status = 0;
     impl_->completed = false;
+    impl_->publishing = false;
+    return TRELM_OK();
+}
+
+uError HttpRequest::setPublishing(bool publishing) {
+    impl_->publishing = publishing;
     return TRELM_OK();
 }
 
@@ -254,7 +324,7 @@ uError HttpRequest::sendRequest() {
     d.response.clear();
     d.status = 0;
     d.completed = false;
-    d.easy = curl_easy_init();
+    d.easy = d.cache ? d.cache->impl_->takeHandle() : curl_easy_init();
     if (d.easy == nullptr) return TRELM_ERROR_MSG(kResource, "cannot create a libcurl handle");
     TRELM_RETURN_IF_ERROR(d.configure());
 

@@ -51,7 +51,7 @@ uError ListHashParseObj::start(String const& name, Vector<String> const& attribu
         leafOpen_ = false;
         return TRELM_OK();
     }
-    text_ = String();
+    text_.assign("", 0);
     leafOpen_ = true;
     return TRELM_OK();
 }
@@ -72,10 +72,10 @@ uError ListHashParseObj::end(String const& name) {
         return TRELM_OK();
     }
     if (!leaf) return TRELM_OK();
-    // path() is the parent's path; the field is named relative to the record element.
-    String field = path().size() > rowPathSize_ ? path().substr(rowPathSize_ + 1) + "." + name : name;
-    if (row_.contains(field)) return TRELM_OK();
-    return row_.insert(field, text_);
+    // path() is the parent's path; the field is named relative to the record element. The
+    // first of a repeated name is kept; text_ is started afresh by the next leaf.
+    if (path().size() <= rowPathSize_) return row_.insertIfAbsent(name, std::move(text_));
+    return row_.insertIfAbsent(path().substr(rowPathSize_ + 1) + "." + name, std::move(text_));
 }
 
 uError ListHashParseObj::chars(String const& text) {

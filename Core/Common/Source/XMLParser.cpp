@@ -28,20 +28,27 @@ struct XMLParser::Run {
         XML_StopParser(expat, XML_FALSE);
     }
 
+    // Reused from event to event, so that a name or text that does not fit a short string
+    // allocates once per run rather than once per event.
+    String name;
+    String text;
+    Vector<String> attributes;
+
     static void XMLCALL onStart(void* user, XML_Char const* name, XML_Char const** atts) {
         auto* run = static_cast<Run*>(user);
         if (run->stopped) return;
         XMLParser& p = run->owner;
-        Vector<String> attributes;
+        run->attributes.clear();
         for (XML_Char const** a = atts; *a != nullptr; ++a) {
-            uError e = attributes.pushBack(String(*a));
+            uError e = run->attributes.pushBack(String(*a));
             if (e.failed()) return run->fail(e);
         }
+        run->name.assign(name, static_cast<unsigned>(std::strlen(name)));
         run->marks.push_back(p.path_.size());
         p.path_ += '.';
-        p.path_ += name;
+        p.path_ += run->name;
         ++p.depth_;
-        uError e = p.start(String(name), attributes);
+        uError e = p.start(run->name, run->attributes);
         if (e.failed()) run->fail(e);
     }
 
@@ -54,14 +61,16 @@ struct XMLParser::Run {
             run->marks.pop_back();
             --p.depth_;
         }
-        uError e = p.end(String(name));
+        run->name.assign(name, static_cast<unsigned>(std::strlen(name)));
+        uError e = p.end(run->name);
         if (e.failed()) run->fail(e);
     }
 
     static void XMLCALL onChars(void* user, XML_Char const* text, int len) {
         auto* run = static_cast<Run*>(user);
         if (run->stopped || len <= 0) return;
-        uError e = run->owner.chars(String(text, static_cast<unsigned>(len)));
+        run->text.assign(text, static_cast<unsigned>(len));
+        uError e = run->owner.chars(run->text);
         if (e.failed()) run->fail(e);
     }
 };

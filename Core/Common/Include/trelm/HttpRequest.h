@@ -22,7 +22,8 @@ namespace trelm {
 //
 // Requests made by the "HttpRequestFactory" component share one ConnectionCache, so a
 // connection (and TLS session) outlives disconnect() and the next request to the same host
-// reuses it. A request made with the default constructor keeps its connections to itself.
+// reuses it. Their libcurl handles are also kept by the cache for the next requests. A request
+// made with the default constructor keeps its connections to itself.
 //
 // Lifetime: a request keeps its ConnectionCache alive. It may be set up and sent again after
 // disconnect() or after a completed exchange.
@@ -71,6 +72,10 @@ public:
     // Starts a new exchange with `url` (http or https): forgets the fields, the upload and the
     // previous response. kInvalid for an empty url.
     virtual uError setup(String const& url);
+    // Marks the exchange as one that publishes (a post, an upload): it is sent on a new
+    // connection, never on one kept from an earlier exchange, so that a kept connection found
+    // dead cannot make libcurl send it a second time. setup() clears the mark.
+    virtual uError setPublishing(bool publishing);
     // Replaces the form fields.
     virtual uError setPostData(Map<String, String> const& fields);
     // Sends `data` as the file part of a multipart body; an empty pointer goes back to a

@@ -41,6 +41,17 @@ public:
         return TRELM_OK();
     }
 
+    // Adds the entry unless an equal key is present, in which case the map is unchanged (and
+    // `value` not moved from); success in both cases. kOutOfMemory when a node can't be allocated.
+    uError insertIfAbsent(K const& key, V&& value) {
+        try {
+            m_.try_emplace(key, std::move(value));
+        } catch (std::bad_alloc const&) {
+            return TRELM_ERROR(kOutOfMemory);
+        }
+        return TRELM_OK();
+    }
+
     // The value stored under key, or null. The pointer stays valid until that entry is removed.
     V* search(K const& key) {
         auto it = m_.find(key);

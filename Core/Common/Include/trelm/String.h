@@ -36,6 +36,12 @@ public:
     // REQUIRES: i < size().
     char operator[](unsigned i) const { return s_[i]; }
 
+    // Replaces the bytes with `length` bytes from `text`, keeping the allocation when they fit.
+    String& assign(char const* text, unsigned length) {
+        s_.assign(text, length);
+        return *this;
+    }
+
     // Removes up to n bytes from pos; a pos past the end removes nothing.
     String& erase(unsigned pos, unsigned n = npos);
     // First position >= pos of c / of text, or npos. An empty text is found at pos (if pos <= size).

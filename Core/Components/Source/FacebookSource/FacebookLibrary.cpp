@@ -304,28 +304,30 @@ uError FacebookLibrary::addAuth(Map<String, String>& args, bool withSession) {
     MutexLock guard(mutex_);
     if (!guard.locked()) return TRELM_ERROR(kResource);
 
+    // The values are moved into the call: one copy each, made by the getters.
     String appKey;
     TRELM_RETURN_IF_ERROR(info_->getAppKey(appKey));
-    TRELM_RETURN_IF_ERROR(args.insert("api_key", appKey));
+    TRELM_RETURN_IF_ERROR(args.insert("api_key", std::move(appKey)));
     if (withSession) {
         String sessionId;
         TRELM_RETURN_IF_ERROR(info_->getSessionId(sessionId));
         // An empty session id is no session: the request goes out as an application call.
         if (!sessionId.empty()) {
-            TRELM_RETURN_IF_ERROR(args.insert("session_key", sessionId));
+            TRELM_RETURN_IF_ERROR(args.insert("session_key", std::move(sessionId)));
             ++callCounter_;
             TRELM_RETURN_IF_ERROR(args.insert("call_id", String::from(callCounter_)));
         }
     }
     String sig;
     TRELM_RETURN_IF_ERROR(makeSignature(args, sig));
-    return args.insert("sig", sig);
+    return args.insert("sig", std::move(sig));
 }
 
 uError FacebookLibrary::makeSignature(Map<String, String> const& args, String& sig) {
     if (!info_) return TRELM_ERROR(kNotSet);
     String secret;
-    if (info_->hasSession() && args.contains("session_key")) {
+    static String const sessionKey("session_key");
+    if (info_->hasSession() && args.contains(sessionKey)) {
         TRELM_RETURN_IF_ERROR(info_->getSessionSecret(secret));
     } else {
         TRELM_RETURN_IF_ERROR(info_->getAppSecret(secret));

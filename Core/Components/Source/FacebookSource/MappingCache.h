@@ -1,5 +1,8 @@
 #pragma once
 
+#include <map>
+#include <set>
+
 #include "trelm/Mutex.h"
 
 #include "FacebookSource.h"
@@ -41,7 +44,10 @@ namespace trelm {
 // Ownership: shared by SmartPtr between the source and its cursors. Stored records are shared with
 // their producer, never copied.
 // Thread safety: setup() must run once before anything else; after that every operation may be
-// called from any thread and runs entirely under the one mutex.
+// called from any thread and reads and changes the cache's maps only under the one mutex. What
+// an operation allocates (a new key's map and set entries, its GUID) is made before it takes the
+// mutex, and what it releases (entries, records) is freed after it lets go, so that the time
+// under the mutex is searching and linking only.
 class FacebookSource::MappingCache {
 public:
     // A service id together with the record key it belongs to (which kind of id it is).
@@ -122,12 +128,21 @@ public:
     uError checkInvariants(Snapshot* snapshot = nullptr);
 
 private:
+    // The standard containers themselves, for their node handles: an entry is made in a node
+    // outside the mutex and linked in under it, and unlinked under it and freed outside.
+    using SidMap = std::map<SidMapKey, SidMapValue>;
+    using ObjMap = std::map<GUID, ObjMapValue>;
+    using SidSet = std::set<SidMapKey>;
+    using GuidSet = std::set<GUID>;
+    using TagSids = std::map<String, SidSet>;
+    using TagObjs = std::map<String, GuidSet>;
+
     // Made by setup (made() is constant afterwards); guards the five members below.
     Mutex mutex_;
-    Map<SidMapKey, SidMapValue> sidMap_ TRELM_GUARDED_BY(mutex_);
-    Map<GUID, ObjMapValue> objMap_ TRELM_GUARDED_BY(mutex_);
-    Map<String, Set<SidMapKey>> tagSids_ TRELM_GUARDED_BY(mutex_);
-    Map<String, Set<GUID>> tagObjs_ TRELM_GUARDED_BY(mutex_);
+    SidMap sidMap_ TRELM_GUARDED_BY(mutex_);
+    ObjMap objMap_ TRELM_GUARDED_BY(mutex_);
+    TagSids tagSids_ TRELM_GUARDED_BY(mutex_);
+    TagObjs tagObjs_ TRELM_GUARDED_BY(mutex_);
     unsigned tagCounter_ TRELM_GUARDED_BY(mutex_) = 0;
 };
 

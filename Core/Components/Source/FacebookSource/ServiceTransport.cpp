@@ -1,5 +1,8 @@
 #include "ServiceTransport.h"
 
+#include <string_view>
+#include <utility>
+
 #include "HttpObjectRequestMessage.h"
 #include "trelm/HashParseObj.h"
 #include "trelm/HttpRequest.h"
@@ -40,14 +43,31 @@ uError ServiceTransport::makeBaseArgs(String const& method, Map<String, String>&
 }
 
 String ServiceTransport::signature(Map<String, String> const& args, String const& secret) {
-    String text;
+    // The pieces go into the digest one by one: the same bytes as the text run together, without
+    // building it. One context per thread, kept from call to call.
+    thread_local MD5_CTX ctx;
+    auto add = [](String const& piece) {
+        MD5Update(&ctx, reinterpret_cast<unsigned char const*>(piece.cStr()), piece.size());
+    };
+    static unsigned char const equals = '=';
+    MD5Init(&ctx);
     for (auto const& [key, value] : args) {
-        text += key;
-        text += '=';
-        text += value;
+        add(key);
+        MD5Update(&ctx, &equals, 1);
+        add(value);
     }
-    text += secret;
-    return md5Hex(text);
+    add(secret);
+    return MD5FinalHex(&ctx);
+}
+
+bool ServiceTransport::isPublishing(Map<String, String> const& args, bool withUpload) {
+    if (withUpload) return true;
+    String const* method = args.search("method");
+    if (method == nullptr) return false;
+    std::string_view name = method->view();
+    constexpr std::string_view prefix = "facebook.";
+    if (name.substr(0, prefix.size()) == prefix) name.remove_prefix(prefix.size());
+    return name == "users.setStatus" || name == "stream.publish" || name == "photos.upload";
 }
 
 uError ServiceTransport::post(String const& url, Map<String, String> const& args, SmartPtr<InputDataStream> data,
@@ -58,6 +78,7 @@ uError ServiceTransport::post(String const& url, Map<String, String> const& args
     if (!request) return TRELM_ERROR(kFailure);
 
     TRELM_RETURN_IF_ERROR(request->setup(url));
+    if (isPublishing(args, static_cast<bool>(data))) TRELM_RETURN_IF_ERROR(request->setPublishing(true));
     TRELM_RETURN_IF_ERROR(request->setPostData(args));
     if (data) TRELM_RETURN_IF_ERROR(request->setUploadData(data));
     TRELM_RETURN_IF_ERROR(request->sendRequest());
@@ -72,7 +93,7 @@ uError ServiceTransport::post(String const& url, Map<String, String> const& args
     TRELM_RETURN_IF_ERROR(request->getResponseData(body));
     // The answer is complete: a connection that cannot be handed back only costs a reconnect.
     request->disconnect().ignore();
-    response = body;
+    response = std::move(body);
     return TRELM_OK();
 }
 

@@ -45,9 +45,15 @@ public:
     // key) order, run together, followed by `secret`.
     static String signature(Map<String, String> const& args, String const& secret);
 
+    // True for a call that publishes something (a status, a post, a photo: "users.setStatus",
+    // "stream.publish", "photos.upload", with or without the "facebook." prefix) and for any call
+    // with an uploaded file (`withUpload`).
+    static bool isPublishing(Map<String, String> const& args, bool withUpload);
+
     // One HTTP exchange: a request from "HttpRequestFactory", `args` as form fields, `data` (when
     // not empty) as the uploaded file of a multipart body. On success `response` receives the
-    // body; on failure it is left as it was.
+    // body; on failure it is left as it was. A publishing call (isPublishing) is sent on a new
+    // connection, so that it is never sent twice without the caller knowing.
     static uError post(String const& url, Map<String, String> const& args, SmartPtr<InputDataStream> data,
                        String& response);
 
