@@ -40,7 +40,7 @@ protected:
             "--format", "json", "--state-dir", runner_.folder() + "/state", "--no-emulator",
             "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
             "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
-            "--ca-file", emulator_->caFile(), "--config", TRELM_HOST_DEMO_CONFIG, "--plugin", TRELMFACEBOOK_MODULE};
+            "--ca-file", emulator_->caFile(), "--config", TRELM_DEMO_CONFIG, "--plugin", TRELMFACEBOOK_MODULE};
         args.insert(args.end(), command.begin(), command.end());
         ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args);
         EXPECT_EQ(result.exitCode, 0) << result.err;
