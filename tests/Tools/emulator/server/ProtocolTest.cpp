@@ -155,37 +155,6 @@ TEST_F(ProtocolTest, LoginOverHttpsGivesASessionThatSignsLaterCalls) {
     }
 }
 
-TEST_F(ProtocolTest, HttpsIsRefusedUnlessTheClientTrustsTheEmulatorsCa) {
-    const std::string port = std::to_string(emulator->httpsPort());
-    struct Case {
-        const char* name;
-        bool trust;
-        std::string url;
-        std::string connectTo;
-        CURLcode expected;
-    };
-    const std::vector<Case> cases = {
-        {"trusted, service host name", true, kHttpsUrl, "api.facebook.com:443:127.0.0.1:" + port, CURLE_OK},
-        {"trusted, localhost", true, "https://localhost:" + port + "/restserver.php", "", CURLE_OK},
-        {"trusted, loopback address", true, "https://127.0.0.1:" + port + "/restserver.php", "", CURLE_OK},
-        {"system CAs only", false, kHttpsUrl, "api.facebook.com:443:127.0.0.1:" + port,
-         CURLE_PEER_FAILED_VERIFICATION},
-        {"trusted, a name the certificate lacks", true, "https://www.example.org/restserver.php",
-         "www.example.org:443:127.0.0.1:" + port, CURLE_PEER_FAILED_VERIFICATION},
-    };
-    for (const Case& c : cases) {
-        SCOPED_TRACE(c.name);
-        TestClient https;
-        if (c.trust) https.trust(emulator->caFile());
-        https.connectTo(c.connectTo);
-        const Reply r = https.postForm(c.url, loginFields());
-        EXPECT_EQ(r.code, c.expected) << curl_easy_strerror(r.code);
-        if (c.expected == CURLE_OK) {
-            EXPECT_EQ(r.errorCode(), 0) << r.body;
-        }
-    }
-}
-
 TEST_F(ProtocolTest, ArgumentsMergeFromQueryStringAndBody) {
     const std::string image = std::string("\xff\xd8\xff\xe0", 4) + std::string(5000, '\x42') + std::string(1, '\0');
     const Fields all = sessionCall("facebook.photos.upload", {{"caption", "a & b = c"}, {"aid", ""}});
