@@ -49,7 +49,7 @@ public:
     }
 };
 
-TEST_F(FidelityTest, UploadsTakeTheFirstFilePartWhateverItsNameAndNeverSignIt) {
+TEST_F(FidelityTest, UploadsAreNeverSignedMustBeImagesAndKeepCaptionsCleaned) {
     struct Case {
         char const* name;
         std::vector<Part> files;
@@ -57,20 +57,12 @@ TEST_F(FidelityTest, UploadsTakeTheFirstFilePartWhateverItsNameAndNeverSignIt) {
         int code;
         std::size_t fileSize;
     };
+    // How the body's parts are found is the request parser's unit test; here the store's answers.
     const std::string binaryName = "filename=\"\xFF\xFE.jpg\"";
     const std::vector<Case> cases = {
-        {"no name at all", {{"filename=\"photo.jpg\"", kJpeg}}, {}, 0, kJpeg.size()},
-        {"named _file", {{"name=\"_file\"; filename=\"photo.jpg\"", kJpeg}}, {}, 0, kJpeg.size()},
         {"binary file name, binary caption", {{binaryName, kJpeg}}, {{"caption", "caf\xE9 \x01"}}, 0, kJpeg.size()},
-        {"two files: the first is the image",
-         {{"filename=\"a.jpg\"", kJpeg}, {"filename=\"b.txt\"", "text"}},
-         {},
-         0,
-         kJpeg.size()},
         {"a text file", {{"filename=\"notes.txt\"", "just some text, not a picture"}}, {}, 324, 29},
         {"an HTML page named .jpg", {{"filename=\"x.jpg\"", "<html><body>hi</body></html>"}}, {}, 324, 28},
-        {"an empty file", {{"filename=\"\"", ""}}, {}, 324, 0},
-        {"no file part", {}, {}, 324, 0},
     };
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
@@ -102,12 +94,9 @@ TEST_F(FidelityTest, ABrokenMultipartBodyIsAnsweredAsACallWithoutArguments) {
     EXPECT_EQ(r.errorCode(), 101) << r.body;
 }
 
-TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
-    // A thread of the demo inbox, for mailbox.getThreadMessages.
-    const Reply inbox = client.postForm(emulator->httpUrl(), sessionCall("mailbox.getInbox"));
-    const std::string tid = elementText(inbox.body, "tid");
-    ASSERT_FALSE(tid.empty()) << inbox.body;
-
+// The answer writer is one for every method; these cases cover its shapes: a list, an empty list,
+// an object of lists, a scalar, an object and an error document.
+TEST_F(FidelityTest, FormatJsonAnswersInEveryShape) {
     using Json = nlohmann::json;
     struct Case {
         char const* name;
@@ -140,29 +129,7 @@ TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
              EXPECT_TRUE(j["posts"][0]["post_id"].is_string());
              EXPECT_TRUE(j["profiles"].is_array());
          }},
-        {"mailbox.getInbox", call("mailbox.getInbox", {{"limit", "2"}}),
-         [](Json const& j) {
-             ASSERT_EQ(j.size(), 2u);
-             EXPECT_TRUE(j[0]["tid"].is_string());
-         }},
-        {"mailbox.getThreadMessages", call("mailbox.getThreadMessages", {{"tid", tid}}),
-         [](Json const& j) {
-             ASSERT_FALSE(j.empty());
-             EXPECT_TRUE(j[0]["body"].is_string());
-         }},
-        {"users.getInfo",
-         call("users.getInfo", {{"uids", std::to_string(DemoAccount::uid)}, {"fields", "name,timezone"}}),
-         [](Json const& j) {
-             ASSERT_EQ(j.size(), 1u);
-             EXPECT_EQ(j[0]["timezone"], "");
-         }},
-        {"friends.get", call("friends.get", {}), [](Json const& j) { EXPECT_EQ(j.size(), 5u); }},
         {"users.setStatus", call("users.setStatus", {{"status", "json"}}), [](Json const& j) { EXPECT_EQ(j, "1"); }},
-        {"photos.upload",
-         [this](std::string const& format) {
-             return upload(sessionCall("photos.upload", {{"format", format}}), {{"filename=\"p.jpg\"", kJpeg}});
-         },
-         [](Json const& j) { EXPECT_TRUE(j["pid"].is_string()); }},
         {"auth.login",
          [&](std::string const& format) {
              return https.postForm(kHttpsUrl, appCall("facebook.auth.login", {{"email", DemoAccount::email},
@@ -184,8 +151,6 @@ TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
                  if (a["key"] == "sig") sawSig = a["value"] == "bad" + kFffd;
              EXPECT_TRUE(sawSig) << j.dump();
          }},
-        {"an FQL error", call("fql.query", {{"query", "SELECT * FROM user WHERE uid = me()"}}),
-         [](Json const& j) { EXPECT_EQ(j["error_code"], 601); }},
     };
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);

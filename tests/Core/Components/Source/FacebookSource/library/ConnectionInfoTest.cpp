@@ -110,6 +110,16 @@ TEST_F(ConnectionInfoTest, ChangedApplicationDropsSessionAndUser) {
     }
 }
 
+TEST_F(ConnectionInfoTest, DroppingTheSessionAloneKeepsTheUser) {
+    signIn("sid", "ssec", "7");
+    ASSERT_OK(info->invalidateSessionConfigWithoutUser(false));
+    String out;
+    ASSERT_OK(info->getUserId(out));
+    EXPECT_EQ(out, "7");
+    EXPECT_CODE(info->getSessionId(out), kNotSignedIn);
+    EXPECT_CODE(info->getSessionSecret(out), kNotSignedIn);
+}
+
 // A failed store is reported, memory keeps the change, and the second message is not sent.
 TEST_F(ConnectionInfoTest, FailedStoreIsReportedWhileMemoryKeepsTheChange) {
     store.failType("RuntimeConfigurationMessage");
