@@ -67,9 +67,9 @@ protected:
                     .threadsPerUser = 45, .messagesPerThread = 60, .friendRequests = 200});
 
         std::map<std::string, Thread> byId;
-        for (Row& r : fql("select thread_id, updated_time from thread where folder_id = 0", "thread"))
+        for (Row& r : host->fqlRows("select thread_id, updated_time from thread where folder_id = 0", "thread"))
             byId[r["thread_id"]] = Thread{r["thread_id"], std::stoi(r["updated_time"]), {}};
-        for (Row& r : fql("select message_id, thread_id, author_id, body, created_time from message where "
+        for (Row& r : host->fqlRows("select message_id, thread_id, author_id, body, created_time from message where "
                           "thread_id in (select thread_id from thread where folder_id = 0)",
                           "message")) {
             std::string const& mid = r["message_id"];
@@ -86,15 +86,13 @@ protected:
         std::sort(threads.begin(), threads.end(), [](Thread const& a, Thread const& b) {
             return std::make_tuple(b.updated, std::stoll(b.tid)) < std::make_tuple(a.updated, std::stoll(a.tid));
         });
-        for (auto& [uid, name] : names) name = fql("select name from user where uid = " + uid, "user").at(0)["name"];
+        for (auto& [uid, name] : names) name = host->fqlRows("select name from user where uid = " + uid, "user").at(0)["name"];
 
         requesters = host->fqlColumn(kRequestBase, "friend_info", "uid_from");
         std::sort(requesters.begin(), requesters.end(), [](auto const& a, auto const& b) { return a + " " < b + " "; });
     }
 
 
-
-    static std::vector<Row> fql(std::string const& query, std::string const& table) { return host->fqlRows(query, table); }
 
     // Every message at or after the bound (after it when `exclusive`), newest first, equal times
     // by descending id: "serviceid time author name body".
@@ -155,16 +153,11 @@ protected:
         cursor = EmulatorHost::open(*source, type, columns, extra, -1, &err);
         return err;
     }
-    static std::vector<Record> walk(Cursor const& cursor) { return EmulatorHost::walk(*cursor); }
 
-    static std::vector<Thread> threads;               // newest update first
-    static std::map<std::string, std::string> names;  // of the authors
-    static std::vector<std::string> requesters;       // in the friend request cursor's order
+    static inline std::vector<Thread> threads;               // newest update first
+    static inline std::map<std::string, std::string> names;  // of the authors
+    static inline std::vector<std::string> requesters;       // in the friend request cursor's order
 };
-
-std::vector<Thread> InboxCursorsTest::threads;
-std::map<std::string, std::string> InboxCursorsTest::names;
-std::vector<std::string> InboxCursorsTest::requesters;
 
 TEST_F(InboxCursorsTest, MessagesComeOnceNewestFirstAndATimeBoundStopsReadingAtTheFirstOlderOne) {
     std::vector<std::string> const all = expectedMessages(0, false);
@@ -189,7 +182,7 @@ TEST_F(InboxCursorsTest, MessagesComeOnceNewestFirstAndATimeBoundStopsReadingAtT
         host->emulator().log().clear();
         Cursor cursor;
         ASSERT_OK(open(10, kMessageOrder, c.bound, cursor));
-        std::vector<Record> const rows = walk(cursor);
+        std::vector<Record> const rows = EmulatorHost::walk(*cursor);
         std::vector<std::string> got;
         std::set<GUID> guids;
         for (Record const& r : rows) {
@@ -265,7 +258,7 @@ TEST_F(InboxCursorsTest, FriendRequestsComeOnceAcrossPagesWithKeysetStatements) 
     Cursor cursor;
     ASSERT_OK(open(12, kRequestOrdering, {}, cursor));
     std::time_t const before = std::time(nullptr);
-    std::vector<Record> const rows = walk(cursor);
+    std::vector<Record> const rows = EmulatorHost::walk(*cursor);
     std::vector<std::string> seen;
     for (Record const& r : rows) {
         std::string const uid = text(r, "core_event_contactid");
