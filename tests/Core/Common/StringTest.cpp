@@ -61,16 +61,6 @@ TEST(StringTest, FromWritesDecimalTextAtTheLimits) {
     EXPECT_EQ(String::from(0), "0");
 }
 
-struct ParseCase {
-    char const* text;
-    bool intOk;
-    int intValue;
-    bool unsignedOk;
-    unsigned unsignedValue;
-};
-
-class StringParseTest : public testing::TestWithParam<ParseCase> {};
-
 // A refused text leaves the out-parameter as it was.
 template <class T>
 void expectParse(char const* text, bool ok, T value, T sentinel) {
@@ -81,27 +71,27 @@ void expectParse(char const* text, bool ok, T value, T sentinel) {
     EXPECT_EQ(out, ok ? value : sentinel) << text;
 }
 
-TEST_P(StringParseTest, WholeTextMustBeADecimalInRange) {
-    ParseCase const& c = GetParam();
-    expectParse(c.text, c.intOk, c.intValue, -777);
-    expectParse(c.text, c.unsignedOk, c.unsignedValue, 777u);
+TEST(StringTest, WholeTextMustBeADecimalInRange) {
+    struct Case {
+        char const* text;
+        bool intOk;
+        int intValue;
+        bool unsignedOk;
+        unsigned unsignedValue;
+    } const cases[] = {
+        {"0", true, 0, true, 0}, {"42", true, 42, true, 42}, {"2147483647", true, INT_MAX, true, 2147483647u},
+        {"2147483648", false, 0, true, 2147483648u}, {"-2147483648", true, INT_MIN, false, 0},
+        {"-2147483649", false, 0, false, 0}, {"4294967295", false, 0, true, UINT_MAX},
+        {"4294967296", false, 0, false, 0}, {"-1", true, -1, false, 0}, {"007", true, 7, true, 7},
+        {"", false, 0, false, 0}, {"-", false, 0, false, 0}, {"+5", false, 0, false, 0}, {" 5", false, 0, false, 0},
+        {"5 ", false, 0, false, 0}, {"12abc", false, 0, false, 0}, {"1.5", false, 0, false, 0},
+        {"0x10", false, 0, false, 0}, {"99999999999999999999", false, 0, false, 0},
+    };
+    for (Case const& c : cases) {
+        expectParse(c.text, c.intOk, c.intValue, -777);
+        expectParse(c.text, c.unsignedOk, c.unsignedValue, 777u);
+    }
 }
-
-INSTANTIATE_TEST_SUITE_P(
-    Table, StringParseTest,
-    testing::Values(ParseCase{"0", true, 0, true, 0}, ParseCase{"42", true, 42, true, 42},
-                    ParseCase{"2147483647", true, INT_MAX, true, 2147483647u},
-                    ParseCase{"2147483648", false, 0, true, 2147483648u},
-                    ParseCase{"-2147483648", true, INT_MIN, false, 0},
-                    ParseCase{"-2147483649", false, 0, false, 0},
-                    ParseCase{"4294967295", false, 0, true, UINT_MAX},
-                    ParseCase{"4294967296", false, 0, false, 0},
-                    ParseCase{"-1", true, -1, false, 0}, ParseCase{"007", true, 7, true, 7},
-                    ParseCase{"", false, 0, false, 0}, ParseCase{"-", false, 0, false, 0},
-                    ParseCase{"+5", false, 0, false, 0}, ParseCase{" 5", false, 0, false, 0},
-                    ParseCase{"5 ", false, 0, false, 0}, ParseCase{"12abc", false, 0, false, 0},
-                    ParseCase{"1.5", false, 0, false, 0}, ParseCase{"0x10", false, 0, false, 0},
-                    ParseCase{"99999999999999999999", false, 0, false, 0}));
 
 }  // namespace
 }  // namespace trelm

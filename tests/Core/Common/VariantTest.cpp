@@ -136,23 +136,6 @@ INSTANTIATE_TEST_SUITE_P(
         C{"IntToStringList", 3, Target::StrList, false, kNone}),
     [](testing::TestParamInfo<ConversionCase> const& info) { return info.param.name; });
 
-TEST(VariantTest, TypeCodesAreTheFixedNumbers) {
-    EXPECT_EQ(Variant().type(), 0);
-    EXPECT_EQ(Variant(true).type(), 1);
-    EXPECT_EQ(Variant("s").type(), 2);
-    EXPECT_EQ(Variant(kGuid).type(), 3);
-    EXPECT_EQ(Variant(Vector<int>{}).type(), 4);
-    EXPECT_EQ(Variant(Vector<String>{}).type(), 5);
-    EXPECT_EQ(Variant(1).type(), 6);
-    EXPECT_EQ(Variant(1LL).type(), 7);
-    EXPECT_EQ(Variant(1u).type(), 8);
-    Variant v;
-    v = 3LL;
-    EXPECT_EQ(v.type(), Variant::Int64);
-    v = String("x");
-    EXPECT_EQ(v.type(), Variant::String);
-}
-
 TEST(VariantTest, AccessorsGiveDefaultsWhenTheValueDoesNotConvert) {
     Variant text("not a number");
     EXPECT_EQ(text.asInt32(), 0);

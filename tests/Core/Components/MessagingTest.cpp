@@ -7,7 +7,6 @@
 
 #include "Component.h"
 #include "ComponentRegistry.h"
-#include "GetRuntimeConfigurationMessage.h"
 #include "IMessage.h"
 #include "WipeMessage.h"
 
@@ -67,28 +66,6 @@ TEST_F(MessagingTest, BroadcastReachesEveryoneInOrderAndReturnsTheFirstFailure) 
     EXPECT_CODE(msg.send(""), kInvalid);
     EXPECT_EQ(log_, (std::vector<std::string>{"c:WipeMessage", "a:WipeMessage", "b:WipeMessage",
                                               "d:WipeMessage"}));
-}
-
-TEST_F(MessagingTest, ReceiverAnswersThroughTheCallersMap) {
-    class Store : public Component {
-    public:
-        Store() : Component("RuntimeConfiguration", "@test:/store") {}
-
-    protected:
-        uError handleMessage(IMessage& msg) override {
-            auto* get = dynamic_cast<GetRuntimeConfigurationMessage*>(&msg);
-            if (get == nullptr) return TRELM_ERROR(kNotSupported);
-            if (get->tag != "source") return TRELM_ERROR(kNotFound);
-            if (Variant* v = get->values.search("facebook_source_lastuser")) *v = "1234";
-            return TRELM_OK();
-        }
-    } store;
-    ASSERT_OK(registry_.add(store.name(), &store));
-    Map<String, Variant> values{{"facebook_source_lastuser", Variant()}, {"other", Variant()}};
-    GetRuntimeConfigurationMessage msg("source", values);
-    ASSERT_OK(msg.send("RuntimeConfiguration"));
-    EXPECT_EQ(*values.search("facebook_source_lastuser"), Variant("1234"));
-    EXPECT_TRUE(values.search("other")->empty());
 }
 
 // On a WipeMessage, sends a second message to `next` (and to everyone), and registers a new

@@ -1,4 +1,3 @@
-#include <ostream>
 #include <string>
 
 #include <gtest/gtest.h>
@@ -108,52 +107,37 @@ TEST_F(ComponentHostTest, StoredValuesOfTheComponentsKeysOverrideTheFile) {
     EXPECT_EQ(RecordingComponent::lastConfig, expected);
 }
 
-struct FailureCase {
-    char const* name;
-    char const* componentName;
-    char const* id;
-    unsigned startupCode;
-    bool made;
-    Component::State state;  // when made
-    unsigned code;
-    unsigned causeCode;      // 0: no cause
-};
-
-void PrintTo(FailureCase const& c, std::ostream* os) { *os << c.name; }
-
-class ComponentHostFailureTest : public ComponentHostTest,
-                                 public ::testing::WithParamInterface<FailureCase> {};
-
-TEST_P(ComponentHostFailureTest, IsRecordedWithTheCauseAndTheStateReached) {
-    FailureCase const& c = GetParam();
-    RecordingComponent::startupCode = c.startupCode;
-    ComponentHost::Instance made = host_.addComponent(entry(c.componentName, c.id), table_);
-    EXPECT_CODE(made.error, c.code) << made.error;
-    if (c.causeCode == 0) {
-        EXPECT_EQ(made.error.cause(), nullptr);
-    } else {
-        ASSERT_NE(made.error.cause(), nullptr);
-        EXPECT_EQ(made.error.cause()->code(), c.causeCode);
+TEST_F(ComponentHostTest, FailureIsRecordedWithTheCauseAndTheStateReached) {
+    struct Case {
+        char const* componentName;
+        char const* id;
+        unsigned startupCode;
+        bool made;
+        Component::State state;  // when made
+        unsigned code;
+        unsigned causeCode;  // 0: no cause
+    } const cases[] = {
+        {"ghost", "@test:/unknown", trelm::kSuccess, false, Component::State::Created, trelm::kNotFound, 0},
+        {"RuntimeConfiguration", "@test:/recording", trelm::kSuccess, true, Component::State::Created,
+         trelm::kFailure, trelm::kInvalid},  // a name taken by a built-in
+        {"rec", "@test:/recording", trelm::kNotSignedIn, true, Component::State::Configured, trelm::kFailure,
+         trelm::kNotSignedIn},
+    };
+    for (std::size_t i = 0; i < std::size(cases); ++i) {
+        auto const& c = cases[i];
+        SCOPED_TRACE(c.componentName + std::string(" ") + c.id);
+        RecordingComponent::startupCode = c.startupCode;
+        ComponentHost::Instance made = host_.addComponent(entry(c.componentName, c.id), table_);
+        EXPECT_CODE(made.error, c.code) << made.error;
+        EXPECT_EQ(made.error.cause() ? made.error.cause()->code() : 0u, c.causeCode);
+        ASSERT_EQ(made.component != nullptr, c.made);
+        if (c.made) {
+            EXPECT_EQ(made.component->state(), c.state);
+        }
+        ASSERT_EQ(host_.instances().size(), i + 1);
+        EXPECT_CODE(host_.instances()[i].error, c.code);
     }
-    ASSERT_EQ(made.component != nullptr, c.made);
-    if (c.made) {
-        EXPECT_EQ(made.component->state(), c.state);
-    }
-    ASSERT_EQ(host_.instances().size(), 1u);
-    EXPECT_CODE(host_.instances()[0].error, c.code);
 }
-
-INSTANTIATE_TEST_SUITE_P(
-    Steps, ComponentHostFailureTest,
-    ::testing::Values(
-        FailureCase{"UnknownId", "rec", "@test:/unknown", trelm::kSuccess, false,
-                    Component::State::Created, trelm::kNotFound, 0},
-        FailureCase{"NameTakenByABuiltin", "RuntimeConfiguration", "@test:/recording",
-                    trelm::kSuccess, true, Component::State::Created, trelm::kFailure,
-                    trelm::kInvalid},
-        FailureCase{"StartupRefused", "rec", "@test:/recording", trelm::kNotSignedIn, true,
-                    Component::State::Configured, trelm::kFailure, trelm::kNotSignedIn}),
-    [](auto const& info) { return std::string(info.param.name); });
 
 // Components may still talk to the built-ins while they shut down.
 TEST_F(ComponentHostTest, ComponentsShutDownBeforeTheBuiltinsGo) {

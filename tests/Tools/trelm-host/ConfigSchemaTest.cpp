@@ -1,5 +1,5 @@
-// What a user reads when the configuration file holds a misspelt key, a value of the wrong type
-// or a number out of range: the file, the place, the key and what to do.
+// What a user reads when the configuration file is malformed or holds a misspelt key, a value of
+// the wrong type or a number out of range: the file, the place, the key and what to do.
 #include <string>
 #include <vector>
 
@@ -17,36 +17,52 @@ std::string source(std::string const& config) {
            "}]}";
 }
 
-TEST(ConfigSchemaTest, BadValuesAreRefusedByNameWithWhatToDo) {
+// Every mistake is refused with kInvalid, the file and the place, and the output is left alone.
+TEST(ConfigSchemaTest, BadFilesAreRefusedByPlaceWithWhatToDo) {
     struct Case {
-        char const* name;
         std::string text;
         std::vector<std::string> said;
     };
     std::vector<Case> const cases = {
-        {"a flag given as text", source(R"({"haveExtendedApi": "yes"})"),
+        {R"({"components": [)", {"JSON"}},
+        {R"([1, 2])", {"top level"}},
+        {R"({"htpp": {}})", {"htpp: unknown section"}},
+        {R"({"components": {}})", {"components: must be a list"}},
+        {R"({"components": [{"id": "@x:/a"}]})", {"components[0]: needs a non-empty string \"name\""}},
+        {R"({"components": [{"name": "a", "id": ""}]})", {"components[0]: needs a non-empty string \"id\""}},
+        {R"({"components": [{"name": "a", "id": "@x:/a", "confg": {}}]})", {"unknown field \"confg\""}},
+        {R"({"components": [{"name": "a", "id": "@x:/a"}, {"name": "a", "id": "@x:/b"}]})",
+         {"components[1]: a component named \"a\" already exists"}},
+        {R"({"components": [{"name": "a", "id": "@x:/a", "config": {"n": 1.5}}]})",
+         {"components[0].config.n: numbers must be integers"}},
+        {R"({"http": {"ca_file": null}})", {"http.ca_file: unsupported value"}},
+        {R"({"runtime": {"path": {"a": 1}}})", {"runtime.path: unsupported value"}},
+        {R"({"http": {"connect_to": ["a", 1]}})", {"http.connect_to: lists may hold strings only"}},
+        {R"({"http": {"timeout_ms": 18446744073709551615}})", {"http.timeout_ms: integer out of range"}},
+        {R"({"components": [{"name": "a", "id": "@x:/a", "runtime_keys": "k"}]})",
+         {"components[0].runtime_keys: must be a list of strings"}},
+        // The plug-in's own keys: a value of the wrong type, a misspelt key, a number out of range.
+        {source(R"({"haveExtendedApi": "yes"})"),
          {"conf.json: components[0].config.haveExtendedApi must be true or false, not \"yes\""}},
-        {"a misspelt key", source(R"({"facebook_source_pasword": "x"})"),
+        {source(R"({"facebook_source_pasword": "x"})"),
          {"unknown key \"facebook_source_pasword\"; did you mean \"facebook_source_password\"?"}},
-        {"a key of another section", R"({"http": {"http.timeout": 5}})",
-         {"conf.json: http: unknown key \"http.timeout\"", "timeout_ms"}},
-        {"a number out of range", R"({"http": {"timeout_ms": -5}})",
-         {"http.timeout_ms must be between 1 and 3600000, not -5"}},
-        {"a number given as text",
-         R"({"components": [{"name": "c", "id": "@trelm.example:/facebookconnector", "config": {"facebook_polltime": "300"}}]})",
+        {R"({"http": {"http.timeout": 5}})", {"conf.json: http: unknown key \"http.timeout\"", "timeout_ms"}},
+        {R"({"http": {"timeout_ms": -5}})", {"http.timeout_ms must be between 1 and 3600000, not -5"}},
+        {R"({"components": [{"name": "c", "id": "@trelm.example:/facebookconnector", "config": {"facebook_polltime": "300"}}]})",
          {"components[0].config.facebook_polltime must be a whole number, not \"300\""}},
-        {"a list given as text", source(R"({"wipeComponents": "store"})"),
-         {"wipeComponents must be a list of texts"}},
-        {"a login given as a number", source(R"({"facebook_source_login": 42})"),
-         {"facebook_source_login must be a text in quotes"}},
+        {source(R"({"wipeComponents": "store"})"), {"wipeComponents must be a list of texts"}},
+        {source(R"({"facebook_source_login": 42})"), {"facebook_source_login must be a text in quotes"}},
     };
     for (Case const& c : cases) {
-        SCOPED_TRACE(c.name);
+        SCOPED_TRACE(c.text);
         HostConfig config;
+        ASSERT_OK(HostConfig::parse(R"({"components": [{"name": "keep", "id": "@x:/k"}]})", "t", config));
         trelm::uError e = HostConfig::parse(c.text, "conf.json", config);
         ASSERT_CODE(e, trelm::kInvalid);
+        EXPECT_NE(e.message().str().find("conf.json: "), std::string::npos) << e;
         for (std::string const& words : c.said) EXPECT_NE(e.message().str().find(words), std::string::npos) << e;
-        EXPECT_TRUE(config.components().empty()) << "a refused file changes nothing";
+        ASSERT_EQ(config.components().size(), 1u) << "a refused file changes nothing";
+        EXPECT_EQ(config.components()[0].name, "keep");
     }
 }
 

@@ -7,24 +7,18 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
-#include <map>
-#include <set>
-#include <memory>
 #include <ostream>
+#include <set>
 #include <string>
 #include <vector>
 
-#include <gtest/gtest.h>
-#include <nlohmann/json.hpp>
-
-#include "Emulator.h"
-#include "ProgramRunner.h"
+#include "EmulatedHost.h"
 
 using nlohmann::json;
 
 namespace {
 
-using Row = std::map<std::string, std::string>;
+using Row = emu::test::Row;
 
 constexpr char const* kDemoUser = "100000001";
 
@@ -47,60 +41,20 @@ std::string configWithPassword(std::string const& password, std::string const& l
 
 class HostCommandsTest : public ::testing::Test {
 protected:
-    void SetUp() override {
-        emu::Emulator::Options options;
-        options.threads = 4;
-        emulator_ = std::make_unique<emu::Emulator>(options);
-        std::string error;
-        ASSERT_TRUE(emulator_->start(error)) << error;
-        useConfig(configWithPassword(emu::DemoAccount::password));
-    }
+    void SetUp() override { useConfig(configWithPassword(emu::DemoAccount::password)); }
+    void useConfig(std::string const& text) { h.useConfig(text); }
+    std::string stateDir() const { return h.stateDir(); }
 
-    void useConfig(std::string const& text) { config_ = runner_.writeFile("config.json", text); }
-    std::string stateDir() const { return runner_.folder() + "/state"; }
-
-    // Runs the host against the test's emulator with JSON-lines output. No password may show.
     ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& input = {},
                                int signal = 0, int afterMs = 0, bool* signalled = nullptr) {
-        std::vector<std::string> args{
-            "--format", "json", "--state-dir", stateDir(), "--no-emulator",
-            "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
-            "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
-            "--ca-file", emulator_->caFile(), "--config", config_, "--plugin", TRELMFACEBOOK_MODULE};
-        args.insert(args.end(), command.begin(), command.end());
-        ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args, input, signal, afterMs, signalled);
-        for (std::string const& text : {result.out, result.err}) {
-            EXPECT_EQ(text.find(emu::DemoAccount::password), std::string::npos) << text;
-            EXPECT_EQ(text.find("rows/s"), std::string::npos) << "no progress line off a terminal";
-        }
+        ProgramRunner::Result result = h.run(command, "json", input, signal, afterMs, signalled);
+        EXPECT_EQ(result.err.find("rows/s"), std::string::npos) << "no progress line off a terminal";
         return result;
     }
+    std::vector<Row> fql(std::string const& query) { return h.fql(query); }
+    std::vector<emu::LoggedRequest> requests(std::string const& method) { return h.requests(method); }
 
-
-    // What the service holds, read as the demo user; nested columns become "parent.child".
-    std::vector<Row> fql(std::string const& query) {
-        emu::XmlNode root("fql_query_response");
-        emu::Status status = emulator_->store().fqlQuery(emu::DemoAccount::uid, query, root);
-        EXPECT_FALSE(status.has_value()) << query << ": " << status->message;
-        std::vector<Row> rows;
-        for (emu::XmlNode const& element : root.children) {
-            Row row;
-            for (emu::XmlNode const& field : element.children) {
-                row[field.name] = field.text;
-                for (emu::XmlNode const& part : field.children) row[field.name + "." + part.name] = part.text;
-            }
-            rows.push_back(row);
-        }
-        return rows;
-    }
-
-    std::vector<emu::LoggedRequest> requests(std::string const& method) {
-        return emulator_->log().entriesFor(method);
-    }
-
-    ProgramRunner runner_;
-    std::unique_ptr<emu::Emulator> emulator_;
-    std::string config_;
+    EmulatedHost h;
 };
 
 TEST_F(HostCommandsTest, DemoTourListsTheFriendsPostsUploadsAndFetchesTheFirstFriendAgain) {
@@ -172,7 +126,7 @@ TEST_F(HostCommandsTest, StoredSessionIsReusedAndAForgottenOneCostsExactlyOneLog
     std::string const session = requests("fql.query").back().args["session_key"];
     ASSERT_FALSE(session.empty());
 
-    emulator_->log().clear();
+    h.emulator->log().clear();
     auto second = host({"query", "contacts", "--limit", "1"});
     ASSERT_EQ(second.exitCode, 0) << second.err;
     EXPECT_TRUE(requests("auth.login").empty());
@@ -187,8 +141,8 @@ TEST_F(HostCommandsTest, StoredSessionIsReusedAndAForgottenOneCostsExactlyOneLog
     ASSERT_EQ(after.size(), 1u);
     EXPECT_EQ(after[0]["fields"]["core_contact_service_id"], before[0]["fields"]["core_contact_service_id"]);
 
-    emulator_->sessions().remove(session);
-    emulator_->log().clear();
+    h.emulator->sessions().remove(session);
+    h.emulator->log().clear();
     auto third = host({"query", "contacts", "--limit", "3"});
     ASSERT_EQ(third.exitCode, 0) << third.err;
     EXPECT_EQ(requests("auth.login").size(), 1u);
@@ -221,7 +175,7 @@ TEST_F(HostCommandsTest, ShellFetchesRecordsOfTheLastListingAgain) {
 }
 
 TEST_F(HostCommandsTest, InsertedPhotoArrivesWithItsCaption) {
-    std::string const image = runner_.writeFile("image.png", std::string("\x89PNG\r\n\x1a\n", 8) + "not really");
+    std::string const image = h.runner.writeFile("image.png", std::string("\x89PNG\r\n\x1a\n", 8) + "not really");
     auto result = host({"insert", "photo", image, "--caption", "Harbour at dusk"});
     ASSERT_EQ(result.exitCode, 0) << result.err;
     auto inserted = linesOfType(result, "inserted");
@@ -307,7 +261,7 @@ class StoppedSignInTest : public HostCommandsTest, public ::testing::WithParamIn
 TEST_P(StoppedSignInTest, LeavesNeitherPasswordNorApplicationSecretInTheStateFolder) {
     emu::FaultRule slowLogin;
     slowLogin.delayMs = 3000;
-    emulator_->faults().set("auth.login", slowLogin);
+    h.emulator->faults().set("auth.login", slowLogin);
     bool signalled = false;
     host({"query", "contacts"}, {}, GetParam(), 1500, &signalled);
     ASSERT_TRUE(signalled) << "the host ended before it could be stopped during its sign-in";
@@ -337,7 +291,7 @@ TEST_F(HostCommandsTest, ChangedLoginSignsTheNewAccountInInsteadOfUsingTheStored
     ASSERT_EQ(requests("auth.login").size(), 1u);
 
     useConfig(configWithPassword(emu::SecondAccount::password, emu::SecondAccount::email));
-    emulator_->log().clear();
+    h.emulator->log().clear();
     auto other = host({"insert", "status", "posted by the second account"});
     ASSERT_EQ(other.exitCode, 0) << other.err;
     auto logins = linesOfType(other, "login");
@@ -362,16 +316,13 @@ TEST_F(HostCommandsTest, ThrottledOrUnavailableServiceIsWaitedOutAndTheListingCo
                           Case{"request limit", "*:rate=4,burst=3"}}) {
         SCOPED_TRACE(c.name);
         emu::Emulator::Options options;
-        options.threads = 4;
         options.generator.users = 2500;
         options.generator.demoFriends = 1000;
-        emulator_ = std::make_unique<emu::Emulator>(options);
-        std::string error;
-        ASSERT_TRUE(emulator_->start(error)) << error;
-        std::string method;
+        h.restart(options);
+        std::string method, error;
         emu::FaultRule rule;
         ASSERT_TRUE(emu::Faults::parse(c.fault, method, rule, error)) << error;
-        emulator_->faults().set(method, rule);
+        h.emulator->faults().set(method, rule);
         std::filesystem::remove_all(stateDir());
 
         auto result = host({"query", "contacts", "--all", "--retries", "20", "--retry-time", "120"});
@@ -383,7 +334,7 @@ TEST_F(HostCommandsTest, ThrottledOrUnavailableServiceIsWaitedOutAndTheListingCo
         EXPECT_EQ(ids.size(), 1000u);
         EXPECT_NE(result.err.find("trying again in"), std::string::npos) << result.err;
         int refused = 0;
-        for (emu::LoggedRequest const& r : emulator_->log().entries()) refused += r.errorCode == 2 || r.errorCode == 4;
+        for (emu::LoggedRequest const& r : h.emulator->log().entries()) refused += r.errorCode == 2 || r.errorCode == 4;
         EXPECT_GT(refused, 0) << "the fault was hit";
     }
 }

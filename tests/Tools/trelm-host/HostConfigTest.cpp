@@ -1,4 +1,3 @@
-#include <ostream>
 #include <string>
 
 #include <cstdio>
@@ -50,60 +49,6 @@ TEST(HostConfigTest, EmptyDocumentNamesNoEndpointAndNoComponents) {
     EXPECT_FALSE(config.namesEndpoint());
     EXPECT_TRUE(config.components().empty());
 }
-
-struct BadConfig {
-    char const* name;
-    char const* text;
-    char const* place;  // expected in the message
-};
-
-void PrintTo(BadConfig const& c, std::ostream* os) { *os << c.name; }
-
-class HostConfigRejectTest : public ::testing::TestWithParam<BadConfig> {};
-
-// Every mistake is refused with kInvalid and the place, and the output is left alone.
-TEST_P(HostConfigRejectTest, IsRefusedWithThePlace) {
-    HostConfig config;
-    ASSERT_OK(HostConfig::parse(R"({"components": [{"name": "keep", "id": "@x:/k"}]})", "t", config));
-    trelm::uError e = HostConfig::parse(GetParam().text, "file.json", config);
-    EXPECT_CODE(e, trelm::kInvalid);
-    std::string message = e.message().str();
-    EXPECT_NE(message.find("file.json: "), std::string::npos) << message;
-    EXPECT_NE(message.find(GetParam().place), std::string::npos) << message;
-    ASSERT_EQ(config.components().size(), 1u);
-    EXPECT_EQ(config.components()[0].name, "keep");
-}
-
-INSTANTIATE_TEST_SUITE_P(
-    Mistakes, HostConfigRejectTest,
-    ::testing::Values(
-        BadConfig{"MalformedJson", R"({"components": [)", "JSON"},
-        BadConfig{"NotAnObject", R"([1, 2])", "top level"},
-        BadConfig{"UnknownSection", R"({"htpp": {}})", "htpp: unknown section"},
-        BadConfig{"ComponentsNotAList", R"({"components": {}})", "components: must be a list"},
-        BadConfig{"ComponentWithoutName", R"({"components": [{"id": "@x:/a"}]})",
-                  "components[0]: needs a non-empty string \"name\""},
-        BadConfig{"ComponentWithEmptyId", R"({"components": [{"name": "a", "id": ""}]})",
-                  "components[0]: needs a non-empty string \"id\""},
-        BadConfig{"MisspelledField",
-                  R"({"components": [{"name": "a", "id": "@x:/a", "confg": {}}]})",
-                  "unknown field \"confg\""},
-        BadConfig{"DuplicateName",
-                  R"({"components": [{"name": "a", "id": "@x:/a"}, {"name": "a", "id": "@x:/b"}]})",
-                  "components[1]: a component named \"a\" already exists"},
-        BadConfig{"FractionalNumber",
-                  R"({"components": [{"name": "a", "id": "@x:/a", "config": {"n": 1.5}}]})",
-                  "components[0].config.n: numbers must be integers"},
-        BadConfig{"NullValue", R"({"http": {"ca_file": null}})", "http.ca_file: unsupported value"},
-        BadConfig{"NestedObject", R"({"runtime": {"path": {"a": 1}}})", "runtime.path: unsupported value"},
-        BadConfig{"MixedList", R"({"http": {"connect_to": ["a", 1]}})",
-                  "http.connect_to: lists may hold strings only"},
-        BadConfig{"HugeInteger", R"({"http": {"timeout_ms": 18446744073709551615}})",
-                  "http.timeout_ms: integer out of range"},
-        BadConfig{"RuntimeKeysNotAList",
-                  R"({"components": [{"name": "a", "id": "@x:/a", "runtime_keys": "k"}]})",
-                  "components[0].runtime_keys: must be a list of strings"}),
-    [](auto const& info) { return std::string(info.param.name); });
 
 // A missing file and one too large to be a configuration are named (folders and devices: in the
 // program's tests).

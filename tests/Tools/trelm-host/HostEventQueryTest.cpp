@@ -9,6 +9,7 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
+#include "EmulatorRows.h"
 #include "ProgramRunner.h"
 #include "Store.h"
 #include "XmlNode.h"
@@ -18,7 +19,7 @@ using nlohmann::json;
 
 namespace {
 
-using Row = std::map<std::string, std::string>;
+using Row = emu::test::Row;
 using Expected = std::map<std::string, json>;  // keys a listed record must show, with their values
 
 std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
@@ -36,16 +37,7 @@ protected:
         store = nullptr;
     }
 
-    static std::vector<Row> fql(std::string const& query) {
-        emu::XmlNode root("fql_query_response");
-        EXPECT_FALSE(store->fqlQuery(emu::DemoAccount::uid, query, root).has_value()) << query;
-        std::vector<Row> rows;
-        for (emu::XmlNode const& element : root.children) {
-            rows.emplace_back();
-            for (emu::XmlNode const& field : element.children) rows.back()[field.name] = field.text;
-        }
-        return rows;
-    }
+    static std::vector<Row> fql(std::string const& query) { return emu::test::fqlRows(*store, emu::DemoAccount::uid, query); }
     static std::string nameOf(std::string const& uid) { return fql("select name from user where uid = " + uid).at(0)["name"]; }
 
     // The first five status posts of the stream from `endTime` down (0: the newest).

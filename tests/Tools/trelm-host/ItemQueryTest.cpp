@@ -1,5 +1,4 @@
 #include <optional>
-#include <ostream>
 #include <string>
 #include <vector>
 
@@ -25,64 +24,51 @@ namespace {
 
 ItemQuery contacts() { return ItemQuery(*ItemQuery::findKind("contacts")); }
 
-struct ConditionCase {
-    char const* name;
-    char const* text;
-    char const* key;
-    Types::TYPES type;
-    Constraint::Function function;
-    Variant value;
-};
-
-void PrintTo(ConditionCase const& c, std::ostream* os) { *os << c.name; }
-
-class ConditionTest : public ::testing::TestWithParam<ConditionCase> {};
-
-// The condition follows the type the key was registered with: a number compared as text (or
-// text as a number) would make the source's cursors refuse or misread it.
-TEST_P(ConditionTest, BecomesAConstraintOfTheKeysType) {
-    ConditionCase const& c = GetParam();
-    ItemQuery query = contacts();
-    ASSERT_CODE(query.where(c.text), trelm::kSuccess);
-    trelm::IQueryItems::StartQueryMessage msg;
-    ASSERT_CODE(query.fill(msg), trelm::kSuccess);
-    ASSERT_EQ(msg.constraints.size(), 2u);
-    EXPECT_EQ(msg.constraints[0].key.name(), "core_object_type");
-    EXPECT_EQ(msg.constraints[0].value, Variant(2));
-    Constraint const& added = msg.constraints[1];
-    EXPECT_EQ(added.key.name(), c.key);
-    EXPECT_EQ(added.key.type(), c.type);
-    EXPECT_EQ(added.function, c.function);
-    EXPECT_EQ(added.value, c.value);
-}
-
 GUID const kGuid = [] {
     GUID g;
     (void)GUID::fromString("0f1e2d3c-4b5a-4978-8695-a4b3c2d1e0f9", g);
     return g;
 }();
 
-using C = ConditionCase;
-using F = Constraint::Function;
-
-INSTANTIATE_TEST_SUITE_P(
-    Conditions, ConditionTest,
-    ::testing::Values(
-        C{"TextEqual", "core_contact_name=Anna Moreau", "core_contact_name", Types::STRING, F::Equal,
-          Variant("Anna Moreau")},
-        C{"TimeAtLeast", "core_object_time>=1000", "core_object_time", Types::INT32, F::GreaterOrEqual, Variant(1000)},
-        C{"TimeBelowNegative", "core_object_time<-5", "core_object_time", Types::INT32, F::LessThan, Variant(-5)},
-        C{"NotEqual", "core_contact_service!=Facebook", "core_contact_service", Types::STRING, F::NotEqual,
-          Variant("Facebook")},
-        C{"IdList", "core_contact_service_id=12,34", "core_contact_service_id", Types::STRING, F::InList,
-          Variant(Vector<String>{"12", "34"})},
-        C{"TypeList", "core_object_type=2,11", "core_object_type", Types::INT32, F::InList,
-          Variant(Vector<int>{2, 11})},
-        C{"Guid", "core_object_id=0F1E2D3C-4B5A-4978-8695-A4B3C2D1E0F9", "core_object_id", Types::GUID_TYPE, F::Equal,
-          Variant(kGuid)},
-        C{"UnregisteredKeyIsText", "no_such_key<=7", "no_such_key", Types::STRING, F::LessOrEqual, Variant("7")},
-        C{"EqualSignInTheValue", "core_event_text=a=b", "core_event_text", Types::STRING, F::Equal, Variant("a=b")}),
-    [](auto const& info) { return std::string(info.param.name); });
+// The condition follows the type the key was registered with: a number compared as text (or
+// text as a number) would make the source's cursors refuse or misread it.
+TEST(ConditionTest, BecomesAConstraintOfTheKeysType) {
+    using F = Constraint::Function;
+    struct Case {
+        char const* text;
+        char const* key;
+        Types::TYPES type;
+        F function;
+        Variant value;
+    } const cases[] = {
+        {"core_contact_name=Anna Moreau", "core_contact_name", Types::STRING, F::Equal, Variant("Anna Moreau")},
+        {"core_object_time>=1000", "core_object_time", Types::INT32, F::GreaterOrEqual, Variant(1000)},
+        {"core_object_time<-5", "core_object_time", Types::INT32, F::LessThan, Variant(-5)},
+        {"core_contact_service!=Facebook", "core_contact_service", Types::STRING, F::NotEqual, Variant("Facebook")},
+        {"core_contact_service_id=12,34", "core_contact_service_id", Types::STRING, F::InList,
+         Variant(Vector<String>{"12", "34"})},
+        {"core_object_type=2,11", "core_object_type", Types::INT32, F::InList, Variant(Vector<int>{2, 11})},
+        {"core_object_id=0F1E2D3C-4B5A-4978-8695-A4B3C2D1E0F9", "core_object_id", Types::GUID_TYPE, F::Equal,
+         Variant(kGuid)},
+        {"no_such_key<=7", "no_such_key", Types::STRING, F::LessOrEqual, Variant("7")},  // unregistered: text
+        {"core_event_text=a=b", "core_event_text", Types::STRING, F::Equal, Variant("a=b")},
+    };
+    for (auto const& c : cases) {
+        SCOPED_TRACE(c.text);
+        ItemQuery query = contacts();
+        ASSERT_CODE(query.where(c.text), trelm::kSuccess);
+        trelm::IQueryItems::StartQueryMessage msg;
+        ASSERT_CODE(query.fill(msg), trelm::kSuccess);
+        ASSERT_EQ(msg.constraints.size(), 2u);
+        EXPECT_EQ(msg.constraints[0].key.name(), "core_object_type");
+        EXPECT_EQ(msg.constraints[0].value, Variant(2));
+        Constraint const& added = msg.constraints[1];
+        EXPECT_EQ(added.key.name(), c.key);
+        EXPECT_EQ(added.key.type(), c.type);
+        EXPECT_EQ(added.function, c.function);
+        EXPECT_EQ(added.value, c.value);
+    }
+}
 
 TEST(ConditionRejectTest, MalformedConditionsAreInvalidAndAddNothing) {
     struct Bad {
@@ -182,44 +168,36 @@ private:
     int position_ = 5;  // not at the beginning: the walk must go there itself
 };
 
-struct WalkCase {
-    char const* name;
-    int rows;
-    unsigned skip;
-    std::optional<unsigned> limit;
-    std::vector<int> listed;
-    unsigned code = trelm::kSuccess;
-    int failAt = -1;
-};
-
-void PrintTo(WalkCase const& c, std::ostream* os) { *os << c.name; }
-
-class WalkTest : public ::testing::TestWithParam<WalkCase> {};
-
-TEST_P(WalkTest, ListsTheRowsBetweenSkipAndLimit) {
-    WalkCase const& c = GetParam();
-    ItemQuery query = contacts();
-    query.skip = c.skip;
-    query.limit = c.limit;
-    StepCursor cursor(c.rows, c.failAt);
-    std::vector<ItemQuery::Record> rows;
-    EXPECT_CODE(query.walk(cursor, rows), c.code);
-    std::vector<int> listed;
-    for (auto const& row : rows) listed.push_back(row.search("n")->asInt32());
-    EXPECT_EQ(listed, c.listed);
+TEST(WalkTest, ListsTheRowsBetweenSkipAndLimit) {
+    struct Case {
+        char const* name;
+        int rows;
+        unsigned skip;
+        std::optional<unsigned> limit;
+        std::vector<int> listed;
+        unsigned code = trelm::kSuccess;
+        int failAt = -1;
+    } const cases[] = {
+        {"first page", 5, 0, 3, {0, 1, 2}},
+        {"limit beyond the end", 3, 0, 10, {0, 1, 2}},
+        {"skip then limit", 10, 4, 3, {4, 5, 6}},
+        {"skip to the last row", 5, 4, std::nullopt, {4}},
+        {"skip past the end", 5, 5, std::nullopt, {}},
+        {"empty result", 0, 0, std::nullopt, {}},
+        {"zero limit", 5, 0, 0u, {}},
+        {"a failure keeps the rows before", 5, 0, std::nullopt, {0, 1}, trelm::kServiceUnavailable, 2},
+    };
+    for (auto const& c : cases) {
+        ItemQuery query = contacts();
+        query.skip = c.skip;
+        query.limit = c.limit;
+        StepCursor cursor(c.rows, c.failAt);
+        std::vector<ItemQuery::Record> rows;
+        EXPECT_CODE(query.walk(cursor, rows), c.code) << c.name;
+        std::vector<int> listed;
+        for (auto const& row : rows) listed.push_back(row.search("n")->asInt32());
+        EXPECT_EQ(listed, c.listed) << c.name;
+    }
 }
-
-INSTANTIATE_TEST_SUITE_P(
-    Walks, WalkTest,
-    ::testing::Values(WalkCase{"FirstPage", 5, 0, 3, {0, 1, 2}},
-                      WalkCase{"LimitBeyondTheEnd", 3, 0, 10, {0, 1, 2}},
-                      WalkCase{"SkipThenLimit", 10, 4, 3, {4, 5, 6}},
-                      WalkCase{"SkipToTheLastRow", 5, 4, std::nullopt, {4}},
-                      WalkCase{"SkipPastTheEnd", 5, 5, std::nullopt, {}},
-                      WalkCase{"EmptyResult", 0, 0, std::nullopt, {}},
-                      WalkCase{"ZeroLimit", 5, 0, 0u, {}},
-                      WalkCase{"FailureKeepsTheRowsBefore", 5, 0, std::nullopt, {0, 1},
-                               trelm::kServiceUnavailable, 2}),
-    [](auto const& info) { return std::string(info.param.name); });
 
 }  // namespace

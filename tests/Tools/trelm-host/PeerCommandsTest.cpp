@@ -3,17 +3,10 @@
 // emulator's request log and data.
 #include <algorithm>
 #include <fstream>
-#include <map>
-#include <memory>
 #include <string>
 #include <vector>
 
-#include <gtest/gtest.h>
-#include <nlohmann/json.hpp>
-
-#include "Emulator.h"
-#include "EmulatorRows.h"
-#include "ProgramRunner.h"
+#include "EmulatedHost.h"
 
 using nlohmann::json;
 
@@ -24,66 +17,17 @@ using Row = emu::test::Row;
 constexpr char const* kDemoUser = "100000001";
 
 // The demo configuration, as scripts/demo.sh runs it.
-json demoConfig() {
-    std::ifstream file(TRELM_TEST_DATA_DIR "/../../Tools/trelm-host/demo.json");
-    return json::parse(file);
-}
+json demoConfig() { return json::parse(std::ifstream(TRELM_DEMO_CONFIG)); }
 
 class PeerCommandsTest : public ::testing::Test {
 protected:
-    void SetUp() override {
-        emu::Emulator::Options options;
-        options.threads = 4;
-        emulator_ = std::make_unique<emu::Emulator>(options);
-        std::string error;
-        ASSERT_TRUE(emulator_->start(error)) << error;
-        useConfig(demoConfig());
-    }
-
-    void useConfig(json const& config) { config_ = runner_.writeFile("config.json", config.dump(2)); }
-
     ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& format = "json") {
-        std::vector<std::string> args{"--format",
-                                      format,
-                                      "--state-dir",
-                                      runner_.folder() + "/state",
-                                      "--no-emulator",
-                                      "--connect-to",
-                                      "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
-                                      "--connect-to",
-                                      "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
-                                      "--ca-file",
-                                      emulator_->caFile(),
-                                      "--config",
-                                      config_,
-                                      "--plugin",
-                                      TRELMFACEBOOK_MODULE};
-        args.insert(args.end(), command.begin(), command.end());
-        ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args);
-        for (std::string const& text : {result.out, result.err}) {
-            EXPECT_EQ(text.find(emu::DemoAccount::password), std::string::npos) << text;
-        }
-        return result;
+        return h.run(command, format);
     }
+    std::vector<Row> fql(std::string const& query) { return h.fql(query); }
+    std::vector<emu::LoggedRequest> requests(std::string const& method) { return h.requests(method); }
 
-    static std::vector<json> linesOfType(ProgramRunner::Result const& result, std::string const& type) {
-        std::vector<json> lines;
-        for (std::string const& line : result.outLines()) {
-            json object = json::parse(line);
-            if (object.at("type") == type) lines.push_back(object);
-        }
-        return lines;
-    }
-
-    std::vector<Row> fql(std::string const& query) {
-        return emu::test::fqlRows(emulator_->store(), emu::DemoAccount::uid, query);
-    }
-
-    std::vector<emu::LoggedRequest> requests(std::string const& method) { return emulator_->log().entriesFor(method); }
-
-    ProgramRunner runner_;
-    std::unique_ptr<emu::Emulator> emulator_;
-    std::string config_;
+    EmulatedHost h;
 };
 
 TEST_F(PeerCommandsTest, PeersListsEveryFriendWithProfileFromTwoRequests) {
@@ -107,7 +51,7 @@ TEST_F(PeerCommandsTest, PeersListsEveryFriendWithProfileFromTwoRequests) {
     EXPECT_EQ(listed, expected);
     EXPECT_EQ(linesOfType(result, "peers").at(0)["count"], expected.size());
     EXPECT_EQ(requests("friends.get").size() + requests("users.getInfo").size(), 2u);
-    EXPECT_EQ(emulator_->log().total(), 3u) << "one login, and the data source sent nothing";
+    EXPECT_EQ(h.emulator->log().total(), 3u) << "one login, and the data source sent nothing";
 }
 
 // One friend with a status, one who never set one, asked for in one request; the table shows the
@@ -177,7 +121,7 @@ TEST_F(PeerCommandsTest, ConnectionFailuresEndTheCommandWithTheReason) {
         json config = demoConfig();
         json& connector = config.at("components").at(1).at("config");
         c.value ? void(connector[c.key] = c.value) : void(connector.erase(c.key));
-        useConfig(config);
+        h.useConfig(config.dump());
         auto result = host(c.command);
         EXPECT_EQ(result.exitCode, 3) << result.out << result.err;
         EXPECT_NE(result.err.find(c.says), std::string::npos) << result.err;

@@ -40,7 +40,7 @@ protected:
         ASSERT_TRUE(emulator_->start(error)) << error;
     }
 
-    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& config = TRELM_HOST_DEMO_CONFIG,
+    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& config = TRELM_DEMO_CONFIG,
                                int signal = 0, int afterMs = 0, ProgramRunner const* runner = nullptr) {
         std::vector<std::string> args{
             "--format", "json", "--state-dir", runner_.folder() + "/state", "--no-emulator",
@@ -159,7 +159,7 @@ TEST_F(SyncCommandTest, FirstSyncStoresEveryItemOnceAndTheSecondChangesNothingAn
     // other's passes.
     ProgramRunner otherRunner;
     auto other = std::async(std::launch::async,
-                            [&] { return host({"sync"}, TRELM_HOST_DEMO_CONFIG, 0, 0, &otherRunner); });
+                            [&] { return host({"sync"}, TRELM_DEMO_CONFIG, 0, 0, &otherRunner); });
     ProgramRunner::Result second = host({"sync"});
     ProgramRunner::Result const third = other.get();
     ASSERT_EQ(second.exitCode, 0) << second.err;
@@ -242,7 +242,7 @@ TEST_P(InterruptedSyncTest, NextSyncAsksOnlyForTheWindowsNotCommittedAndStoresEa
         rule.errorCode = 1;
     }
     fault("fql.query", rule);
-    ProgramRunner::Result stopped = host({"sync", "contacts"}, TRELM_HOST_DEMO_CONFIG, GetParam().kill ? SIGKILL : 0, 1500);
+    ProgramRunner::Result stopped = host({"sync", "contacts"}, TRELM_DEMO_CONFIG, GetParam().kill ? SIGKILL : 0, 1500);
     EXPECT_NE(stopped.exitCode, 0);
     std::map<std::string, json> const committed = stored("contacts");
     if (!GetParam().kill) {
@@ -331,7 +331,7 @@ TEST_F(SyncCommandTest, AnotherPersonsSignInWipesTheStoreAndTheSameOneAgainDoesN
     ASSERT_EQ(host({"sync", "contacts"}).exitCode, 0);
     std::size_t const demoContacts = stored("contacts").size();
 
-    std::ifstream in(TRELM_HOST_DEMO_CONFIG);
+    std::ifstream in(TRELM_DEMO_CONFIG);
     json config = json::parse(in);
     config["components"][0]["config"]["facebook_source_login"] = emu::SecondAccount::email;
     config["components"][0]["config"]["facebook_source_password"] = emu::SecondAccount::password;

@@ -5,7 +5,6 @@
 #include <fstream>
 #include <functional>
 #include <map>
-#include <ostream>
 #include <sstream>
 #include <string>
 
@@ -133,52 +132,59 @@ TEST(FqlParseObjTest, NestedFieldsAreDottedNilFieldsAbsentEmptyFieldsEmpty) {
               }));
 }
 
-// Rows follow what the output already held; skipped rows and rows of other tables are not returned.
-struct RowsCase {
-    char const* file;
-    char const* table;
-    unsigned skip;
-    unsigned count;  // rows of the table in the answer, skipped ones included
-    std::vector<std::string> uids;
-};
-
-void PrintTo(RowsCase const& c, std::ostream* os) { *os << c.file << " " << c.table << " skip " << c.skip; }
-
-class FqlParseObjRowsTest : public ::testing::TestWithParam<RowsCase> {};
-
-TEST_P(FqlParseObjRowsTest, SkippedRowsAreCountedButNotReturned) {
-    RowsCase const& c = GetParam();
-    Rows rows{Map<String, String>{{"earlier", "row"}}};
-    unsigned count = 99;
-    ASSERT_OK(FqlParseObj("fql_query_response", c.table, c.skip).parse(loadXml(c.file), rows, count));
-    EXPECT_EQ(count, c.count);
-    ASSERT_FALSE(rows.empty());
-    EXPECT_EQ(rows[0].map(), (Row{{"earlier", "row"}}));
-    std::vector<std::string> uids;
-    for (unsigned i = 1; i < rows.size(); ++i) uids.push_back(rows[i].search("uid")->str());
-    EXPECT_EQ(uids, c.uids);
+// Rows follow what the output already held; skipped rows and rows of other tables are counted
+// (those of the table only) but not returned.
+TEST(FqlParseObjTest, SkippedRowsAreCountedButNotReturned) {
+    struct Case {
+        char const* file;
+        char const* table;
+        unsigned skip;
+        unsigned count;
+        std::vector<std::string> uids;
+    } const cases[] = {
+        {"fql_query_response_users.xml", "user", 0, 3, {"1001", "1002", "1003"}},
+        {"fql_query_response_users.xml", "user", 1, 3, {"1002", "1003"}},
+        {"fql_query_response_users.xml", "user", 3, 3, {}},
+        {"fql_query_response_users.xml", "user", 7, 3, {}},
+        {"fql_query_response_users.xml", "photo", 0, 0, {}},
+        {"fql_query_response_empty.xml", "user", 0, 0, {}},
+    };
+    for (Case const& c : cases) {
+        SCOPED_TRACE(std::string(c.file) + " " + c.table + " skip " + std::to_string(c.skip));
+        Rows rows{Map<String, String>{{"earlier", "row"}}};
+        unsigned count = 99;
+        ASSERT_OK(FqlParseObj("fql_query_response", c.table, c.skip).parse(loadXml(c.file), rows, count));
+        EXPECT_EQ(count, c.count);
+        ASSERT_FALSE(rows.empty());
+        EXPECT_EQ(rows[0].map(), (Row{{"earlier", "row"}}));
+        std::vector<std::string> uids;
+        for (unsigned i = 1; i < rows.size(); ++i) uids.push_back(rows[i].search("uid")->str());
+        EXPECT_EQ(uids, c.uids);
+    }
 }
 
-char const* const kUsers = "fql_query_response_users.xml";
-
-INSTANTIATE_TEST_SUITE_P(Rows, FqlParseObjRowsTest,
-                         ::testing::Values(RowsCase{kUsers, "user", 0, 3, {"1001", "1002", "1003"}},
-                                           RowsCase{kUsers, "user", 1, 3, {"1002", "1003"}},
-                                           RowsCase{kUsers, "user", 3, 3, {}}, RowsCase{kUsers, "user", 7, 3, {}},
-                                           RowsCase{kUsers, "photo", 0, 0, {}},
-                                           RowsCase{"fql_query_response_empty.xml", "user", 0, 0, {}}));
-
+// A document cut short fails, and the rows read before the cut stay.
 TEST(FqlParseObjTest, RowsReadBeforeATruncationStay) {
-    std::string whole = loadXml("fql_query_response_users.xml").str();
-    // Cut inside the third row.
-    std::string cut = whole.substr(0, whole.find("<uid>1003</uid>") + 8);
-    Rows rows;
-    unsigned count = 0;
-    FqlParseObj p("fql_query_response", "user", 0);
-    EXPECT_CODE(p.parse(String(cut), rows, count), kFailure);
-    ASSERT_EQ(rows.size(), 2u);
-    EXPECT_EQ(*rows[1].search("uid"), "1002");
-    EXPECT_EQ(count, 2u);
+    std::string const users = loadXml("fql_query_response_users.xml").str();
+    std::string const stream = loadXml("stream_get_response.xml").str();
+    struct Case {
+        char const* name;
+        std::function<uError(String const&, Rows&, unsigned&)> parse;
+        std::string cut;
+    } const cases[] = {
+        {"inside the third user",
+         [](String const& x, Rows& r, unsigned& n) { return FqlParseObj("fql_query_response", "user", 0).parse(x, r, n); },
+         users.substr(0, users.find("<uid>1003</uid>") + 8)},
+        {"before the third post", [](String const& x, Rows& r, unsigned& n) { return FStreamParseObj().parse(x, r, n); },
+         stream.substr(0, stream.find("<post_id>1004_503"))},
+    };
+    for (Case const& c : cases) {
+        Rows rows;
+        unsigned count = 0;
+        EXPECT_CODE(c.parse(String(c.cut), rows, count), kFailure) << c.name;
+        EXPECT_EQ(rows.size(), 2u) << c.name;
+        EXPECT_EQ(count, 2u) << c.name;
+    }
 }
 
 TEST(FqlParseObjTest, RepeatedNestedFieldKeepsFirstValue) {
@@ -230,17 +236,6 @@ TEST(FStreamParseObjTest, StatusPostWithNilMessageHasNoMessageField) {
                              R"(<created_time>5</created_time></stream_post></posts></stream_get_response>)"),
                       rows, count));
     EXPECT_EQ(plain(rows), (std::vector<Row>{{{"is_status", "1"}, {"post_id", "1_2"}, {"created_time", "5"}}}));
-}
-
-TEST(FStreamParseObjTest, PostsReadBeforeATruncationStay) {
-    std::string whole = loadXml("stream_get_response.xml").str();
-    std::string cut = whole.substr(0, whole.find("<post_id>1004_503"));
-    Rows rows;
-    unsigned count = 0;
-    FStreamParseObj p;
-    EXPECT_CODE(p.parse(String(cut), rows, count), kFailure);
-    EXPECT_EQ(rows.size(), 2u);
-    EXPECT_EQ(count, 2u);
 }
 
 // --- Malformed documents, every parse object ------------------------------------------------

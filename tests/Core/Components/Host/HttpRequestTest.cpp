@@ -55,35 +55,25 @@ SmartPtr<HttpRequest> newRequest(HttpRequestFactory& factory) {
 
 // --- plain HTTP ---------------------------------------------------------------------------
 
-struct StatusCase {
-    int sent;
-    bool completes;  // a 1xx status can't be a final answer
-};
-
-void PrintTo(StatusCase const& c, std::ostream* os) { *os << c.sent; }
-
-class HttpStatusTest : public ::testing::TestWithParam<StatusCase> {};
-
-TEST_P(HttpStatusTest, StatusReachesCallerAsSent) {
+// A 1xx status can't be a final answer; every other status reaches the caller as sent.
+TEST(HttpRequestTest, StatusReachesCallerAsSent) {
     LoopbackServer server;
     HttpRequestFactory factory;
     ASSERT_OK(factory.setTimeoutMs(5000));
-    SmartPtr<HttpRequest> r = newRequest(factory);
-    auto [e, status, body] = post(*r, server.url("/status/" + std::to_string(GetParam().sent)), {});
-    if (GetParam().completes) {
-        ASSERT_OK(e);
-        EXPECT_EQ(status, GetParam().sent);
-        EXPECT_EQ(body, "status " + std::to_string(GetParam().sent));
-    } else {
-        EXPECT_CODE(e, kFailure);
-        int code = 0;
-        EXPECT_CODE(r->getResponseCode(code), kInvalid);
+    for (int sent : {200, 299, 300, 404, 503, 199}) {
+        SmartPtr<HttpRequest> r = newRequest(factory);
+        auto [e, status, body] = post(*r, server.url("/status/" + std::to_string(sent)), {});
+        if (sent >= 200) {
+            ASSERT_OK(e) << sent;
+            EXPECT_EQ(status, sent);
+            EXPECT_EQ(body, "status " + std::to_string(sent));
+        } else {
+            EXPECT_CODE(e, kFailure);
+            int code = 0;
+            EXPECT_CODE(r->getResponseCode(code), kInvalid);
+        }
     }
 }
-
-INSTANTIATE_TEST_SUITE_P(Statuses, HttpStatusTest,
-                         ::testing::Values(StatusCase{199, false}, StatusCase{200, true}, StatusCase{299, true},
-                                           StatusCase{300, true}, StatusCase{404, true}, StatusCase{503, true}));
 
 TEST(HttpRequestTest, FormFieldsArriveIntact) {
     LoopbackServer server;

@@ -80,6 +80,12 @@ const BadStatement kBadStatements[] = {
     {"RequestsToAnotherUser", "select uid_from from friend_request where uid_to = 12345", 604, kNotIndexable},
     {"SubqueryNotIndexable", "select uid from user where uid in (select uid2 from friend where uid2 > 5)", 604,
      kNotIndexable},
+    // The photo tables pin an indexable column too: a condition on another column alone, or a range.
+    {"AlbumByNameAndTime", "select aid from album where name = 'Album 1' and modified >= 1262304000", 604, kNotIndexable},
+    {"AlbumOwnerRange", "select aid from album where owner > 5", 604, kNotIndexable},
+    {"PhotosByTimeOnly", "select pid from photo where created > 0 ORDER BY created DESC limit 150", 604, kNotIndexable},
+    {"PhotoOwnerOrCaption", "select pid from photo where owner = 1 or caption = 'x'", 604, kNotIndexable},
+    {"TagsByTextAndPlace", "select pid from photo_tag where text = 'x' and xcoord > 50", 604, kNotIndexable},
 };
 
 class BadStatementTest : public testing::TestWithParam<BadStatement> {};

@@ -80,6 +80,11 @@ TEST(SqliteStoreTest, StreamGetAnswersTheViewersStreamNewestFirstWithinBounds) {
         std::set<std::string> albums;
         for (const XmlNode& a : root.children[2].children) albums.insert(child(a, "aid")->text);
         for (const XmlNode& p : posts.children) {
+            const std::vector<std::string> names = childNames(p);  // the service's order of a post's fields
+            EXPECT_EQ(std::vector<std::string>(names.begin(), names.begin() + 10),
+                      (std::vector<std::string>{"post_id", "viewer_id", "source_id", "type", "app_id", "attribution",
+                                                "actor_id", "target_id", "message", "attachment"}));
+            EXPECT_EQ(*(std::find(names.begin(), names.end(), "updated_time") + 1), "created_time");
             EXPECT_TRUE(profiles.count(child(p, "source_id")->text));
             EXPECT_TRUE(profiles.count(child(p, "actor_id")->text));
             const XmlNode* media = child(*child(p, "attachment"), "media");
@@ -99,25 +104,11 @@ TEST(SqliteStoreTest, StreamGetAnswersTheViewersStreamNewestFirstWithinBounds) {
     }
 }
 
-TEST(SqliteStoreTest, StreamPostChildrenComeInTheServiceOrder) {
-    GeneratedStore data(smallOptions());
-    XmlNode root("stream_get_response");
-    ASSERT_FALSE(data.store().streamGet(DemoAccount::uid, "", "", "", "1", root));
-    ASSERT_EQ(root.children[0].children.size(), 1u);
-    const std::vector<std::string> names = childNames(root.children[0].children[0]);
-    const std::vector<std::string> leading = {"post_id", "viewer_id", "source_id", "type", "app_id", "attribution",
-                                              "actor_id", "target_id", "message", "attachment"};
-    ASSERT_GE(names.size(), leading.size() + 2);
-    EXPECT_EQ(std::vector<std::string>(names.begin(), names.begin() + leading.size()), leading);
-    const auto updated = std::find(names.begin(), names.end(), "updated_time");
-    ASSERT_NE(updated, names.end());
-    EXPECT_EQ(*(updated + 1), "created_time");
-}
-
 TEST(SqliteStoreTest, MethodsRejectMalformedArguments) {
     GeneratedStore data(smallOptions());
     SqliteStore& s = data.store();
     const std::string tid = data.sql("SELECT thread_id FROM thread WHERE owner = ? LIMIT 1", {DemoAccount::uid})[0][0];
+    const std::string other = data.sql("SELECT thread_id FROM thread WHERE owner <> ? LIMIT 1", {DemoAccount::uid})[0][0];
     const std::string invalid = "Invalid parameter";
     struct Case {
         const char* name;
@@ -134,6 +125,7 @@ TEST(SqliteStoreTest, MethodsRejectMalformedArguments) {
         {"thread id missing", [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, "", "", "", r); }},
         {"thread id text", [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, "abc", "", "", r); }},
         {"thread start", [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, tid, "-3", "", r); }},
+        {"thread of another owner", [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, other, "", "", r); }},
         {"status flag", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "hi", "yes", "", r); }},
         {"clear flag", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "hi", "1", "2", r); }},
         {"empty status", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "", "1", "", r); }},
@@ -148,56 +140,6 @@ TEST(SqliteStoreTest, MethodsRejectMalformedArguments) {
         expectError(c.call(root), 100, invalid, c.name);
     }
     EXPECT_EQ(data.dump(), before);
-}
-
-TEST(SqliteStoreTest, InboxPagesThroughTheViewersThreadsLatestFirst) {
-    GeneratedStore data(smallOptions());
-    std::vector<std::string> expected;
-    for (const auto& r : data.sql("SELECT thread_id FROM thread WHERE owner = ? ORDER BY updated_time DESC, "
-                                  "thread_id DESC",
-                                  {DemoAccount::uid}))
-        expected.push_back(r[0]);
-    ASSERT_EQ(expected.size(), 25u);
-    std::vector<std::string> got;
-    for (int start = 0;; start += 20) {
-        XmlNode root("mailbox_getInbox_response");
-        ASSERT_FALSE(data.store().getInbox(DemoAccount::uid, std::to_string(start), "20", root));
-        if (root.children.empty()) break;
-        for (const XmlNode& t : root.children) {
-            EXPECT_EQ(t.name, "thread");
-            EXPECT_EQ(childNames(t),
-                      (std::vector<std::string>{"tid", "subject", "last_update", "unread", "message_count"}));
-            got.push_back(child(t, "tid")->text);
-        }
-    }
-    EXPECT_EQ(got, expected);
-}
-
-TEST(SqliteStoreTest, ThreadMessagesComeNewestFirstAndOnlyFromTheViewersMailbox) {
-    GeneratedStore data(smallOptions());
-    const std::string tid = data.sql("SELECT thread_id FROM thread WHERE owner = ? LIMIT 1", {DemoAccount::uid})[0][0];
-    XmlNode root("mailbox_getThreadMessages_response");
-    ASSERT_FALSE(data.store().getThreadMessages(DemoAccount::uid, tid, "", "", root));
-    auto expected = data.sql("SELECT message_id, author_id, body, created_time, att_href IS NOT NULL FROM message "
-                             "WHERE thread_id = " + tid + " ORDER BY created_time DESC, seq DESC");
-    ASSERT_EQ(root.children.size(), expected.size());
-    ASSERT_EQ(expected.size(), 6u);
-    const std::vector<Row> messages = rowsOf(root);
-    for (std::size_t i = 0; i < expected.size(); ++i) {
-        EXPECT_EQ(childNames(root.children[i]),
-                  (std::vector<std::string>{"mid", "tid", "author", "body", "time_sent", "has_attachment"}));
-        EXPECT_EQ(messages[i], (Row{{"mid", expected[i][0]}, {"tid", tid}, {"author", expected[i][1]},
-                                    {"body", expected[i][2]}, {"time_sent", expected[i][3]},
-                                    {"has_attachment", expected[i][4] == "1" ? "true" : "false"}}));
-    }
-    XmlNode page("mailbox_getThreadMessages_response");
-    ASSERT_FALSE(data.store().getThreadMessages(DemoAccount::uid, tid, "2", "3", page));
-    ASSERT_EQ(page.children.size(), 3u);
-    EXPECT_EQ(child(page.children[0], "mid")->text, expected[2][0]);
-
-    const std::string other = data.sql("SELECT thread_id FROM thread WHERE owner <> ? LIMIT 1", {DemoAccount::uid})[0][0];
-    XmlNode denied("mailbox_getThreadMessages_response");
-    expectError(data.store().getThreadMessages(DemoAccount::uid, other, "", "", denied), 100, "Invalid parameter");
 }
 
 TEST(SqliteStoreTest, SetStatusBecomesTheUsersStatusAndTheNewestStatusPost) {
@@ -308,41 +250,6 @@ TEST(SqliteStoreTest, UploadRefusalsAnswerTheirCodesAndChangeNothing) {
     XmlNode last("photos_upload_response"), over("photos_upload_response");
     EXPECT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, last));
     expectError(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, over), 321, "Album is full");
-}
-
-TEST(SqliteStoreTest, UsersGetInfoShapesRowsAsFql) {
-    GeneratedStore data(smallOptions());
-    const std::string other = data.sql("SELECT uid2 FROM friend WHERE uid1 = ? LIMIT 1", {DemoAccount::uid})[0][0];
-    XmlNode root("users_getInfo_response");
-    ASSERT_FALSE(data.store().usersGetInfo(DemoAccount::uid, kMe + ", " + other, "name,status,uid,current_location",
-                                           root));
-    EXPECT_TRUE(root.list);
-    ASSERT_EQ(root.children.size(), 2u);
-    std::set<std::string> uids;
-    for (const XmlNode& u : root.children) {
-        EXPECT_EQ(u.name, "user");
-        EXPECT_EQ(childNames(u), (std::vector<std::string>{"uid", "name", "status", "current_location"}));
-        uids.insert(child(u, "uid")->text);
-        EXPECT_EQ(childNames(*child(u, "status")), (std::vector<std::string>{"message", "time", "status_id"}));
-    }
-    EXPECT_EQ(uids, (std::set<std::string>{kMe, other}));
-}
-
-TEST(SqliteStoreTest, FriendsGetListsTheViewersFriends) {
-    GeneratedStore data(smallOptions());
-    std::set<std::string> expected;
-    for (const auto& r : data.sql("SELECT uid2 FROM friend WHERE uid1 = ?", {DemoAccount::uid})) expected.insert(r[0]);
-    ASSERT_EQ(expected.size(), 80u);
-    for (const std::string& uid : {std::string(), kMe}) {  // the viewer by default or by id
-        XmlNode root("friends_get_response");
-        ASSERT_FALSE(data.store().friendsGet(DemoAccount::uid, uid, root));
-        EXPECT_TRUE(root.list);
-        std::set<std::string> got;
-        for (const XmlNode& u : root.children) got.insert(u.name + ":" + u.text);
-        std::set<std::string> want;
-        for (const std::string& e : expected) want.insert("uid:" + e);
-        EXPECT_EQ(got, want);
-    }
 }
 
 // The server answers on a pool of threads; concurrent readers and a writer must each see whole

@@ -15,34 +15,6 @@ const std::string kJpeg = std::string("\xFF\xD8\xFF\xE0\x00\x10JFIF\x00", 11) + 
 const std::string kBoundary = "AaB03x-era";
 const std::string kFffd = "\xEF\xBF\xBD";
 
-std::size_t collect(char* data, std::size_t size, std::size_t count, void* out) {
-    static_cast<std::string*>(out)->append(data, size * count);
-    return size * count;
-}
-
-// A POST of `body` as it is, with `contentType`: the way the era's clients sent what they had
-// assembled by hand.
-Reply postRaw(std::string const& url, std::string const& contentType, std::string const& body) {
-    Reply reply;
-    CURL* curl = curl_easy_init();
-    curl_slist* headers = curl_slist_append(nullptr, ("Content-Type: " + contentType).c_str());
-    curl_easy_setopt(curl, CURLOPT_URL, url.c_str());
-    curl_easy_setopt(curl, CURLOPT_HTTPHEADER, headers);
-    curl_easy_setopt(curl, CURLOPT_POSTFIELDS, body.data());
-    curl_easy_setopt(curl, CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(body.size()));
-    curl_easy_setopt(curl, CURLOPT_WRITEFUNCTION, &collect);
-    curl_easy_setopt(curl, CURLOPT_WRITEDATA, &reply.body);
-    curl_easy_setopt(curl, CURLOPT_TIMEOUT, 60L);
-    curl_easy_setopt(curl, CURLOPT_NOSIGNAL, 1L);
-    reply.code = curl_easy_perform(curl);
-    curl_easy_getinfo(curl, CURLINFO_RESPONSE_CODE, &reply.status);
-    char* type = nullptr;
-    if (curl_easy_getinfo(curl, CURLINFO_CONTENT_TYPE, &type) == CURLE_OK && type != nullptr) reply.contentType = type;
-    curl_slist_free_all(headers);
-    curl_easy_cleanup(curl);
-    return reply;
-}
-
 // One multipart part: its Content-Disposition parameters and its content.
 struct Part {
     std::string disposition;
@@ -62,7 +34,7 @@ std::string multipart(Fields const& fields, std::vector<Part> const& extra) {
 class FidelityTest : public EmulatorFixture {
 public:
     Reply upload(Fields const& fields, std::vector<Part> const& files) {
-        return postRaw(emulator->httpUrl(), "multipart/form-data; boundary=" + kBoundary, multipart(fields, files));
+        return client.postRaw(emulator->httpUrl(), "multipart/form-data; boundary=" + kBoundary, multipart(fields, files));
     }
     // The viewer's status message as a later FQL read shows it.
     std::string statusMessage() {
@@ -77,7 +49,7 @@ public:
     }
 };
 
-TEST_F(FidelityTest, UploadsTakeTheFirstFilePartWhateverItsNameAndNeverSignIt) {
+TEST_F(FidelityTest, UploadsAreNeverSignedMustBeImagesAndKeepCaptionsCleaned) {
     struct Case {
         char const* name;
         std::vector<Part> files;
@@ -85,20 +57,12 @@ TEST_F(FidelityTest, UploadsTakeTheFirstFilePartWhateverItsNameAndNeverSignIt) {
         int code;
         std::size_t fileSize;
     };
+    // How the body's parts are found is the request parser's unit test; here the store's answers.
     const std::string binaryName = "filename=\"\xFF\xFE.jpg\"";
     const std::vector<Case> cases = {
-        {"no name at all", {{"filename=\"photo.jpg\"", kJpeg}}, {}, 0, kJpeg.size()},
-        {"named _file", {{"name=\"_file\"; filename=\"photo.jpg\"", kJpeg}}, {}, 0, kJpeg.size()},
         {"binary file name, binary caption", {{binaryName, kJpeg}}, {{"caption", "caf\xE9 \x01"}}, 0, kJpeg.size()},
-        {"two files: the first is the image",
-         {{"filename=\"a.jpg\"", kJpeg}, {"filename=\"b.txt\"", "text"}},
-         {},
-         0,
-         kJpeg.size()},
         {"a text file", {{"filename=\"notes.txt\"", "just some text, not a picture"}}, {}, 324, 29},
         {"an HTML page named .jpg", {{"filename=\"x.jpg\"", "<html><body>hi</body></html>"}}, {}, 324, 28},
-        {"an empty file", {{"filename=\"\"", ""}}, {}, 324, 0},
-        {"no file part", {}, {}, 324, 0},
     };
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
@@ -123,50 +87,16 @@ TEST_F(FidelityTest, UploadsTakeTheFirstFilePartWhateverItsNameAndNeverSignIt) {
 
 TEST_F(FidelityTest, ABrokenMultipartBodyIsAnsweredAsACallWithoutArguments) {
     const std::string body = multipart(fqlCall(), {});
-    const Reply r =
-        postRaw(emulator->httpUrl(), "multipart/form-data; boundary=" + kBoundary, body.substr(0, body.size() - 10));
+    const Reply r = client.postRaw(emulator->httpUrl(), "multipart/form-data; boundary=" + kBoundary,
+                                   body.substr(0, body.size() - 10));
     EXPECT_EQ(r.status, 200);
     EXPECT_TRUE(wellFormed(r.body)) << r.body;
     EXPECT_EQ(r.errorCode(), 101) << r.body;
 }
 
-TEST_F(FidelityTest, StrictCallIdComparesMicrotimeValuesAsNumbers) {
-    Emulator::Options o = options();
-    o.strictCallId = true;
-    o.httpsPort = -1;
-    start(o);
-    struct Step {
-        char const* callId;
-        int code;
-    };
-    const std::vector<Step> steps = {
-        {"1795457318.1586", 0},  // a new session's first call
-        {"1795457318.1587", 0},
-        {"1795457318.16", 0},
-        {"1795457318.16", 103},
-        {"1795457318.159", 103},
-        {"1795457318.1600", 103},
-        {"1795457319", 0},
-        {"01795457319.5", 0},
-        {"1795457319.50", 103},
-        {"99999999999999999999999.1", 0},
-        {"1e30", 103},
-        {".", 103},
-        {"-1", 103},
-    };
-    for (Step const& s : steps) {
-        const Reply r =
-            client.postForm(emulator->httpUrl(), sessionCall("fql.query", {{"query", kFql}, {"call_id", s.callId}}));
-        EXPECT_EQ(r.errorCode(), s.code) << "call_id " << s.callId << ": " << r.body;
-    }
-}
-
-TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
-    // A thread of the demo inbox, for mailbox.getThreadMessages.
-    const Reply inbox = client.postForm(emulator->httpUrl(), sessionCall("mailbox.getInbox"));
-    const std::string tid = elementText(inbox.body, "tid");
-    ASSERT_FALSE(tid.empty()) << inbox.body;
-
+// The answer writer is one for every method; these cases cover its shapes: a list, an empty list,
+// an object of lists, a scalar, an object and an error document.
+TEST_F(FidelityTest, FormatJsonAnswersInEveryShape) {
     using Json = nlohmann::json;
     struct Case {
         char const* name;
@@ -199,29 +129,7 @@ TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
              EXPECT_TRUE(j["posts"][0]["post_id"].is_string());
              EXPECT_TRUE(j["profiles"].is_array());
          }},
-        {"mailbox.getInbox", call("mailbox.getInbox", {{"limit", "2"}}),
-         [](Json const& j) {
-             ASSERT_EQ(j.size(), 2u);
-             EXPECT_TRUE(j[0]["tid"].is_string());
-         }},
-        {"mailbox.getThreadMessages", call("mailbox.getThreadMessages", {{"tid", tid}}),
-         [](Json const& j) {
-             ASSERT_FALSE(j.empty());
-             EXPECT_TRUE(j[0]["body"].is_string());
-         }},
-        {"users.getInfo",
-         call("users.getInfo", {{"uids", std::to_string(DemoAccount::uid)}, {"fields", "name,timezone"}}),
-         [](Json const& j) {
-             ASSERT_EQ(j.size(), 1u);
-             EXPECT_EQ(j[0]["timezone"], "");
-         }},
-        {"friends.get", call("friends.get", {}), [](Json const& j) { EXPECT_EQ(j.size(), 5u); }},
         {"users.setStatus", call("users.setStatus", {{"status", "json"}}), [](Json const& j) { EXPECT_EQ(j, "1"); }},
-        {"photos.upload",
-         [this](std::string const& format) {
-             return upload(sessionCall("photos.upload", {{"format", format}}), {{"filename=\"p.jpg\"", kJpeg}});
-         },
-         [](Json const& j) { EXPECT_TRUE(j["pid"].is_string()); }},
         {"auth.login",
          [&](std::string const& format) {
              return https.postForm(kHttpsUrl, appCall("facebook.auth.login", {{"email", DemoAccount::email},
@@ -243,8 +151,6 @@ TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
                  if (a["key"] == "sig") sawSig = a["value"] == "bad" + kFffd;
              EXPECT_TRUE(sawSig) << j.dump();
          }},
-        {"an FQL error", call("fql.query", {{"query", "SELECT * FROM user WHERE uid = me()"}}),
-         [](Json const& j) { EXPECT_EQ(j["error_code"], 601); }},
     };
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
@@ -264,54 +170,14 @@ TEST_F(FidelityTest, FormatJsonAnswersEveryMethodAndEveryError) {
 }
 
 TEST_F(FidelityTest, UsersGetInfoAnswersEveryDocumentedFieldAndRefusesUnknownNames) {
-    const std::vector<std::string> documented = {"about_me",
-                                                 "activities",
-                                                 "affiliations",
-                                                 "birthday",
-                                                 "birthday_date",
-                                                 "books",
-                                                 "current_location",
-                                                 "education_history",
-                                                 "email",
-                                                 "email_hashes",
-                                                 "first_name",
-                                                 "has_added_app",
-                                                 "hometown_location",
-                                                 "hs_info",
-                                                 "interests",
-                                                 "is_app_user",
-                                                 "last_name",
-                                                 "locale",
-                                                 "meeting_for",
-                                                 "meeting_sex",
-                                                 "movies",
-                                                 "music",
-                                                 "name",
-                                                 "notes_count",
-                                                 "online_presence",
-                                                 "pic",
-                                                 "pic_big",
-                                                 "pic_small",
-                                                 "pic_square",
-                                                 "pic_with_logo",
-                                                 "political",
-                                                 "profile_blurb",
-                                                 "profile_update_time",
-                                                 "profile_url",
-                                                 "proxied_email",
-                                                 "quotes",
-                                                 "relationship_status",
-                                                 "religion",
-                                                 "sex",
-                                                 "significant_other_id",
-                                                 "status",
-                                                 "timezone",
-                                                 "tv",
-                                                 "username",
-                                                 "verified",
-                                                 "wall_count",
-                                                 "website",
-                                                 "work_history"};
+    const std::vector<std::string> documented = {
+        "about_me", "activities", "affiliations", "birthday", "birthday_date", "books", "current_location",
+        "education_history", "email", "email_hashes", "first_name", "has_added_app", "hometown_location", "hs_info",
+        "interests", "is_app_user", "last_name", "locale", "meeting_for", "meeting_sex", "movies", "music", "name",
+        "notes_count", "online_presence", "pic", "pic_big", "pic_small", "pic_square", "pic_with_logo", "political",
+        "profile_blurb", "profile_update_time", "profile_url", "proxied_email", "quotes", "relationship_status",
+        "religion", "sex", "significant_other_id", "status", "timezone", "tv", "username", "verified", "wall_count",
+        "website", "work_history"};
     std::string all;
     for (std::string const& f : documented) all += (all.empty() ? "" : ",") + f;
     const std::string me = std::to_string(DemoAccount::uid);
@@ -372,16 +238,7 @@ TEST_F(FidelityTest, TextThatIsNotUtf8IsKeptWithReplacementCharactersAndEveryAns
         // The stored text is the cleaned one, and later reads answer it well-formed.
         const std::string shown = statusMessage();
         std::string expected;
-        for (char ch : Utf8Text::clean(c.status)) {
-            if (ch == '<')
-                expected += "&lt;";
-            else if (ch == '&')
-                expected += "&amp;";
-            else if (ch == '>')
-                expected += "&gt;";
-            else
-                expected += ch;
-        }
+        Utf8Text::appendXml(expected, c.status);
         EXPECT_EQ(shown, expected);
 
         // An error document echoes the bytes as sent, cleaned the same way.
@@ -426,18 +283,6 @@ TEST_F(FidelityTest, LargeBodiesUpToTheLimitAreServedAndLargerOnesGetAnErrorDocu
     EXPECT_EQ(tooLarge.errorCode(), 101) << tooLarge.body;
     EXPECT_EQ(statusMessage(), status);
     EXPECT_EQ(client.postForm(emulator->httpUrl(), fqlCall()).errorCode(), 0);
-}
-
-TEST_F(FidelityTest, TextComparedWithANumberPastTheIntegerRangeIsAnsweredNotUndefined) {
-    // Found by the FQL fuzz target: the text converts to a real beyond any 64-bit integer.
-    for (char const* text : {"9727719610855429986.", "-1e300", "18446744073709551616"}) {
-        const Reply r = client.postForm(
-            emulator->httpUrl(),
-            sessionCall("fql.query",
-                        {{"query", "SELECT name FROM user WHERE uid = me() OR uid = '" + std::string(text) + "'"}}));
-        EXPECT_EQ(r.errorCode(), 0) << r.body;
-        EXPECT_NE(r.body.find("<name>"), std::string::npos) << r.body;
-    }
 }
 
 TEST_F(FidelityTest, LiteralSelectionsAnswerOneRowPerMatchLikeAnyOther) {

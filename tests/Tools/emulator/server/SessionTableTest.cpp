@@ -57,6 +57,10 @@ TEST(SessionTableTest, CallIdMustGrowWithinEachSession) {
         {&a, "5", true},  {&a, "5", false}, {&a, "4", false},  {&b, "1", true},  {&a, "6", true},
         {&a, "", false},  {&a, "7x", false}, {&a, "+8", false}, {&a, "18446744073709551615", true},
         {&a, "18446744073709551616", true}, {&b, "2", true},
+        // Microtime call ids compare as numbers, however many digits either side of the point.
+        {&b, "1795457318.1586", true}, {&b, "1795457318.16", true}, {&b, "1795457318.159", false},
+        {&b, "1795457318.1600", false}, {&b, "01795457319.5", true}, {&b, "1795457319.50", false},
+        {&b, "99999999999999999999999.1", true}, {&b, "1e30", false}, {&b, ".", false}, {&b, "-1", false},
     };
     for (const Step& step : steps) EXPECT_EQ(table.acceptCallId(step.s->key, step.callId), step.accepted) << step.callId;
     EXPECT_FALSE(table.acceptCallId("unknown", "1"));

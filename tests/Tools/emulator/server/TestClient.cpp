@@ -78,12 +78,18 @@ Reply TestClient::perform(const std::string& url) {
     return reply;
 }
 
-Reply TestClient::postForm(const std::string& url, const Fields& fields) {
-    const std::string body = encode(fields);
+Reply TestClient::postForm(const std::string& url, const Fields& fields) { return postRaw(url, "", encode(fields)); }
+
+Reply TestClient::postRaw(const std::string& url, const std::string& contentType, const std::string& body) {
+    curl_slist* headers = contentType.empty() ? nullptr : curl_slist_append(nullptr, ("Content-Type: " + contentType).c_str());
     curl_easy_setopt(curl_, CURLOPT_MIMEPOST, nullptr);
-    curl_easy_setopt(curl_, CURLOPT_POSTFIELDSIZE, static_cast<long>(body.size()));
-    curl_easy_setopt(curl_, CURLOPT_COPYPOSTFIELDS, body.c_str());
-    return perform(url);
+    curl_easy_setopt(curl_, CURLOPT_HTTPHEADER, headers);
+    curl_easy_setopt(curl_, CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(body.size()));
+    curl_easy_setopt(curl_, CURLOPT_COPYPOSTFIELDS, body.data());
+    Reply reply = perform(url);
+    curl_easy_setopt(curl_, CURLOPT_HTTPHEADER, nullptr);
+    curl_slist_free_all(headers);
+    return reply;
 }
 
 Reply TestClient::postMultipart(const std::string& url, const Fields& fields, const std::string* file) {

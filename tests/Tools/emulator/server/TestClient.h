@@ -36,6 +36,8 @@ public:
     void connectTo(const std::string& rule) { connectTo_ = rule; }
 
     Reply postForm(const std::string& url, const Fields& fields);
+    // `body` as it is, under `contentType` (none given: a url-encoded form).
+    Reply postRaw(const std::string& url, const std::string& contentType, const std::string& body);
     Reply postMultipart(const std::string& url, const Fields& fields, const std::string* file);
     Reply get(const std::string& url, const Fields& fields);
 

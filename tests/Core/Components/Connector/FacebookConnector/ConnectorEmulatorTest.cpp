@@ -4,16 +4,13 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <memory>
 #include <string>
 #include <vector>
 
-#include "ComponentRegistry.h"
-#include "Emulator.h"
+#include "EmulatorHost.h"
 #include "EmulatorRows.h"
 #include "ErrorAssertions.h"
 #include "FacebookConnector.h"
-#include "HttpRequestFactory.h"
 
 namespace trelm::test {
 namespace {
@@ -34,19 +31,9 @@ Map<String, String> demoParams(char const* password = emu::DemoAccount::password
 class ConnectorEmulatorTest : public ::testing::Test {
 protected:
     void SetUp() override {
-        emu::Emulator::Options options;
-        options.generator.users = 90;
-        options.generator.demoFriends = 55;
-        options.generator.friendsPerUser = 2;
-        options.threads = 4;
-        emulator = std::make_unique<emu::Emulator>(options);
         std::string error;
-        ASSERT_TRUE(emulator->start(error)) << error;
-        factory.setCaFile(emulator->caFile());
-        factory.setConnectTo({"api.facebook.com:80:127.0.0.1:" + std::to_string(emulator->httpPort()),
-                              "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator->httpsPort())});
-        ASSERT_OK(registry.add(HttpRequestFactory::kName, &factory));
-        registry.activate();
+        ASSERT_TRUE(host.start(error)) << error;
+        emulator = &host.emulator();
     }
 
     void connect() {
@@ -72,9 +59,8 @@ protected:
         return out;
     }
 
-    ComponentRegistry registry;
-    HttpRequestFactory factory;
-    std::unique_ptr<emu::Emulator> emulator;
+    EmulatorHost host{{.users = 90, .demoFriends = 55, .friendsPerUser = 2}};
+    emu::Emulator* emulator = nullptr;
     FacebookConnector connector{"facebook-connector"};
 };
 
@@ -89,15 +75,15 @@ TEST_F(ConnectorEmulatorTest, MakeConnectionLogsInOnceOverHttpsAndWritesTheUserB
     Map<String, String> again = demoParams("another password");
     EXPECT_OK(connector.makeConnection(again, false));
     EXPECT_EQ(emulator->log().total(), 1u) << "a second connection sends nothing";
-}
 
-TEST_F(ConnectorEmulatorTest, WrongPasswordKeepsTheServiceCodeAndLaterCallsSendNothing) {
-    Map<String, String> params = demoParams("not the password");
-    EXPECT_CODE(connector.makeConnection(params, false), kNotSignedIn);
+    // A refused login keeps the service's code, and later calls send nothing.
+    FacebookConnector refused("refused");
+    Map<String, String> wrong = demoParams("not the password");
+    EXPECT_CODE(refused.makeConnection(wrong, false), kNotSignedIn);
     Vector<String> ids{"untouched"};
-    EXPECT_CODE(connector.getPeers(ids), kNotSignedIn);
+    EXPECT_CODE(refused.getPeers(ids), kNotSignedIn);
     EXPECT_EQ(ids, (Vector<String>{"untouched"}));
-    EXPECT_EQ(emulator->log().total(), 1u);
+    EXPECT_EQ(emulator->log().total(), 2u);
 }
 
 TEST_F(ConnectorEmulatorTest, GetPeersListsExactlyTheDemoUsersFriends) {
@@ -154,22 +140,6 @@ TEST_F(ConnectorEmulatorTest, StatusesOfFiftyFriendsComeInOneRequestWithTextAndT
     EXPECT_LT(never, 50u);
 }
 
-// The service shows a status that was never set as an empty message at time 0, not as nil.
-TEST_F(ConnectorEmulatorTest, UsersGetInfoShowsANeverSetStatusAsEmptyAtTimeZero) {
-    std::string uids;
-    for (String const& uid : friendIds()) uids += (uids.empty() ? "" : ",") + uid.str();
-    emu::XmlNode root("users_getInfo_response");
-    ASSERT_FALSE(emulator->store().usersGetInfo(emu::DemoAccount::uid, uids, "status", root).has_value());
-    unsigned never = 0;
-    for (emu::XmlNode const& u : root.children) {
-        emu::XmlNode const& status = u.children.at(1);
-        ASSERT_FALSE(status.nil) << u.children[0].text;
-        ASSERT_EQ(status.children.size(), 3u);
-        never += status.children[0].text.empty() && status.children[1].text == "0";
-    }
-    EXPECT_EQ(never, 55u / 4);
-}
-
 // An id the service does not know gets no answer: fewer statuses than ids.
 TEST_F(ConnectorEmulatorTest, ShortStatusAnswerFailsAndLeavesTheEventsAsTheyWere) {
     connect();
@@ -205,15 +175,6 @@ TEST_F(ConnectorEmulatorTest, ServiceErrorsReachTheHostWithTheirCodes) {
     std::uint64_t const sent = emulator->log().total();
     EXPECT_CODE(connector.setStatus("after the end"), kNotSignedIn);
     EXPECT_EQ(emulator->log().total(), sent);
-}
-
-TEST_F(ConnectorEmulatorTest, SetStatusIsWhatTheServiceThenShows) {
-    connect();
-    ASSERT_OK(connector.setStatus("is testing the connector"));
-    auto calls = emulator->log().entriesFor("users.setStatus");
-    ASSERT_EQ(calls.size(), 1u);
-    EXPECT_EQ(calls[0].args["call_id"], "1");
-    EXPECT_EQ(user(kDemoUid, "status")["status.message"], "is testing the connector");
 }
 
 // Before a connection the queries answer nothing and touch nothing; nothing is sent.

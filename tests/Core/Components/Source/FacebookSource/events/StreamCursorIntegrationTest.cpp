@@ -21,19 +21,10 @@ long long endTimeOf(emu::LoggedRequest const& call) { return std::stoll(call.arg
 
 // A demo user whose 60 friends post 12 times each, every post in a second of its own (posts
 // sharing a second across a window's edge would be passed over by the time paging).
-class StreamCursorTest : public ::testing::Test {
+class StreamCursorTest : public EmulatorSuite {
 protected:
     static void SetUpTestSuite() {
-        emu::GeneratorOptions generator;
-        generator.users = 300;
-        generator.demoFriends = 60;
-        generator.photosPerAlbum = 3;
-        generator.postsPerUser = 12;
-        generator.postsPerSecond = 1;
-        host = new EmulatorHost(generator);
-        std::string error;
-        ASSERT_TRUE(host->start(error)) << error;
-        source = &host->addSource(host->demoGroup("facebook", true));
+        startSuite({.users = 300, .demoFriends = 60, .photosPerAlbum = 3, .postsPerUser = 12, .postsPerSecond = 1});
 
         // The whole stream in one call: the wanted posts, and the time of every post.
         Vector<Map<String, String>> rows;
@@ -51,25 +42,12 @@ protected:
         host->emulator().log().clear();
     }
 
-    static void TearDownTestSuite() {
-        delete host;
-        host = nullptr;
-    }
-
-    void SetUp() override { host->emulator().log().clear(); }
-
     static std::vector<emu::LoggedRequest> streamCalls() { return host->emulator().log().entriesFor("stream.get"); }
 
-    static EmulatorHost* host;
-    static FacebookSource* source;
-    static std::vector<EventRow> wanted;  // status and photo posts, newest first
-    static std::vector<int> times;        // of every post, newest first
+    static inline std::vector<EventRow> wanted;  // status and photo posts, newest first
+    static inline std::vector<int> times;        // of every post, newest first
 };
 
-EmulatorHost* StreamCursorTest::host = nullptr;
-FacebookSource* StreamCursorTest::source = nullptr;
-std::vector<EventRow> StreamCursorTest::wanted;
-std::vector<int> StreamCursorTest::times;
 
 TEST_F(StreamCursorTest, StatusAndPhotoQueryVisitsEveryPostOnceNewestFirstInBoundedWindows) {
     IQueryItems::StartQueryMessage msg(eventOrdering(), Vector<IQueryItems::Constraint>{typeIn({4, 5})});

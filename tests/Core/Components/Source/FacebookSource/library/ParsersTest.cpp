@@ -49,14 +49,6 @@ TEST(ResponseParsersTest, RootsAndErrorDocumentsGiveTheirCodes) {
     }
 }
 
-TEST(ResponseParsersTest, PhotoIdIsThePidElement) {
-    String pid;
-    ASSERT_OK(PhotoUploadParser(pid)
-                    .parse("<photos_upload_response><pid>100_7</pid><aid>100_1</aid><owner>100</owner>"
-                           "</photos_upload_response>"));
-    EXPECT_EQ(pid, "100_7");
-}
-
 // Records appended before a broken answer stay, after what the caller already had.
 TEST(ResponseParsersTest, ThreadsAreReadInOrderAndKeptWhenTheAnswerBreaks) {
     Vector<Thread> threads{Thread{"old", "", 1}};

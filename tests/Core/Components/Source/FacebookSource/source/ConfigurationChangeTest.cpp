@@ -3,6 +3,7 @@
 #include "ErrorAssertions.h"
 
 #include <cstdio>
+#include <memory>
 #include <mutex>
 #include <string>
 #include <utility>
@@ -61,32 +62,21 @@ private:
     std::vector<std::string> events_;
 };
 
+using Cursor = EmulatorHost::Cursor;
 std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
 std::string const kSignedIn = "status:0:" + kDemoUid;
 std::string const kSignedOut = "status:8000001c:";
 
-class ConfigurationChangeTest : public ::testing::Test {
+class ConfigurationChangeTest : public EmulatorSuite {
 protected:
     static void SetUpTestSuite() {
-        host = new EmulatorHost();
-        std::string error;
-        ASSERT_TRUE(host->start(error)) << error;
-        observer = new RecordingListener();
+        startSuite();
+        observer = std::make_unique<RecordingListener>();
         host->addComponent("observer", *observer);
     }
-    static void TearDownTestSuite() {
-        delete host;
-        delete observer;
-        host = nullptr;
-        observer = nullptr;
-    }
 
-    static EmulatorHost* host;
-    static RecordingListener* observer;
+    static inline std::unique_ptr<RecordingListener> observer;
 };
-
-EmulatorHost* ConfigurationChangeTest::host = nullptr;
-RecordingListener* ConfigurationChangeTest::observer = nullptr;
 
 // Each case configures a fresh source (its own configuration tag, so stored values never mix),
 // puts values into the runtime-configuration store, announces a change of some keys and checks
@@ -184,13 +174,10 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
             EXPECT_EQ(sid.result.str(), kDemoUid);
         }
 
-        IQueryItems::StartQueryMessage query(
-            Vector<IQueryItems::Column>(),
-            Vector<IQueryItems::Constraint>{IQueryItems::Constraint{
-                Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), IQueryItems::Constraint::Equal}});
-        ASSERT_OK(source.onMessage(query));
+        Cursor cursor = EmulatorHost::open(source, 2);
+        ASSERT_TRUE(cursor);
         SmartPtr<Map<String, Variant>> row;
-        EXPECT_CODE(query.cursor->getRow(row), c.queryCode);
+        EXPECT_CODE(cursor->getRow(row), c.queryCode);
     }
 }
 

@@ -38,27 +38,14 @@ std::string pageBefore(std::string const& uid) {
 }
 
 // A demo user with thousands of friends; the source is signed in with a session of the demo user.
-class ContactCursorTest : public ::testing::Test {
+class ContactCursorTest : public EmulatorSuite {
 protected:
     static void SetUpTestSuite() {
-        host = new EmulatorHost(emu::GeneratorOptions{.users = kFriends + 200, .demoFriends = kFriends,
-                                                      .friendsPerUser = 2, .albumsPerUser = 1, .photosPerAlbum = 1,
-                                                      .postsPerUser = 1, .threadsPerUser = 1, .messagesPerThread = 1});
-        std::string error;
-        ASSERT_TRUE(host->start(error)) << error;
-        source = &host->addSource(host->demoGroup(kSourceName, true));
-        expected = new std::vector<std::string>(referenceOrder());
-        ASSERT_EQ(expected->size(), size_t(kFriends));
+        startSuite({.users = kFriends + 200, .demoFriends = kFriends, .friendsPerUser = 2, .albumsPerUser = 1,
+                    .photosPerAlbum = 1, .postsPerUser = 1, .threadsPerUser = 1, .messagesPerThread = 1});
+        expected = referenceOrder();
+        ASSERT_EQ(expected.size(), size_t(kFriends));
     }
-
-    static void TearDownTestSuite() {
-        delete expected;
-        delete host;
-        expected = nullptr;
-        host = nullptr;
-    }
-
-    void SetUp() override { host->emulator().log().clear(); }
 
     // The friends' ids as read in one statement by a client of its own, in the cursor's order:
     // the text of the id with a blank appended, byte-wise.
@@ -70,23 +57,12 @@ protected:
         return uids;
     }
 
-    static Cursor open(std::vector<Constraint> extra = {}) {
-        Vector<Constraint> constraints{
-            Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), Constraint::Equal}};
-        for (Constraint const& c : extra) EXPECT_OK(constraints.pushBack(c));
-        IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints);
-        uError err = source->onMessage(msg);
-        EXPECT_CODE(err, kSuccess);
-        return msg.cursor;
-    }
+    static Cursor open(std::vector<Constraint> extra = {}) { return EmulatorHost::open(*source, 2, {}, extra); }
 
     static std::string uidAt(Cursor const& cursor) {
         SmartPtr<Map<String, Variant>> row;
-        uError err = cursor->getRow(row);
-        EXPECT_CODE(err, kSuccess);
-        if (!row) return "";
-        Variant const* uid = row->search("core_contact_service_id");
-        return uid ? uid->asString().str() : "";
+        EXPECT_OK(cursor->getRow(row));
+        return row ? row->search("core_contact_service_id")->asString().str() : "";
     }
 
     static GUID guidAt(Cursor const& cursor) {
@@ -95,14 +71,9 @@ protected:
         return row ? row->search("core_object_id")->asGUID() : GUID();
     }
 
-    static EmulatorHost* host;
-    static FacebookSource* source;
-    static std::vector<std::string>* expected;
+    static inline std::vector<std::string> expected;
 };
 
-EmulatorHost* ContactCursorTest::host = nullptr;
-FacebookSource* ContactCursorTest::source = nullptr;
-std::vector<std::string>* ContactCursorTest::expected = nullptr;
 
 // Forward from the first friend and backward from the last, one row at a time: every friend once,
 // each with a GUID of its own, with the first page, one page past the edge row of each window, and
@@ -126,7 +97,7 @@ TEST_F(ContactCursorTest, SingleStepsEitherWayVisitEveryFriendOnceWithOneStateme
             ASSERT_CODE(cursor->seek(step, moved), seen.size() == size_t(kFriends) ? unsigned(kNoData) : kSuccess);
         }
         if (step < 0) std::reverse(seen.begin(), seen.end());
-        EXPECT_EQ(seen, *expected);
+        EXPECT_EQ(seen, expected);
         EXPECT_EQ(guids.size(), size_t(kFriends));
 
         std::vector<std::string> statements = host->fqlStatements();
@@ -135,8 +106,8 @@ TEST_F(ContactCursorTest, SingleStepsEitherWayVisitEveryFriendOnceWithOneStateme
                                           : "select uid,name,pic_big from user where " + kFriendCondition +
                                                 " order by concat(uid,' ') desc limit 150");
         for (size_t k = 1; k < statements.size(); ++k) {
-            EXPECT_EQ(statements[k], step > 0 ? pageAfter((*expected)[k * kWindow - 1])
-                                              : pageBefore((*expected)[kFriends - k * kWindow]))
+            EXPECT_EQ(statements[k], step > 0 ? pageAfter(expected[k * kWindow - 1])
+                                              : pageBefore(expected[kFriends - k * kWindow]))
                 << "page " << k;
         }
     }
@@ -184,7 +155,7 @@ TEST_F(ContactCursorTest, JumpsAndLongSeeksLandOnTheRightFriendAndKnowTheirIndex
         if (m.op == Move::Seek) {
             EXPECT_EQ(moved, m.moved);
         }
-        EXPECT_EQ(uidAt(cursor), (*expected)[m.index]);
+        EXPECT_EQ(uidAt(cursor), expected[m.index]);
         unsigned index = 0;
         ASSERT_CODE(cursor->curRow(index), kSuccess);
         EXPECT_EQ(index, unsigned(m.index));
@@ -206,20 +177,20 @@ TEST_F(ContactCursorTest, CountingAndPositionStatementsAskForTinyRowsWithoutOrde
     ASSERT_CODE(cursor->curRow(index), kSuccess);
     EXPECT_EQ(index, 200u);
 
-    std::string const& at200 = (*expected)[200];
+    std::string const& at200 = expected[200];
     std::vector<std::string> const statements = host->fqlStatements();
     std::vector<std::string> const wanted = {
         "select '' from user where " + kFriendCondition,
         firstPage(),
         "select uid,name,pic_big from user where " + kFriendCondition + " and (concat(uid,' ') > '" +
-            (*expected)[149] + " ') order by concat(uid,' ') asc limit 200",
+            expected[149] + " ') order by concat(uid,' ') asc limit 200",
         "select '' from user where " + kFriendCondition + " and (concat(uid,' ') <= '" + at200 + " ')",
     };
     EXPECT_EQ(statements, wanted);
 }
 
 TEST_F(ContactCursorTest, ShortFirstPageGivesTheCountAndRepeatedJumpsAskNothing) {
-    std::vector<std::string> const& e = *expected;
+    std::vector<std::string> const& e = expected;
     Cursor cursor = open({Constraint{Metadata::Key("core_contact_service_id", TRELM_TYPES::STRING),
                                      Variant(Vector<String>{String(e[20]), String(e[5]), String(e[10])}),
                                      Constraint::InList}});
@@ -264,7 +235,7 @@ TEST_F(ContactCursorTest, RecordsCarryContactFieldsAndTheSourcesIdentityAsACopy)
     std::vector<std::pair<char const*, Variant>> const wanted = {
         {"core_object_type", Variant(2)},
         {"core_contact_service", Variant("Facebook")},
-        {"core_contact_service_id", Variant(String((*expected)[0]))},
+        {"core_contact_service_id", Variant(String(expected[0]))},
         {"core_object_source", Variant(kSourceName)},
         {"core_object_origin_importcomponent", Variant(kSourceName)},
         {"core_object_origin_servicename", Variant("Facebook")},

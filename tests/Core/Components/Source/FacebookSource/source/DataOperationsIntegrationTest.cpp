@@ -17,54 +17,32 @@ namespace {
 
 using Record = Map<String, Variant>;
 
-constexpr char const* kSourceName = "facebook";
 std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
 
-class DataOperationsIntegrationTest : public ::testing::Test {
+class DataOperationsIntegrationTest : public EmulatorSuite {
 protected:
     static void SetUpTestSuite() {
-        host = new EmulatorHost();
-        std::string error;
-        ASSERT_TRUE(host->start(error)) << error;
-        source = &host->addSource(host->demoGroup(kSourceName, true));
-
+        startSuite();
         char pattern[] = "/tmp/trelm-source-test-XXXXXX";
         ASSERT_NE(mkdtemp(pattern), nullptr);
-        directory = new std::string(pattern);
-        photo = new std::string(*directory + "/holiday photo.jpg");
-        std::ofstream(*photo, std::ios::binary) << std::string("\xff\xd8\xff\xe0 not really a picture", 26);
+        directory = pattern;
+        photo = directory + "/holiday photo.jpg";
+        std::ofstream(photo, std::ios::binary) << std::string("\xff\xd8\xff\xe0 not really a picture", 26);
     }
     static void TearDownTestSuite() {
-        std::filesystem::remove_all(*directory);
-        delete host;
-        delete directory;
-        delete photo;
-        host = nullptr;
+        std::filesystem::remove_all(directory);
+        EmulatorSuite::TearDownTestSuite();
     }
     void SetUp() override {
-        host->emulator().log().clear();
+        EmulatorSuite::SetUp();
         host->emulator().faults().clearAll();
     }
 
-    static SmartPtr<IQueryItems::ICursor> openContacts() {
-        IQueryItems::StartQueryMessage msg(
-            Vector<IQueryItems::Column>(),
-            Vector<IQueryItems::Constraint>{IQueryItems::Constraint{
-                Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(2), IQueryItems::Constraint::Equal}});
-        EXPECT_OK(source->onMessage(msg));
-        return msg.cursor;
-    }
+    static SmartPtr<IQueryItems::ICursor> openContacts() { return EmulatorHost::open(*source, 2); }
 
-    static EmulatorHost* host;
-    static FacebookSource* source;
-    static std::string* directory;
-    static std::string* photo;
+    static inline std::string directory;
+    static inline std::string photo;
 };
-
-EmulatorHost* DataOperationsIntegrationTest::host = nullptr;
-FacebookSource* DataOperationsIntegrationTest::source = nullptr;
-std::string* DataOperationsIntegrationTest::directory = nullptr;
-std::string* DataOperationsIntegrationTest::photo = nullptr;
 
 TEST_F(DataOperationsIntegrationTest, InsertedStatusIsPostedAndAppearsInTheStream) {
     std::string const text = "reading about keyset paging";
@@ -103,7 +81,7 @@ TEST_F(DataOperationsIntegrationTest, InsertedPhotoIsUploadedAndItsIdWrittenBack
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
         host->emulator().log().clear();
-        Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String("file://" + *photo))}};
+        Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String("file://" + photo))}};
         if (c.caption != nullptr) {
             ASSERT_OK(media.insert("media_notes", Variant(c.caption)));
         }
@@ -116,7 +94,7 @@ TEST_F(DataOperationsIntegrationTest, InsertedPhotoIsUploadedAndItsIdWrittenBack
         auto uploads = host->emulator().log().entriesFor("photos.upload");
         ASSERT_EQ(uploads.size(), 1u);
         EXPECT_TRUE(uploads[0].hadFile);
-        EXPECT_EQ(uploads[0].fileSize, std::filesystem::file_size(*photo));
+        EXPECT_EQ(uploads[0].fileSize, std::filesystem::file_size(photo));
         EXPECT_EQ(uploads[0].args.count("caption"), c.caption ? 1u : 0u);
         EXPECT_EQ(uploads[0].args.count("aid"), c.intoAlbum ? 1u : 0u);
 
@@ -137,7 +115,7 @@ TEST_F(DataOperationsIntegrationTest, FailedUploadLeavesTheRecordWithoutServiceI
     emu::FaultRule unavailable;
     unavailable.errorCode = 2;
     host->emulator().faults().set("photos.upload", unavailable);
-    Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String(*photo))}};
+    Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String(photo))}};
     EXPECT_CODE(source->insert(media), kServiceUnavailable);
     EXPECT_EQ(media.search("core_service_id"), nullptr);
 }

@@ -19,13 +19,6 @@ using Record = Map<String, Variant>;
 
 constexpr char const* kSourceName = "facebook";
 
-// Opens the source's own input check, which nothing in the plug-in calls.
-class CheckableSource : public FacebookSource {
-public:
-    using FacebookSource::FacebookSource;
-    using FacebookSource::manageInputDataImpl;
-};
-
 Configuration::Group configuredGroup() {
     return Configuration::Group(kSourceName, {{"facebook_source_appkey", Variant("key")},
                                               {"facebook_source_appsecret", Variant("secret")},
@@ -43,7 +36,7 @@ Record record(std::initializer_list<std::pair<char const*, Variant>> entries) {
 // Operations that are refused whatever the service would say: none of them reaches the network
 // (no HTTP factory is registered, so a request would fail with another code).
 TEST(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
-    CheckableSource source(kSourceName);
+    FacebookSource source(kSourceName);
     ASSERT_OK(source.sendConfig(configuredGroup()));
     ASSERT_OK(source.startup());
 
@@ -62,8 +55,11 @@ TEST(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
         {"retrieve of an unknown GUID", [&] { return source.retrieve(someGuid, scratch, false); }, kNotFound},
         {"insert of a contact",
          [&] { Record r = record({{"core_object_type", 2}}); return source.insert(r); }, kInvalid},
-        {"insert without a type", [&] { Record r; return source.insert(r); }, kInvalid},
-        {"insert of a status without text",
+        {"insert without a type", [&] { Record r = record({{"core_event_text", "hi"}}); return source.insert(r); },
+         kInvalid},
+        {"insert of a status without a text", [&] { Record r = record({{"core_object_type", 4}}); return source.insert(r); },
+         kInvalid},
+        {"insert of a status with empty text",
          [&] { Record r = record({{"core_object_type", 4}, {"core_event_text", ""}}); return source.insert(r); },
          kInvalid},
         {"insert of a photo without uri",
@@ -78,29 +74,6 @@ TEST(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
         EXPECT_CODE(err, c.code) << c.name << ": " << err;
     }
     EXPECT_TRUE(scratch.empty());
-}
-
-TEST(DataOperationsTest, InputCheckAcceptsOnlyCompleteStatusAndPhotoRecords) {
-    CheckableSource source(kSourceName);
-    struct Case {
-        char const* name;
-        Record input;
-        bool flag;
-        unsigned code;
-    };
-    std::vector<Case> const cases = {
-        {"status with text", record({{"core_object_type", 4}, {"core_event_text", "hi"}}), false, kSuccess},
-        {"status with empty text", record({{"core_object_type", 4}, {"core_event_text", ""}}), false, kInvalid},
-        {"status without text", record({{"core_object_type", 4}}), false, kInvalid},
-        {"photo with uri", record({{"core_object_type", 9}, {"media_uri", "/tmp/p.jpg"}}), false, kSuccess},
-        {"photo without uri", record({{"core_object_type", 9}}), false, kInvalid},
-        {"contact", record({{"core_object_type", 2}}), false, kInvalid},
-        {"no type", record({{"core_event_text", "hi"}}), false, kInvalid},
-        {"flag set", record({{"core_object_type", 4}, {"core_event_text", "hi"}}), true, kDataOpNotSupported},
-    };
-    for (Case const& c : cases) {
-        EXPECT_CODE(source.manageInputDataImpl(static_cast<Record const&>(c.input), c.flag), c.code) << c.name;
-    }
 }
 
 TEST(DataOperationsTest, OperationsBeforeStartupFailWithNotSet) {

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+
 #include "ErrorAssertions.h"
 
 namespace trelm::test {
@@ -74,17 +76,23 @@ SmartPtr<FacebookLibrary> EmulatorHost::demoClient() {
     return lib;
 }
 
-std::vector<std::string> EmulatorHost::fqlColumn(std::string const& query, std::string const& table,
-                                                 std::string const& field) {
+std::vector<std::map<std::string, std::string>> EmulatorHost::fqlRows(std::string const& query,
+                                                                      std::string const& table) {
     Vector<Map<String, String>> rows;
     unsigned count = 0;
-    uError err = demoClient()->runFqlQuery(String(query), String(table), rows, 0, count);
-    EXPECT_OK(err);
-    std::vector<std::string> out;
+    EXPECT_OK(demoClient()->runFqlQuery(String(query), String(table), rows, 0, count)) << query;
+    std::vector<std::map<std::string, std::string>> out;
     for (auto const& row : rows) {
-        String const* value = row.search(String(field));
-        out.push_back(value ? value->str() : "");
+        auto& r = out.emplace_back();
+        for (auto const& [k, v] : row) r[k.str()] = v.str();
     }
+    return out;
+}
+
+std::vector<std::string> EmulatorHost::fqlColumn(std::string const& query, std::string const& table,
+                                                 std::string const& field) {
+    std::vector<std::string> out;
+    for (auto& row : fqlRows(query, table)) out.push_back(row[field]);
     return out;
 }
 
@@ -92,6 +100,43 @@ std::vector<std::string> EmulatorHost::fqlStatements() {
     std::vector<std::string> out;
     for (emu::LoggedRequest const& r : emulator_->log().entriesFor("fql.query")) out.push_back(r.fql);
     return out;
+}
+
+}  // namespace trelm::test
+
+namespace trelm::test {
+
+EmulatorHost::Cursor EmulatorHost::open(FacebookSource& source, int type, Vector<IQueryItems::Column> const& columns,
+                                        std::vector<IQueryItems::Constraint> const& extra, std::int64_t position,
+                                        uError* refusal) {
+    Vector<IQueryItems::Constraint> constraints{IQueryItems::Constraint{
+        Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(type), IQueryItems::Constraint::Equal}};
+    for (auto const& c : extra) EXPECT_OK(constraints.pushBack(c));
+    IQueryItems::StartQueryMessage msg(columns, constraints, position);
+    msg.interactive = position == -1;
+    uError err = source.onMessage(msg);
+    if (refusal != nullptr) {
+        *refusal = err;
+    } else {
+        EXPECT_OK(err);
+    }
+    return msg.cursor;
+}
+
+std::vector<EmulatorHost::Record> EmulatorHost::walk(IQueryItems::ICursor& cursor, int step) {
+    std::vector<Record> rows;
+    for (int moved = step; moved != 0;) {
+        SmartPtr<Record> row;
+        uError err = cursor.getRow(row);
+        if (err.code() == kNoData) break;
+        EXPECT_OK(err) << "after " << rows.size() << " rows";
+        if (!row) break;
+        rows.push_back(*row);
+        EXPECT_OK(err = cursor.seek(step, moved)) << "from row " << rows.size();
+        if (err.failed()) break;
+    }
+    if (step < 0) std::reverse(rows.begin(), rows.end());
+    return rows;
 }
 
 }  // namespace trelm::test

@@ -1,14 +1,19 @@
 #pragma once
 
+#include <cstdint>
+#include <map>
 #include <memory>
 #include <string>
 #include <vector>
+
+#include <gtest/gtest.h>
 
 #include "ComponentRegistry.h"
 #include "FacebookLibrary.h"
 #include "Emulator.h"
 #include "FacebookSource.h"
 #include "HttpRequestFactory.h"
+#include "IQueryItems.h"
 #include "RuntimeConfiguration.h"
 #include "trelm/Configuration.h"
 #include "trelm/String.h"
@@ -47,11 +52,24 @@ public:
     // A client of its own, signed in with a fresh session of the demo user, for reading what the
     // service holds independently of the source.
     SmartPtr<FacebookLibrary> demoClient();
-    // Runs one statement with demoClient(); the rows' `field` values in answer order.
+    // Runs one statement with demoClient(); every row's fields as text, in answer order.
+    std::vector<std::map<std::string, std::string>> fqlRows(std::string const& query, std::string const& table);
+    // The rows' `field` values in answer order.
     std::vector<std::string> fqlColumn(std::string const& query, std::string const& table, std::string const& field);
 
     // The FQL statements the emulator answered since the log was last cleared, in order.
     std::vector<std::string> fqlStatements();
+
+    using Cursor = SmartPtr<IQueryItems::ICursor>;
+    using Record = Map<String, Variant>;
+    // Starts a query for object `type` (plus `extra` constraints) on `source` as a host would; the
+    // cursor, or null when the query was refused with `*refusal` (which must then be given).
+    static Cursor open(FacebookSource& source, int type, Vector<IQueryItems::Column> const& columns = {},
+                       std::vector<IQueryItems::Constraint> const& extra = {}, std::int64_t position = -1,
+                       uError* refusal = nullptr);
+    // The records from the current row on, moving by `step` until the cursor stops; in the
+    // cursor's order whichever way it went.
+    static std::vector<Record> walk(IQueryItems::ICursor& cursor, int step = 1);
 
 private:
     std::unique_ptr<emu::Emulator> emulator_;
@@ -61,6 +79,27 @@ private:
     RuntimeConfiguration runtime_;
     std::vector<std::unique_ptr<FacebookSource>> sources_;
     std::vector<String> registered_;
+};
+
+// A test suite's host, started once for the suite with `generator`, and its source "facebook"
+// signed in as the demo user. Each test starts with an empty request log.
+class EmulatorSuite : public ::testing::Test {
+protected:
+    static void startSuite(emu::GeneratorOptions const& generator = {}) {
+        host = new EmulatorHost(generator);
+        std::string error;
+        ASSERT_TRUE(host->start(error)) << error;
+        source = &host->addSource(host->demoGroup("facebook", true));
+    }
+    static void TearDownTestSuite() {
+        delete host;
+        host = nullptr;
+        source = nullptr;
+    }
+    void SetUp() override { host->emulator().log().clear(); }
+
+    static inline EmulatorHost* host = nullptr;
+    static inline FacebookSource* source = nullptr;
 };
 
 }  // namespace trelm::test

@@ -60,27 +60,16 @@ std::string text(Record const& record, char const* key) {
 // The demo user's mailbox of 45 threads of 60 messages (three pages of threads, two of messages
 // each) and 200 pending friend requests from users whose ids have 6 to 10 digits. The reference
 // copy is read through the FQL tables "thread" and "message", not the mailbox calls.
-class InboxCursorsTest : public ::testing::Test {
+class InboxCursorsTest : public EmulatorSuite {
 protected:
     static void SetUpTestSuite() {
-        emu::GeneratorOptions generator;
-        generator.users = 600;
-        generator.demoFriends = 50;
-        generator.friendsPerUser = 2;
-        generator.albumsPerUser = 0;
-        generator.postsPerUser = 0;
-        generator.friendRequests = 200;
-        generator.threadsPerUser = 45;
-        generator.messagesPerThread = 60;
-        host = new EmulatorHost(generator);
-        std::string error;
-        ASSERT_TRUE(host->start(error)) << error;
-        source = &host->addSource(host->demoGroup(kSourceName, true));
+        startSuite({.users = 600, .demoFriends = 50, .friendsPerUser = 2, .albumsPerUser = 0, .postsPerUser = 0,
+                    .threadsPerUser = 45, .messagesPerThread = 60, .friendRequests = 200});
 
         std::map<std::string, Thread> byId;
-        for (Row& r : fql("select thread_id, updated_time from thread where folder_id = 0", "thread"))
+        for (Row& r : host->fqlRows("select thread_id, updated_time from thread where folder_id = 0", "thread"))
             byId[r["thread_id"]] = Thread{r["thread_id"], std::stoi(r["updated_time"]), {}};
-        for (Row& r : fql("select message_id, thread_id, author_id, body, created_time from message where "
+        for (Row& r : host->fqlRows("select message_id, thread_id, author_id, body, created_time from message where "
                           "thread_id in (select thread_id from thread where folder_id = 0)",
                           "message")) {
             std::string const& mid = r["message_id"];
@@ -97,30 +86,13 @@ protected:
         std::sort(threads.begin(), threads.end(), [](Thread const& a, Thread const& b) {
             return std::make_tuple(b.updated, std::stoll(b.tid)) < std::make_tuple(a.updated, std::stoll(a.tid));
         });
-        for (auto& [uid, name] : names) name = fql("select name from user where uid = " + uid, "user").at(0)["name"];
+        for (auto& [uid, name] : names) name = host->fqlRows("select name from user where uid = " + uid, "user").at(0)["name"];
 
         requesters = host->fqlColumn(kRequestBase, "friend_info", "uid_from");
         std::sort(requesters.begin(), requesters.end(), [](auto const& a, auto const& b) { return a + " " < b + " "; });
     }
 
-    static void TearDownTestSuite() {
-        delete host;
-        host = nullptr;
-    }
 
-    void SetUp() override { host->emulator().log().clear(); }
-
-    static std::vector<Row> fql(std::string const& query, std::string const& rowElement) {
-        std::vector<Row> out;
-        Vector<Map<String, String>> rows;
-        unsigned count = 0;
-        EXPECT_OK(host->demoClient()->runFqlQuery(String(query), String(rowElement), rows, 0, count));
-        for (auto const& row : rows) {
-            Row& r = out.emplace_back();
-            for (auto const& [k, v] : row) r[k.str()] = v.str();
-        }
-        return out;
-    }
 
     // Every message at or after the bound (after it when `exclusive`), newest first, equal times
     // by descending id: "serviceid time author name body".
@@ -177,39 +149,15 @@ protected:
     }
 
     static uError open(int type, Vector<Column> const& columns, std::vector<Constraint> const& extra, Cursor& cursor) {
-        Vector<Constraint> constraints{
-            Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(type), Constraint::Equal}};
-        for (Constraint const& c : extra) EXPECT_OK(constraints.pushBack(c));
-        IQueryItems::StartQueryMessage msg(columns, constraints);
-        uError err = source->onMessage(msg);
-        cursor = msg.cursor;
+        uError err;
+        cursor = EmulatorHost::open(*source, type, columns, extra, -1, &err);
         return err;
     }
 
-    // Every record from the current row on, by getRow and seek(1).
-    static std::vector<Record> walk(Cursor const& cursor) {
-        std::vector<Record> rows;
-        for (int moved = 1; moved == 1;) {
-            SmartPtr<Record> row;
-            if (cursor->getRow(row).code() == kNoData) break;
-            rows.push_back(*row);
-            EXPECT_TRUE(cursor->seek(1, moved).ok());
-        }
-        return rows;
-    }
-
-    static EmulatorHost* host;
-    static FacebookSource* source;
-    static std::vector<Thread> threads;               // newest update first
-    static std::map<std::string, std::string> names;  // of the authors
-    static std::vector<std::string> requesters;       // in the friend request cursor's order
+    static inline std::vector<Thread> threads;               // newest update first
+    static inline std::map<std::string, std::string> names;  // of the authors
+    static inline std::vector<std::string> requesters;       // in the friend request cursor's order
 };
-
-EmulatorHost* InboxCursorsTest::host = nullptr;
-FacebookSource* InboxCursorsTest::source = nullptr;
-std::vector<Thread> InboxCursorsTest::threads;
-std::map<std::string, std::string> InboxCursorsTest::names;
-std::vector<std::string> InboxCursorsTest::requesters;
 
 TEST_F(InboxCursorsTest, MessagesComeOnceNewestFirstAndATimeBoundStopsReadingAtTheFirstOlderOne) {
     std::vector<std::string> const all = expectedMessages(0, false);
@@ -234,7 +182,7 @@ TEST_F(InboxCursorsTest, MessagesComeOnceNewestFirstAndATimeBoundStopsReadingAtT
         host->emulator().log().clear();
         Cursor cursor;
         ASSERT_OK(open(10, kMessageOrder, c.bound, cursor));
-        std::vector<Record> const rows = walk(cursor);
+        std::vector<Record> const rows = EmulatorHost::walk(*cursor);
         std::vector<std::string> got;
         std::set<GUID> guids;
         for (Record const& r : rows) {
@@ -310,7 +258,7 @@ TEST_F(InboxCursorsTest, FriendRequestsComeOnceAcrossPagesWithKeysetStatements) 
     Cursor cursor;
     ASSERT_OK(open(12, kRequestOrdering, {}, cursor));
     std::time_t const before = std::time(nullptr);
-    std::vector<Record> const rows = walk(cursor);
+    std::vector<Record> const rows = EmulatorHost::walk(*cursor);
     std::vector<std::string> seen;
     for (Record const& r : rows) {
         std::string const uid = text(r, "core_event_contactid");

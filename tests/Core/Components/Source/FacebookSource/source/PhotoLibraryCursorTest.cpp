@@ -74,36 +74,16 @@ std::string joined(Row const& row, std::vector<std::string> const& fields) {
 }
 
 // A demo user with over a thousand albums and thousands of photos and tags naming it.
-class PhotoLibraryCursorTest : public ::testing::TestWithParam<KindCase> {
+class PhotoLibraryCursorTest : public EmulatorSuite, public ::testing::WithParamInterface<KindCase> {
 protected:
-    static void SetUpTestSuite() {
-        emu::GeneratorOptions generator;
-        generator.users = 10;  // few users with content: the demo user holds the rows that count
-        generator.demoFriends = 3;
-        generator.albumsPerUser = 1200;
-        generator.photosPerAlbum = 2;
-        host = new EmulatorHost(generator);
-        std::string error;
-        ASSERT_TRUE(host->start(error)) << error;
-        source = &host->addSource(host->demoGroup("facebook", true));
-    }
-    static void TearDownTestSuite() {
-        delete host;
-        host = nullptr;
-    }
+    // Few users with content: the demo user holds the rows that count.
+    static void SetUpTestSuite() { startSuite({.users = 10, .demoFriends = 3, .albumsPerUser = 1200, .photosPerAlbum = 2}); }
 
     // The kind's rows with every field, in the cursor's order, read in one statement.
     void SetUp() override {
         KindCase const& c = GetParam();
-        Vector<Map<String, String>> answer;
-        unsigned count = 0;
-        ASSERT_OK(host->demoClient()->runFqlQuery(
-            String("select " + std::string(c.kind->fields) + " from " + c.kind->table + " where " + c.where),
-            c.kind->table, answer, 0, count));
-        for (auto const& fields : answer) {
-            Row& row = rows_.emplace_back();
-            for (auto const& [k, v] : fields) row[k.str()] = v.str();
-        }
+        rows_ = host->fqlRows("select " + std::string(c.kind->fields) + " from " + c.kind->table + " where " + c.where,
+                              c.kind->table);
         std::sort(rows_.begin(), rows_.end(), [&](Row const& a, Row const& b) {
             return c.ascending ? joined(a, c.orderFields) < joined(b, c.orderFields)
                                : joined(a, c.orderFields) > joined(b, c.orderFields);
@@ -118,36 +98,31 @@ protected:
         if (c.orderKey != nullptr) {
             EXPECT_OK(columns.pushBack({Metadata::Key(c.orderKey, TRELM_TYPES::STRING), c.ascending}));
         }
-        IQueryItems::StartQueryMessage msg(
-            columns, Vector<Constraint>{{Metadata::Key("core_object_type", TRELM_TYPES::INT32), c.type}}, position);
-        msg.interactive = position == -1;
-        EXPECT_OK(source->onMessage(msg));
-        return msg.cursor;
+        return EmulatorHost::open(*source, c.type, columns, {}, position);
     }
 
+    static std::string identity(Map<String, Variant> const& row) {
+        std::string text;
+        for (std::string const& key : GetParam().identityKeys) {
+            text += (text.empty() ? "" : " ") + row.search(String(key))->asString().str();
+        }
+        return text;
+    }
     static std::string identityAt(Cursor const& cursor, SmartPtr<Map<String, Variant>>* record = nullptr) {
         SmartPtr<Map<String, Variant>> row;
         EXPECT_OK(cursor->getRow(row));
-        std::string text;
-        for (std::string const& key : GetParam().identityKeys) {
-            text += (text.empty() ? "" : " ") + (row ? row->search(String(key))->asString().str() : "?");
-        }
         if (record != nullptr) *record = row;
-        return text;
+        return row ? identity(*row) : "?";
     }
 
-    // The cursor's rows from where it stands, seeking by `step` until it cannot move; in the
-    // cursor's order whichever way it went. `guids` collects their GUIDs.
+    // The cursor's rows from where it stands, seeking by `step` until it cannot move, in the
+    // cursor's order; `guids` collects their GUIDs.
     static std::vector<std::string> walk(Cursor const& cursor, int step, std::set<GUID>* guids = nullptr) {
         std::vector<std::string> seen;
-        int moved = step;
-        while (moved != 0) {
-            SmartPtr<Map<String, Variant>> row;
-            seen.push_back(identityAt(cursor, &row));
-            if (guids != nullptr) guids->insert(row->search("core_object_id")->asGUID());
-            EXPECT_TRUE(cursor->seek(step, moved).ok());
+        for (auto const& row : EmulatorHost::walk(*cursor, step)) {
+            seen.push_back(identity(row));
+            if (guids != nullptr) guids->insert(row.search("core_object_id")->asGUID());
         }
-        if (step < 0) std::reverse(seen.begin(), seen.end());
         return seen;
     }
 
@@ -161,13 +136,9 @@ protected:
         return out;
     }
 
-    static EmulatorHost* host;
-    static FacebookSource* source;
     std::vector<Row> rows_;
 };
 
-EmulatorHost* PhotoLibraryCursorTest::host = nullptr;
-FacebookSource* PhotoLibraryCursorTest::source = nullptr;
 
 TEST_P(PhotoLibraryCursorTest, WalksBothWaysVisitEveryRowOnceInOrderWithOneStatementPerWindow) {
     Cursor cursor = open();
