@@ -358,13 +358,13 @@ TEST_F(HostCommandsTest, ListingOnATerminalShowsProgressWithTheTotal) {
     std::string command = "exec '" + std::string(TRELM_HOST_PROGRAM) + "'";
     for (std::string const& arg :
          {std::string("--state-dir"), stateDir(), std::string("--no-emulator"), std::string("--connect-to"),
-          "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()), std::string("--connect-to"),
-          "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()), std::string("--ca-file"),
-          emulator_->caFile(), std::string("--config"), config_, std::string("--plugin"),
+          "api.facebook.com:80:127.0.0.1:" + std::to_string(h.emulator->httpPort()), std::string("--connect-to"),
+          "api.facebook.com:443:127.0.0.1:" + std::to_string(h.emulator->httpsPort()), std::string("--ca-file"),
+          h.emulator->caFile(), std::string("--config"), h.config, std::string("--plugin"),
           std::string(TRELMFACEBOOK_MODULE), std::string("query"), std::string("contacts"), std::string("--all")}) {
         command += " '" + arg + "'";
     }
-    auto result = runner_.run("/usr/bin/script", {"-qec", command, "/dev/null"});
+    auto result = h.runner.run("/usr/bin/script", {"-qec", command, "/dev/null"});
     ASSERT_EQ(result.exitCode, 0) << result.out;
     std::size_t const friends = fql("select uid2 from friend where uid1=" + std::string(kDemoUser)).size();
     ASSERT_GT(friends, 0u);
