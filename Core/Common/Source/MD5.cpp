@@ -48,8 +48,8 @@ String MD5FinalHex(MD5_CTX* ctx) {
 }
 
 String md5Hex(String const& text) {
-    // One context per thread, kept from call to call.
-    thread_local MD5_CTX ctx;
+    // The call's own context: a thread-local one would be freed after OpenSSL's clean-up at exit.
+    MD5_CTX ctx;
     MD5Init(&ctx);
     MD5Update(&ctx, reinterpret_cast<unsigned char const*>(text.cStr()), text.size());
     return MD5FinalHex(&ctx);

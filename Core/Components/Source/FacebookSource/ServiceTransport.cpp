@@ -44,9 +44,10 @@ uError ServiceTransport::makeBaseArgs(String const& method, Map<String, String>&
 
 String ServiceTransport::signature(Map<String, String> const& args, String const& secret) {
     // The pieces go into the digest one by one: the same bytes as the text run together, without
-    // building it. One context per thread, kept from call to call.
-    thread_local MD5_CTX ctx;
-    auto add = [](String const& piece) {
+    // building it. The context is the call's own: a thread-local one in the plug-in would outlive
+    // the unloaded plug-in's code and OpenSSL's clean-up at exit.
+    MD5_CTX ctx;
+    auto add = [&ctx](String const& piece) {
         MD5Update(&ctx, reinterpret_cast<unsigned char const*>(piece.cStr()), piece.size());
     };
     static unsigned char const equals = '=';
