@@ -63,15 +63,6 @@ TEST(DataGeneratorTest, GraphHasTheShapeTheClientDependsOn) {
               0);
 }
 
-TEST(DataGeneratorTest, GeneratingOverExistingDataLeavesItAlone) {
-    GeneratedStore data(options(5));
-    const std::string before = data.dump();
-    GeneratorOptions other = options(99);
-    other.users = 50;
-    EXPECT_FALSE(data.store().generate(other));
-    EXPECT_EQ(data.dump(), before);
-}
-
 TEST(DataGeneratorTest, NegativeSizesAreRefused) {
     std::string error;
     auto store = SqliteStore::openDatabase(":memory:", error);
