@@ -52,20 +52,6 @@ GeneratedStore* FqlEngineTest::data_ = nullptr;
 std::vector<std::int64_t> FqlEngineTest::friends_;
 std::map<std::string, std::string> FqlEngineTest::names_;
 
-// The contact cursor's first page: friends only, in the text order of their ids (which the
-// generated ids make differ from their numeric order), with their names and pictures.
-TEST_F(FqlEngineTest, ContactPageHoldsTheFirstFriendsInTextOrder) {
-    std::vector<std::int64_t> numeric = friends_;
-    std::sort(numeric.begin(), numeric.end());
-    ASSERT_NE(numeric, friends_) << "the generated ids must sort differently as text and as numbers";
-    const std::vector<Row> page = data_->fql(kContacts + " order by concat(uid,' ') asc limit 150");
-    EXPECT_EQ(uidsOf(page), std::vector<std::int64_t>(friends_.begin(), friends_.begin() + 150));
-    for (const Row& r : page) {
-        EXPECT_EQ(r.at("name"), names_.at(r.at("uid")));
-        EXPECT_EQ(r.at("pic_big"), "http://pics.trelm.example/n/" + r.at("uid") + ".jpg");
-    }
-}
-
 TEST_F(FqlEngineTest, OrderingTiesBreakByTheKeyInTheSameDirection) {
     for (const char* direction : {"desc", "asc"}) {
         auto rows = data_->fql("select pid, created from photo where owner = me() order by created " +
