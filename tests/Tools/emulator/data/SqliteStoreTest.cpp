@@ -105,6 +105,7 @@ TEST(SqliteStoreTest, MethodsRejectMalformedArguments) {
         {"status flag", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "hi", "yes", "", r); }},
         {"empty status", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "", "1", "", r); }},
         {"getInfo uid", [&](XmlNode& r) { return s.usersGetInfo(DemoAccount::uid, kMe + ",x", "name", r); }},
+        {"getInfo field", [&](XmlNode& r) { return s.usersGetInfo(DemoAccount::uid, kMe, "name,color", r); }},
         {"friends of another", [&](XmlNode& r) { return s.friendsGet(DemoAccount::uid, "12345", r); }},
     };
     const std::string before = data.dump();
