@@ -52,18 +52,6 @@ GeneratedStore* FqlEngineTest::data_ = nullptr;
 std::vector<std::int64_t> FqlEngineTest::friends_;
 std::map<std::string, std::string> FqlEngineTest::names_;
 
-TEST_F(FqlEngineTest, OrderingTiesBreakByTheKeyInTheSameDirection) {
-    for (const char* direction : {"desc", "asc"}) {
-        auto rows = data_->fql("select pid, created from photo where owner = me() order by created " +
-                               std::string(direction));
-        auto expected = data_->sql("SELECT pid FROM photo WHERE owner = ? ORDER BY created " + std::string(direction) +
-                                       ", pid " + direction,
-                                   {DemoAccount::uid});
-        ASSERT_EQ(rows.size(), expected.size());
-        for (std::size_t i = 0; i < rows.size(); ++i) EXPECT_EQ(rows[i].at("pid"), expected[i][0]) << direction;
-    }
-}
-
 // Hidden profile values are shown to the user and friends only; other rows are simply absent.
 TEST_F(FqlEngineTest, ViewerSeesOnlyWhatTheyMay) {
     auto stranger = data_->sql("SELECT uid FROM user WHERE (hidden & 1) <> 0 AND birthday IS NOT NULL AND uid NOT IN "
