@@ -180,26 +180,6 @@ TEST_F(FqlEngineTest, ComparisonsConvertTextOnlyAgainstNumbers) {
     }
 }
 
-TEST_F(FqlEngineTest, HostileAndMalformedStatementsLeaveTheDataAlone) {
-    const std::string before = data_->dump();
-    const char* const statements[] = {
-        "select uid from user where uid = 1; drop table user",
-        "select uid from user where uid = 1 union select secret from application",
-        "select uid from user where name = 'x'' OR 1=1; DROP TABLE friend; --'",
-        "update user set name = 'x' where uid = 1",
-    };
-    for (const char* q : statements) {
-        XmlNode root("fql_query_response");
-        Status s = data_->store().fqlQuery(DemoAccount::uid, q, root);
-        if (s) {
-            EXPECT_EQ(s->code, 601) << q;
-        }
-    }
-    EXPECT_EQ(data_->dump(), before);
-    EXPECT_EQ(data_->sqlInt("SELECT count(*) FROM friend WHERE uid1 = ?", {DemoAccount::uid}),
-              static_cast<std::int64_t>(friends_.size()));
-}
-
 // The paged statements must cost in proportion to the page: an index range, no sort of the
 // whole friend list, no scan of the user table.
 TEST_F(FqlEngineTest, ClientStatementsRunOnIndexRanges) {
