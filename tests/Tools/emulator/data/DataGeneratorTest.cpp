@@ -23,6 +23,8 @@ TEST(DataGeneratorTest, SameSeedGivesTheSameDataAndAnotherSeedDoesNot) {
     EXPECT_NE(dumpA, c.dump());
 }
 
+// Counts and equal-time runs are asserted by the suites that need them (the cursor walks, the
+// stream answer); here the invariants no walk would notice.
 TEST(DataGeneratorTest, GraphHasTheShapeTheClientDependsOn) {
     GeneratedStore data(options(3));
     const std::vector<std::int64_t> me = {DemoAccount::uid};
@@ -45,31 +47,16 @@ TEST(DataGeneratorTest, GraphHasTheShapeTheClientDependsOn) {
                           "p.owner = s.source_id)"),
               0)
         << "photo posts show the poster's own photos";
-    EXPECT_GT(data.sqlInt("SELECT count(*) FROM (SELECT created_time FROM stream GROUP BY created_time HAVING "
-                          "count(*) > 1)"),
-              0);
-    EXPECT_GT(data.sqlInt("SELECT count(*) FROM (SELECT created FROM photo GROUP BY created HAVING count(*) > 1)"), 0);
-    EXPECT_EQ(data.sqlInt("SELECT count(*) FROM friend_request WHERE uid_to = ?", me), 7);
     EXPECT_EQ(data.sqlInt("SELECT count(*) FROM friend_request r JOIN friend f ON f.uid1 = r.uid_to AND f.uid2 = "
                           "r.uid_from"),
               0)
         << "requests come from non-friends";
-    EXPECT_EQ(data.sqlInt("SELECT count(*) FROM thread WHERE owner = ?", me), 25);
     EXPECT_EQ(data.sqlInt("SELECT count(*) FROM album a WHERE size <> (SELECT count(*) FROM photo p WHERE p.aid = "
                           "a.aid)"),
               0);
     EXPECT_EQ(data.sqlInt("SELECT count(*) FROM photo p JOIN album a ON a.aid = p.aid WHERE p.owner <> a.owner OR "
                           "p.visible <> a.visible"),
               0);
-}
-
-TEST(DataGeneratorTest, GeneratingOverExistingDataLeavesItAlone) {
-    GeneratedStore data(options(5));
-    const std::string before = data.dump();
-    GeneratorOptions other = options(99);
-    other.users = 50;
-    EXPECT_FALSE(data.store().generate(other));
-    EXPECT_EQ(data.dump(), before);
 }
 
 TEST(DataGeneratorTest, NegativeSizesAreRefused) {

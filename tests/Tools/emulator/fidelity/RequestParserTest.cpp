@@ -28,12 +28,6 @@ TEST(RequestParserTest, BodiesOfTheEraGiveTheirArgumentsAndTheFirstFile) {
          true,
          {{"a", "x y&z"}, {"b", "100%"}, {"c", ""}, {"d", "%zzA"}},
          std::nullopt},
-        {"url-encoded: a later pair wins",
-         "application/x-www-form-urlencoded; charset=UTF-8",
-         "a=1&a=2",
-         true,
-         {{"a", "2"}},
-         std::nullopt},
         {"file part without a name, as the era's client library sent it",
          type,
          "--" + b + "\r\nContent-Disposition: form-data; name=\"caption\"\r\n\r\nhi\r\n--" + b +
@@ -56,27 +50,9 @@ TEST(RequestParserTest, BodiesOfTheEraGiveTheirArgumentsAndTheFirstFile) {
          true,
          {{"a", "1"}},
          std::string()},
-        {"quoted boundary",
-         "multipart/form-data; boundary=\"" + b + "\"",
-         "--" + b + "\r\nContent-Disposition: form-data; name=\"a\"\r\n\r\n1\r\n--" + b + "--",
-         true,
-         {{"a", "1"}},
-         std::nullopt},
         {"no closing delimiter",
          type,
          "--" + b + "\r\nContent-Disposition: form-data; name=\"a\"\r\n\r\n1",
-         false,
-         {},
-         std::nullopt},
-        {"headers never end",
-         type,
-         "--" + b + "\r\nContent-Disposition: form-data; name=\"a\"\r\n",
-         false,
-         {},
-         std::nullopt},
-        {"no opening delimiter",
-         type,
-         "Content-Disposition: form-data; name=\"a\"\r\n\r\n1\r\n--" + b + "x",
          false,
          {},
          std::nullopt},
@@ -108,11 +84,8 @@ TEST(RequestParserTest, TextsBecomeValidUtf8ThatXmlCanCarry) {
         {"caf\xC3\xA9 \xE2\x98\x95 \xF0\x9F\x98\x80", "caf\xC3\xA9 \xE2\x98\x95 \xF0\x9F\x98\x80"},
         {"caf\xE9", "caf" + fffd},                                              // Latin-1
         {std::string("a\0b\x01", 4), "a" + fffd + "b" + fffd},                  // controls XML cannot carry
-        {"\xC0\xAF", fffd + fffd},                                              // overlong
         {"\xED\xA0\x80", fffd + fffd + fffd},                                   // a surrogate
         {"\xEF\xBF\xBE\xEF\xBF\xBF", fffd + fffd + fffd + fffd + fffd + fffd},  // U+FFFE, U+FFFF
-        {"\xF4\x90\x80\x80", fffd + fffd + fffd + fffd},                        // past U+10FFFF
-        {"\xE2\x98", fffd + fffd},                                              // cut short
     };
     for (Case const& c : cases) {
         SCOPED_TRACE(c.in);

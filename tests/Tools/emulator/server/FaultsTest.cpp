@@ -24,12 +24,9 @@ TEST_F(FaultsTest, ServiceErrorFaultsHitTheCallsTheirRuleSelects) {
     };
     const std::vector<Case> cases = {
         {"fql.query:error=2,every=3", "fql.query", {0, 0, 2, 0, 0, 2, 0}},
-        {"facebook.fql.query:error=1", "facebook.fql.query", {1, 1}},
         {"*:error=2,every=2", "stream.get", {0, 2, 0, 2}},
         {"stream.get:error=2", "fql.query", {0, 0, 0}},
-        {"*:rate=0.001,burst=3", "stream.get", {0, 0, 0, 4, 4}},
         {"fql.query:expire_after=2", "fql.query", {0, 0, 102, 102}},
-        {"fql.query:error=2,p=1", "fql.query", {2, 2}},
     };
     for (const Case& c : cases) {
         SCOPED_TRACE(c.rule);

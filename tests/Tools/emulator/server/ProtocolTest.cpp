@@ -27,29 +27,14 @@ TEST_F(ProtocolTest, EachInvalidRequestGetsItsErrorDocument) {
     const std::vector<ErrorCase> cases = {
         {"wrong signature", false,
          [](ProtocolTest& t) { auto f = t.fqlCall(); f["sig"] = std::string(32, '0'); return f; }, 104},
-        {"uppercase signature", false,
-         [](ProtocolTest& t) {
-             auto f = t.fqlCall();
-             for (char& c : f["sig"]) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-             return f;
-         },
-         104},
         {"signed with the application secret instead of the session's", false,
          [](ProtocolTest& t) { return sign(t.fqlCall(), DemoAccount::appSecret); }, 104},
         {"unknown api_key", false, [](ProtocolTest& t) { return resigned(t, [](Fields& f) { f["api_key"] = "0123"; }); },
-         101},
-        {"missing api_key", false, [](ProtocolTest& t) { return resigned(t, [](Fields& f) { f.erase("api_key"); }); },
          101},
         {"missing method", false, [](ProtocolTest& t) { return resigned(t, [](Fields& f) { f.erase("method"); }); }, 3},
         {"unknown method", false, [](ProtocolTest& t) { return t.sessionCall("facebook.photos.delete"); }, 3},
         {"missing session", false,
          [](ProtocolTest& t) { return t.appCall("facebook.fql.query", {{"query", kFql}}); }, 102},
-        {"unknown session", false,
-         [](ProtocolTest& t) {
-             Session forged{"nobody-1", "secret", DemoAccount::uid, 0};
-             return t.sessionCall("facebook.fql.query", {{"query", kFql}}, &forged);
-         },
-         102},
         {"expired session", false,
          [](ProtocolTest& t) {
              auto f = t.fqlCall();
@@ -59,8 +44,6 @@ TEST_F(ProtocolTest, EachInvalidRequestGetsItsErrorDocument) {
          102},
         {"login over plain HTTP", false, [](ProtocolTest& t) { return t.loginFields(); }, 8},
         {"wrong password", true, [](ProtocolTest& t) { return t.loginFields("guess"); }, 100},
-        {"login without e-mail", true,
-         [](ProtocolTest& t) { return t.appCall("auth.login", {{"password", DemoAccount::password}}); }, 100},
         {"fql.query without query", false, [](ProtocolTest& t) { return t.sessionCall("fql.query"); }, 100},
         // The service's order: an earlier check wins when several fail.
         {"unknown api_key before bad signature", false,
@@ -71,10 +54,6 @@ TEST_F(ProtocolTest, EachInvalidRequestGetsItsErrorDocument) {
          [](ProtocolTest& t) { auto f = t.fqlCall(); f["session_key"] = "x"; return f; }, 102},
         {"bad signature before unknown method", false,
          [](ProtocolTest& t) { auto f = t.sessionCall("no.such"); f["sig"] = "0"; return f; }, 104},
-        {"bad signature before missing parameter", false,
-         [](ProtocolTest& t) { auto f = t.sessionCall("fql.query"); f["sig"] = "0"; return f; }, 104},
-        {"bad signature before login over HTTP", false,
-         [](ProtocolTest& t) { auto f = t.loginFields(); f["sig"] = "0"; return f; }, 104},
     };
 
     TestClient https;
@@ -200,31 +179,17 @@ TEST_F(ProtocolTest, StrictCallIdRejectsACallIdThatDoesNotGrow) {
 }
 
 TEST_F(ProtocolTest, KeepAliveServesManyRequestsOnOneConnection) {
-    TestClient https;
-    useHttps(https);
-    struct Case {
-        const char* name;
-        std::function<Reply()> send;
-        int requests;
-    };
-    const std::vector<Case> cases = {
-        {"http", [&] { return client.postForm(emulator->httpUrl(), fqlCall()); }, 300},
-        {"https", [&] { return https.postForm(kHttpsUrl, loginFields()); }, 60},
-    };
-    for (const Case& c : cases) {
-        SCOPED_TRACE(c.name);
-        long connections = 0;
-        long port = -1;
-        for (int i = 0; i < c.requests; ++i) {
-            const Reply r = c.send();
-            ASSERT_EQ(r.code, CURLE_OK);
-            ASSERT_EQ(r.errorCode(), 0) << r.body;
-            connections += r.newConnections;
-            if (port < 0) port = r.localPort;
-            EXPECT_EQ(r.localPort, port) << "request " << i;
-        }
-        EXPECT_EQ(connections, 1);
+    long connections = 0;
+    long port = -1;
+    for (int i = 0; i < 300; ++i) {
+        const Reply r = client.postForm(emulator->httpUrl(), fqlCall());
+        ASSERT_EQ(r.code, CURLE_OK);
+        ASSERT_EQ(r.errorCode(), 0) << r.body;
+        connections += r.newConnections;
+        if (port < 0) port = r.localPort;
+        EXPECT_EQ(r.localPort, port) << "request " << i;
     }
+    EXPECT_EQ(connections, 1);
 }
 
 TEST_F(ProtocolTest, StopDoesNotWaitForIdleKeepAliveConnections) {

@@ -180,9 +180,6 @@ TEST_F(EventCursorTest, StreamRowsBecomeStatusAndPhotoRecordsWithNamesFromOneLoo
     ASSERT_OK(cache->getGuid(cursor->tag(), {kServiceId.key, "1_5"}, false, again));
     EXPECT_EQ(again, guids[1]);
 
-    EXPECT_EQ(sent("facebook.stream.get", "viewer_id"), (std::vector<std::string>{"42", "42"}));
-    EXPECT_EQ(sent("facebook.stream.get", "end_time"), (std::vector<std::string>{"0", "859"}));
-    EXPECT_EQ(sent("facebook.stream.get", "limit"), (std::vector<std::string>{"75", "75"}));
     // Both posts of author 42 list it: the ids are not de-duplicated.
     EXPECT_EQ(sent("facebook.fql.query", "query"),
               std::vector<std::string>{"select uid,name from user where uid in (42,9,42)"});
