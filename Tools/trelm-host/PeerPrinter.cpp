@@ -90,19 +90,7 @@ void PeerPrinter::gather(std::vector<std::string> header, std::vector<std::strin
 }
 
 void PeerPrinter::finish() {
-    std::vector<std::size_t> width;
-    for (auto const& row : rows_) {
-        width.resize(std::max(width.size(), row.size()), 0);
-        for (std::size_t c = 0; c < row.size(); ++c) width[c] = std::max(width[c], row[c].size());
-    }
-    for (auto const& row : rows_) {
-        std::string line;
-        for (std::size_t c = 0; c < row.size(); ++c) {
-            line += row[c];
-            if (c + 1 < row.size()) line += std::string(width[c] - row[c].size() + 2, ' ');
-        }
-        out_ << line << '\n';
-    }
+    writeTable(out_, rows_);
     rows_.clear();
     out_.flush();
 }

@@ -9,6 +9,22 @@
 namespace trelm {
 namespace host {
 
+void writeTable(std::ostream& out, std::vector<std::vector<std::string>> const& rows) {
+    std::vector<std::size_t> width;
+    for (auto const& row : rows) {
+        width.resize(std::max(width.size(), row.size()), 0);
+        for (std::size_t c = 0; c < row.size(); ++c) width[c] = std::max(width[c], row[c].size());
+    }
+    for (auto const& row : rows) {
+        std::string line;
+        for (std::size_t c = 0; c < row.size(); ++c) {
+            line += row[c];
+            if (c + 1 < row.size()) line += std::string(width[c] - row[c].size() + 2, ' ');
+        }
+        out << line << '\n';
+    }
+}
+
 namespace {
 
 using json = nlohmann::ordered_json;
@@ -246,18 +262,7 @@ void Printer::finish() {
             rows.push_back({instance.name.str(), instance.id.str(), stateOf(instance),
                             joined(instance.restored, ",", "-")});
         }
-        std::vector<std::size_t> width(rows.front().size(), 0);
-        for (auto const& row : rows) {
-            for (std::size_t c = 0; c < row.size(); ++c) width[c] = std::max(width[c], row[c].size());
-        }
-        for (auto const& row : rows) {
-            std::string line;
-            for (std::size_t c = 0; c < row.size(); ++c) {
-                line += row[c];
-                if (c + 1 < row.size()) line += std::string(width[c] - row[c].size() + 2, ' ');
-            }
-            out_ << line << '\n';
-        }
+        writeTable(out_, rows);
     }
     pending_.clear();
     out_.flush();

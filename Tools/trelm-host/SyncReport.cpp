@@ -125,18 +125,7 @@ void SyncReport::finish() {
                             std::to_string(s.counts.changed), std::to_string(s.counts.unchanged),
                             std::to_string(s.counts.removed), std::to_string(s.requests), state});
         }
-        std::vector<std::size_t> width(rows.front().size(), 0);
-        for (auto const& row : rows) {
-            for (std::size_t c = 0; c < row.size(); ++c) width[c] = std::max(width[c], row[c].size());
-        }
-        for (auto const& row : rows) {
-            std::string line;
-            for (std::size_t c = 0; c < row.size(); ++c) {
-                line += row[c];
-                if (c + 1 < row.size()) line += std::string(width[c] - row[c].size() + 2, ' ');
-            }
-            out_ << line << '\n';
-        }
+        writeTable(out_, rows);
     }
     summaries_.clear();
     out_.flush();
