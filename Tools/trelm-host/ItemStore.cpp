@@ -1,16 +1,12 @@
 #include "ItemStore.h"
 
-#include <fcntl.h>
 #include <sqlite3.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
-#include <cerrno>
-#include <cstring>
 #include <ctime>
 
 #include <nlohmann/json.hpp>
 
+#include "PrivateFile.h"
 #include "WipeMessage.h"
 #include "trelm/GUID.h"
 
@@ -107,20 +103,6 @@ private:
     sqlite3* db_;
     bool open_ = false;
 };
-
-// Made with mode 0600 before SQLite opens it (SQLite would make it 0644 minus the umask); an
-// existing file is narrowed to 0600.
-uError createPrivateFile(String const& path) {
-    int fd = ::open(path.cStr(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600);
-    if (fd < 0) return TRELM_ERROR_MSG(kFailure, "cannot create the item store " + path + ": " + std::strerror(errno));
-    struct stat st {};
-    uError result = TRELM_OK();
-    if (::fstat(fd, &st) != 0 || ((st.st_mode & 07777) != 0600 && ::fchmod(fd, 0600) != 0)) {
-        result = TRELM_ERROR_MSG(kFailure, "cannot make the item store " + path + " private: " + std::strerror(errno));
-    }
-    ::close(fd);
-    return result;
-}
 
 json valueToJson(Variant const& value) {
     switch (value.type()) {

@@ -1,14 +1,9 @@
 #include "RuntimeConfiguration.h"
 
-#include <fcntl.h>
 #include <sqlite3.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <cstring>
 
 #include "GetRuntimeConfigurationMessage.h"
+#include "PrivateFile.h"
 #include "ResetRuntimeConfigurationMessage.h"
 #include "RuntimeConfigurationMessage.h"
 
@@ -63,24 +58,6 @@ uError bindText(sqlite3* db, sqlite3_stmt* stmt, int index, String const& text) 
         return sqliteError(db, "bind");
     }
     return TRELM_OK();
-}
-
-// Creates the file with mode 0600 before SQLite opens it (SQLite would create it 0644 minus the
-// umask) and narrows an existing file to 0600.
-uError createPrivateFile(String const& path) {
-    int fd = ::open(path.cStr(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600);
-    if (fd < 0) {
-        return TRELM_ERROR_MSG(kFailure, "cannot create " + path + ": " + std::strerror(errno));
-    }
-    struct stat st {};
-    uError result = TRELM_OK();
-    if (::fstat(fd, &st) != 0) {
-        result = TRELM_ERROR_MSG(kFailure, "cannot stat " + path + ": " + std::strerror(errno));
-    } else if ((st.st_mode & 07777) != 0600 && ::fchmod(fd, 0600) != 0) {
-        result = TRELM_ERROR_MSG(kFailure, "cannot make " + path + " private: " + std::strerror(errno));
-    }
-    ::close(fd);
-    return result;
 }
 
 }  // namespace
