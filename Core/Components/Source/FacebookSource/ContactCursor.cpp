@@ -187,19 +187,7 @@ uError ContactCursor::getObjectType(String& type) {
 uError ContactCursor::convertItem(Map<String, String> const& row, RecordPtr& record, int& /*convertError*/) {
     // A row without its id could never be told apart from others: leave it out.
     if (row.search("uid") == nullptr) return TRELM_ERROR(kNoData);
-    // The fixed keys come from the prototype; copying a map copies its tree without a key
-    // search per entry, which matters at 150 records a page.
-    try {
-        if (record->empty()) {
-            *record = prototype_;
-        } else {
-            for (auto const& [key, value] : prototype_) {
-                TRELM_RETURN_IF_ERROR(record->insert(key, value));
-            }
-        }
-    } catch (std::bad_alloc const&) {
-        return TRELM_ERROR(kOutOfMemory);
-    }
+    TRELM_RETURN_IF_ERROR(addPrototype(prototype_, record));
     for (Field const& f : fields_) {
         TRELM_RETURN_IF_ERROR(copyField(row, f.rowField, f.recordKey, f.type, record));
     }

@@ -326,6 +326,19 @@ void FacebookSource::FqlCursorBase::setEmptyResult() {
     windowLoaded_ = true;
 }
 
+uError FacebookSource::FqlCursorBase::addPrototype(Record const& prototype, RecordPtr& record) {
+    try {
+        if (record->empty()) {
+            *record = prototype;
+            return TRELM_OK();
+        }
+    } catch (std::bad_alloc const&) {
+        return TRELM_ERROR(kOutOfMemory);
+    }
+    for (auto const& [key, value] : prototype) TRELM_RETURN_IF_ERROR(record->insert(key, value));
+    return TRELM_OK();
+}
+
 uError FacebookSource::FqlCursorBase::stringSid(RecordPtr const& record, Metadata::Key const& sidKey,
                                                 char const* missing, Metadata::Key& key, String& serviceId) {
     Variant const* value = record->search(sidKey.name());

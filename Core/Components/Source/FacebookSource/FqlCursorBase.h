@@ -109,6 +109,12 @@ protected:
     static uError copyField(Map<String, String> const& row, String const& field, String const& recordKey,
                             TRELM_TYPES::TYPES type, RecordPtr& record);
 
+    // Puts the keys every record of a cursor carries with the same value into `record`: an empty
+    // record becomes a copy of `prototype` (copying a map copies its tree without a key search
+    // per entry, which matters at 150 records a page); other keys of a non-empty one stay.
+    // kOutOfMemory when a copy cannot be made.
+    static uError addPrototype(Record const& prototype, RecordPtr& record);
+
     // getSid for a cursor whose records carry their service id as a string under `sidKey`:
     // `key` becomes `sidKey` and `serviceId` the record's value. kInvalid with `missing` as the
     // message when the record lacks it; the conversion's error when it is not a string.

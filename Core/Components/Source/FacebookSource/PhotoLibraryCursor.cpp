@@ -244,17 +244,7 @@ uError PhotoLibraryCursor::getObjectType(String& type) {
 }
 
 uError PhotoLibraryCursor::convertItem(Map<String, String> const& row, RecordPtr& record, int& /*convertError*/) {
-    try {
-        if (record->empty()) {
-            *record = prototype_;
-        } else {
-            for (auto const& [key, value] : prototype_) {
-                TRELM_RETURN_IF_ERROR(record->insert(key, value));
-            }
-        }
-    } catch (std::bad_alloc const&) {
-        return TRELM_ERROR(kOutOfMemory);
-    }
+    TRELM_RETURN_IF_ERROR(addPrototype(prototype_, record));
     for (Field const& f : fields_) {
         TRELM_RETURN_IF_ERROR(copyField(row, f.rowField, f.recordKey, f.type, record));
     }
