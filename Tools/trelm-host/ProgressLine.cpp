@@ -19,7 +19,8 @@ void ProgressLine::show(std::size_t rows, char const* label) {
     auto const now = std::chrono::steady_clock::now();
     if (now - last_ < std::chrono::milliseconds(200)) return;  // a few redraws a second at most
     double const seconds = std::chrono::duration<double>(now - start_).count();
-    double const rate = seconds > 0 ? static_cast<double>(rows) / seconds : 0.0;
+    std::size_t const doneNow = rows > earlier_ ? rows - earlier_ : 0;
+    double const rate = seconds > 0 ? static_cast<double>(doneNow) / seconds : 0.0;
     char line[160];
     char const* lead = label == nullptr ? "" : label;
     char const* gap = label == nullptr ? "" : ": ";

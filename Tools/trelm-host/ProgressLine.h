@@ -26,6 +26,8 @@ public:
     bool enabled() const { return enabled_; }
     // The number of rows the work will end with, once known.
     void setTotal(std::size_t total) { total_ = total; }
+    // Rows done before this line started (by an earlier run): shown, but not in the rate.
+    void setEarlier(std::size_t rows) { earlier_ = rows; }
     // Shows `rows` done; redraws a few times a second at most. `label` (optional) leads the line.
     void show(std::size_t rows, char const* label = nullptr);
     // Removes the line, so that other output starts at the beginning of an empty line.
@@ -37,6 +39,7 @@ private:
     std::chrono::steady_clock::time_point const start_;
     std::chrono::steady_clock::time_point last_;
     std::optional<std::size_t> total_;
+    std::size_t earlier_ = 0;
     bool shown_ = false;
 };
 

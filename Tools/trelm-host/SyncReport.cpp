@@ -42,8 +42,7 @@ void SyncReport::wiped(String const& tag, unsigned items) {
 
 void SyncReport::begin(std::string const& kind, int type, ItemStore::Pass const& pass, bool restart) {
     kind_ = kind;
-    started_ = std::chrono::steady_clock::now();
-    shown_ = {};
+    line_.emplace(showProgress_, progress_);
     if (format_ == Printer::Format::JsonLines) {
         json from = nullptr;
         if (!pass.resume.empty()) from = pass.resume;
@@ -69,23 +68,14 @@ void SyncReport::begin(std::string const& kind, int type, ItemStore::Pass const&
 }
 
 void SyncReport::progress(std::size_t rows, std::size_t read, std::optional<unsigned> total) {
-    if (!showProgress_) return;
-    auto const now = std::chrono::steady_clock::now();
-    if (now - shown_ < std::chrono::milliseconds(200)) return;  // a few updates a second at most
-    double const seconds = std::chrono::duration<double>(now - started_).count();
-    char line[160];
-    std::string of = total ? " of " + std::to_string(*total) : std::string();
-    std::snprintf(line, sizeof line, "\r%s: %zu rows%s, %.0f rows/s ", kind_.c_str(), rows, of.c_str(),
-                  seconds > 0 ? read / seconds : 0.0);
-    progress_ << line << std::flush;
-    lineShown_ = true;
-    shown_ = now;
+    if (!line_) return;
+    if (total) line_->setTotal(*total);
+    line_->setEarlier(rows - read);
+    line_->show(rows, kind_.c_str());
 }
 
 void SyncReport::endProgress() {
-    if (!lineShown_) return;
-    progress_ << "\r\033[K" << std::flush;
-    lineShown_ = false;
+    if (line_) line_->clear();
 }
 
 void SyncReport::summary(KindSummary const& summary) {

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -10,6 +9,7 @@
 
 #include "ItemStore.h"
 #include "Printer.h"
+#include "ProgressLine.h"
 
 namespace trelm {
 namespace host {
@@ -69,10 +69,8 @@ private:
     std::ostream& out_;
     std::ostream& progress_;
     bool const showProgress_;
-    std::string kind_;  // of the progress line
-    std::chrono::steady_clock::time_point started_;
-    std::chrono::steady_clock::time_point shown_;
-    bool lineShown_ = false;
+    std::string kind_;                  // of the progress line
+    std::optional<ProgressLine> line_;  // the current kind's, made by begin()
     std::vector<KindSummary> summaries_;  // table rows waiting for finish()
 };
 
