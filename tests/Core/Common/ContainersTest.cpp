@@ -28,30 +28,6 @@ TEST(MapTest, InsertReplacesAnEqualKeyAndAbsentKeysAreNullOrRemovedQuietly) {
     EXPECT_TRUE(m.empty());
 }
 
-TEST(MapTest, IterationRunsInAscendingByteOrder) {
-    Map<String, int> m;
-    for (char const* k : {"session_key", "api_key", "call_id", "Zeta", "v", "format"}) {
-        ASSERT_OK(m.insert(k, 0));
-    }
-    std::vector<std::string> keys;
-    for (auto const& entry : m) keys.push_back(entry.first.str());
-    EXPECT_EQ(keys, (std::vector<std::string>{"Zeta", "api_key", "call_id", "format",
-                                              "session_key", "v"}));
-}
-
-TEST(SetTest, KeepsOneCopyOfEqualValuesInOrder) {
-    Set<String> s;
-    ASSERT_OK(s.insert("b"));
-    ASSERT_OK(s.insert("a"));
-    ASSERT_OK(s.insert("b"));
-    EXPECT_EQ(s.size(), 2u);
-    EXPECT_TRUE(s.contains("a"));
-    EXPECT_EQ(*s.begin(), "a");
-    EXPECT_OK(s.remove("zzz"));
-    EXPECT_OK(s.remove("a"));
-    EXPECT_FALSE(s.contains("a"));
-}
-
 TEST(VectorTest, InsertAndEraseRejectPositionsOutOfRange) {
     Vector<int> v(16);  // growth step accepted and ignored
     EXPECT_CODE(v.insert(1, 5), kInvalid);

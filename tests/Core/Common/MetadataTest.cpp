@@ -9,26 +9,6 @@ namespace {
 
 using TRELM_TYPES::TYPES;
 
-TEST(MetadataTest, HostCoreKeysAreKnownWithTheirTypes) {
-    struct Case {
-        char const* name;
-        TYPES type;
-    } const cases[] = {{"core_object_id", TRELM_TYPES::GUID_TYPE},
-                       {"core_object_type", TRELM_TYPES::INT32},
-                       {"core_object_time", TRELM_TYPES::INT32},
-                       {"core_object_deleted", TRELM_TYPES::BOOL},
-                       {"core_object_source", TRELM_TYPES::STRING},
-                       {"core_contact_profile_picture_url", TRELM_TYPES::STRING},
-                       {"core_service_id", TRELM_TYPES::STRING},
-                       {"media_uri", TRELM_TYPES::STRING},
-                       {"media_notes", TRELM_TYPES::STRING}};
-    for (auto const& c : cases) {
-        TYPES type = TRELM_TYPES::NONE;
-        ASSERT_OK(Metadata::getType(c.name, type)) << c.name;
-        EXPECT_EQ(type, c.type) << c.name;
-    }
-}
-
 // A second registration of a name keeps the first type; a name never registered is not found and
 // leaves the caller's type alone.
 TEST(MetadataTest, SecondRegistrationKeepsTheFirstTypeAndUnknownNamesAreNotFound) {

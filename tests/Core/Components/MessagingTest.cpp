@@ -38,34 +38,34 @@ protected:
     ComponentRegistry registry_;
 };
 
-TEST_F(MessagingTest, TargetedMessageReachesOnlyThatComponentAndReturnsItsResult) {
-    Recorder a("a", log_), b("b", log_, TRELM_ERROR(kNotSignedIn));
-    ASSERT_OK(registry_.add("a", &a));
-    ASSERT_OK(registry_.add("b", &b));
-    WipeMessage msg;
-    EXPECT_CODE(msg.send("b"), kNotSignedIn);
-    EXPECT_EQ(log_, (std::vector<std::string>{"b:WipeMessage"}));
-}
-
-TEST_F(MessagingTest, UnknownTargetOrNoActiveRegistryIsNotFound) {
-    Recorder a("a", log_);
-    ASSERT_OK(registry_.add("a", &a));
-    WipeMessage msg;
-    EXPECT_CODE(msg.send("RuntimeConfiguration"), kNotFound);
-    registry_.deactivate();
-    EXPECT_CODE(msg.send("a"), kNotFound);
-    EXPECT_CODE(msg.send(""), kNotFound);
-    EXPECT_TRUE(log_.empty());
-}
-
-TEST_F(MessagingTest, BroadcastReachesEveryoneInOrderAndReturnsTheFirstFailure) {
-    Recorder a("a", log_), b("b", log_, TRELM_ERROR(kInvalid)), c("c", log_),
-        d("d", log_, TRELM_ERROR(kFailure));
+// Components c, a, b (answering kInvalid), d (kFailure) registered in that order. A target gets
+// the message alone; an empty target is everyone in registration order, answered with the first
+// failure; an unknown target, or any target without an active registry, is not found.
+TEST_F(MessagingTest, MessageReachesItsTargetOrEveryoneAndReturnsTheirResult) {
+    struct Case {
+        char const* target;
+        bool active;
+        unsigned code;
+        std::vector<std::string> log;
+    } const cases[] = {
+        {"b", true, kInvalid, {"b:WipeMessage"}},
+        {"c", true, kSuccess, {"c:WipeMessage"}},
+        {"", true, kInvalid, {"c:WipeMessage", "a:WipeMessage", "b:WipeMessage", "d:WipeMessage"}},
+        {"RuntimeConfiguration", true, kNotFound, {}},
+        {"a", false, kNotFound, {}},
+        {"", false, kNotFound, {}},
+    };
+    Recorder a("a", log_), b("b", log_, TRELM_ERROR(kInvalid)), c("c", log_), d("d", log_, TRELM_ERROR(kFailure));
     for (Recorder* r : {&c, &a, &b, &d}) ASSERT_OK(registry_.add(r->name(), r));
-    WipeMessage msg;
-    EXPECT_CODE(msg.send(""), kInvalid);
-    EXPECT_EQ(log_, (std::vector<std::string>{"c:WipeMessage", "a:WipeMessage", "b:WipeMessage",
-                                              "d:WipeMessage"}));
+    for (Case const& k : cases) {
+        SCOPED_TRACE(std::string("'") + k.target + (k.active ? "'" : "' inactive"));
+        log_.clear();
+        if (!k.active) registry_.deactivate();
+        WipeMessage msg;
+        EXPECT_CODE(msg.send(k.target), k.code);
+        EXPECT_EQ(log_, k.log);
+        registry_.activate();
+    }
 }
 
 // On a WipeMessage, sends a second message to `next` (and to everyone), and registers a new

@@ -88,19 +88,26 @@ TEST_F(RuntimeConfigurationTest, ValueWithoutTextFormStoresNothingOfItsMessage) 
     EXPECT_EQ(get("src", {"a", "list", "z"}), (Texts{"-", "-", "-"}));
 }
 
-TEST_F(RuntimeConfigurationTest, FileStoreKeepsValuesAcrossReopen) {
+// Configuring a store again keeps its values (the in-memory store would lose them if it were
+// opened afresh); a file store keeps them for the next store opening the file.
+TEST_F(RuntimeConfigurationTest, StoreKeepsItsValuesAcrossConfigurationAndReopen) {
     TempDir dir;
-    std::string path = dir.file("runtime.db");
-    Configuration::Group group("RuntimeConfiguration", {{"path", Variant(String(path))}});
-    ASSERT_OK(store_.sendConfig(group));
-    ASSERT_OK(put("src", {{"session", Variant("kept")}}));
+    std::string const path = dir.file("runtime.db");
+    for (bool const file : {false, true}) {
+        SCOPED_TRACE(file ? "file" : "memory");
+        Configuration::Group group("RuntimeConfiguration");
+        if (file) group = Configuration::Group("RuntimeConfiguration", {{"path", Variant(String(path))}});
+        ASSERT_OK(store_.sendConfig(group));
+        ASSERT_OK(put("src", {{"a", Variant(file ? "kept" : "1")}}));
+        ASSERT_OK(store_.sendConfig(group));
+        EXPECT_EQ(get("src", {"a"}), (Texts{file ? "kept" : "1"}));
+    }
     store_.close();
-
     RuntimeConfiguration again("RuntimeConfiguration2");
     ASSERT_OK(again.open(String(path)));
-    Map<String, Variant> values{{"session", Variant()}};
+    Map<String, Variant> values{{"a", Variant()}};
     ASSERT_OK(again.get("src", values));
-    EXPECT_EQ(values.search("session")->asString(), "kept");
+    EXPECT_EQ(values.search("a")->asString(), "kept");
 }
 
 TEST_F(RuntimeConfigurationTest, StoreFileIsPrivateWhateverTheUmask) {
@@ -138,15 +145,6 @@ TEST_F(RuntimeConfigurationTest, FailedOpenLeavesNoStoreInsteadOfAFreshOne) {
     EXPECT_CODE(store_.open(""), kInvalid);
     EXPECT_OK(store_.open(":memory:"));
     EXPECT_OK(put("src", {{"a", Variant("1")}}));
-}
-
-// The in-memory store would lose its values if configuring it again opened it afresh.
-TEST_F(RuntimeConfigurationTest, ConfiguringTheSameStoreAgainKeepsItsValues) {
-    Configuration::Group group("RuntimeConfiguration");
-    ASSERT_OK(store_.sendConfig(group));
-    ASSERT_OK(put("src", {{"a", Variant("1")}}));
-    ASSERT_OK(store_.sendConfig(group));
-    EXPECT_EQ(get("src", {"a"}), (Texts{"1"}));
 }
 
 TEST_F(RuntimeConfigurationTest, ConcurrentWritersAndReadersSeeWholeValues) {

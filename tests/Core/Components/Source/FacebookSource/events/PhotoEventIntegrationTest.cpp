@@ -20,13 +20,7 @@ std::string const kFriendPhotos =
 // Forty friends with three albums of five photos each, of every five photos the last three in
 // one second: the photo cursor pages through them 150 at a time.
 TEST(PhotoEventTest, WalkVisitsEveryFriendPhotoOnceInTheQueryOrderAcrossWindows) {
-    emu::GeneratorOptions generator;
-    generator.users = 200;
-    generator.demoFriends = 40;
-    generator.albumsPerUser = 3;
-    generator.photosPerAlbum = 5;
-    generator.photosPerSecond = 3;
-    EmulatorHost host(generator);
+    EmulatorHost host({.users = 200, .demoFriends = 40, .albumsPerUser = 3, .photosPerAlbum = 5, .photosPerSecond = 3});
     std::string error;
     ASSERT_TRUE(host.start(error)) << error;
     FacebookSource& source = host.addSource(host.demoGroup("facebook", true));

@@ -91,33 +91,31 @@ TEST_F(ConnectionInfoTest, SettersSendExactlyTheirStoreMessages) {
     }
 }
 
-// A session signed for another application is worthless; the same application keeps it. Memory only.
-TEST_F(ConnectionInfoTest, ChangedApplicationDropsSessionAndUser) {
+// A session signed for another application is worthless; the same application keeps it. Dropping
+// the session alone keeps the user. Memory only.
+TEST_F(ConnectionInfoTest, ChangedApplicationDropsSessionAndUserDroppingTheSessionKeepsTheUser) {
     struct Case {
-        char const* key;
-        char const* secret;
-        bool keeps;
-    } const cases[] = {{"k", "s", true}, {"k2", "s", false}, {"k", "s2", false}};
+        char const* name;
+        std::function<uError(Info&)> change;
+        bool keepsSession, keepsUser;
+    } const cases[] = {
+        {"same application", [](Info& i) { return i.setAppConfig("k", "s"); }, true, true},
+        {"other key", [](Info& i) { return i.setAppConfig("k2", "s"); }, false, false},
+        {"other secret", [](Info& i) { return i.setAppConfig("k", "s2"); }, false, false},
+        {"session dropped", [](Info& i) { return i.invalidateSessionConfigWithoutUser(false); }, false, true},
+    };
     for (Case const& c : cases) {
-        signIn();
+        SCOPED_TRACE(c.name);
+        signIn("sid", "ssec", "7");
         store.clearRecords();
-        ASSERT_OK(info->setAppConfig(c.key, c.secret));
+        ASSERT_OK(c.change(*info));
         String out;
-        EXPECT_EQ(info->getSessionId(out).ok(), c.keeps) << c.key << c.secret;
-        EXPECT_EQ(info->getUserId(out).ok(), c.keeps) << c.key << c.secret;
+        EXPECT_EQ(info->getSessionId(out).ok(), c.keepsSession);
+        EXPECT_EQ(info->getSessionSecret(out).ok(), c.keepsSession);
+        EXPECT_EQ(info->getUserId(out).ok() && out == "7", c.keepsUser);
         EXPECT_TRUE(store.records().empty());
         ASSERT_OK(info->setAppConfig("k", "s"));
     }
-}
-
-TEST_F(ConnectionInfoTest, DroppingTheSessionAloneKeepsTheUser) {
-    signIn("sid", "ssec", "7");
-    ASSERT_OK(info->invalidateSessionConfigWithoutUser(false));
-    String out;
-    ASSERT_OK(info->getUserId(out));
-    EXPECT_EQ(out, "7");
-    EXPECT_CODE(info->getSessionId(out), kNotSignedIn);
-    EXPECT_CODE(info->getSessionSecret(out), kNotSignedIn);
 }
 
 // A failed store is reported, memory keeps the change, and the second message is not sent.

@@ -102,19 +102,6 @@ TEST_F(LoginSessionTest, FailedLoginsAnswerTheirCodeAndChangeNothing) {
     }
 }
 
-TEST_F(LoginSessionTest, LoginWithoutConfiguredCredentialsIsNotSignedInAndSendsNothing) {
-    lib = makeSmart<FacebookLibrary>();
-    auto noLogin = makeSmart<FacebookLibrary::ConnectionInfo>(kTag);
-    ASSERT_OK(noLogin->setAppConfig("k", "s"));
-    ASSERT_OK(lib->setup(noLogin));
-    uError err = lib->connect();
-    EXPECT_CODE(err, kNotSignedIn);
-    ASSERT_NE(err.cause(), nullptr);
-    EXPECT_EQ(err.cause()->code(), kNotSet);
-    EXPECT_TRUE(http.exchanges().empty());
-    EXPECT_EQ(takeEvents(), expected(false, "8000001c", ""));
-}
-
 TEST_F(LoginSessionTest, SessionWithoutSecretSignsWithTheApplicationSecret) {
     http.queue(loginAnswer("42", false));
     ASSERT_OK(lib->connect());
@@ -156,12 +143,30 @@ TEST_F(LoginSessionTest, ConnectWipesAndWakesOnlyWhenAnotherUserSignsIn) {
     }
 }
 
-TEST_F(LoginSessionTest, FailedConnectAnnouncesTheCodeWithoutUserAndWipesNothing) {
-    store.put(kTag, "facebook_source_lastuser", "7");
-    http.queue(errorAnswer("100"));
-    EXPECT_CODE(lib->connect(), kNotSignedIn);
-    EXPECT_EQ(takeEvents(), expected(false, "8000001c", ""));
-    EXPECT_EQ(store.get(kTag, "facebook_source_lastuser"), "7");
+// Without credentials nothing is sent; a refused login keeps the last user. Either way everyone
+// hears "not signed in" without a user, and nothing is wiped.
+TEST_F(LoginSessionTest, FailedConnectAnnouncesNotSignedInWithoutUserAndWipesNothing) {
+    for (bool const configured : {true, false}) {
+        SCOPED_TRACE(configured ? "refused login" : "no credentials");
+        size_t const sent = http.exchanges().size();
+        store.put(kTag, "facebook_source_lastuser", "7");
+        if (configured) {
+            http.queue(errorAnswer("100"));
+        } else {
+            lib = makeSmart<FacebookLibrary>();
+            auto noLogin = makeSmart<FacebookLibrary::ConnectionInfo>(kTag);
+            ASSERT_OK(noLogin->setAppConfig("k", "s"));
+            ASSERT_OK(lib->setup(noLogin));
+        }
+        uError const err = lib->connect();
+        EXPECT_CODE(err, kNotSignedIn);
+        if (!configured) {
+            EXPECT_EQ(err.cause() ? err.cause()->code() : 0u, unsigned(kNotSet));
+        }
+        EXPECT_EQ(http.exchanges().size() - sent, configured ? 1u : 0u);
+        EXPECT_EQ(takeEvents(), expected(false, "8000001c", ""));
+        EXPECT_EQ(store.get(kTag, "facebook_source_lastuser"), "7");
+    }
 }
 
 TEST_F(LoginSessionTest, AppliedSessionStaysInMemoryWhileTheLastUserIsStored) {

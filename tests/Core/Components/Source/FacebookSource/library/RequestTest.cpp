@@ -69,29 +69,24 @@ TEST_F(RequestTest, CallsThatCannotAuthenticateAnswerNotSignedInWithoutARequest)
     EXPECT_TRUE(http.exchanges().empty());
 }
 
-TEST_F(RequestTest, OnlyStatus200To299IsSuccess) {
+// Only a status from 200 to 299 is an answer; a failed or impossible exchange is a failure.
+TEST_F(RequestTest, OnlyStatus200To299IsSuccessAndTransportFailuresAreFailures) {
     signIn();
-    for (int status : {199, 200, 204, 299, 300, 404, 503}) {
+    for (int status : {199, 200, 204, 299, 300, 404, 503, 0}) {
         bool const ok = status >= 200 && status <= 299;
-        http.queue({status, "<ok/>", {}});
+        http.queue({status, "<ok/>", status == 0 ? TRELM_ERROR(kFailure) : uError()});
         String response = "before";
         EXPECT_CODE(call(&response), ok ? kSuccess : kFailure) << status;
         EXPECT_EQ(response, ok ? "<ok/>" : "") << status;
     }
-}
-
-TEST_F(RequestTest, TransportFailuresAreFailures) {
-    signIn();
-    http.queue({0, "", TRELM_ERROR(kFailure)});
-    EXPECT_CODE(call(), kFailure);
     http.refuseRequests(true);
     EXPECT_CODE(call(), kFailure);
     ASSERT_OK(registry.remove("HttpRequestFactory"));
     EXPECT_CODE(call(), kFailure);
 }
 
-// The service's error codes, and which of them drop the session (in memory and in the store)
-// while keeping the user.
+// The service's error codes, and which of them drop the session (in memory and in the store,
+// so that the next call fails without going out) while keeping the user.
 TEST_F(RequestTest, ServiceErrorsTranslateAndSessionErrorsDropTheSession) {
     struct Case {
         char const* serviceCode;
@@ -121,17 +116,11 @@ TEST_F(RequestTest, ServiceErrorsTranslateAndSessionErrorsDropTheSession) {
         if (drops) {
             EXPECT_EQ(records[0].type, "ResetRuntimeConfigurationMessage");
             EXPECT_EQ(records[0].keys, (Set<String>{"facebook_source_session_id", "facebook_source_session_secret"}));
+            size_t const sent = http.exchanges().size();
+            EXPECT_CODE(call(), kNotSignedIn) << "a refused session fails the next call locally";
+            EXPECT_EQ(http.exchanges().size(), sent);
         }
     }
-}
-
-// Once the service refused the session, the next call fails without going out.
-TEST_F(RequestTest, RefusedSessionFailsTheNextCallLocally) {
-    signIn();
-    http.queue(String("<error_response><error_code>102</error_code></error_response>"));
-    EXPECT_CODE(call(), kNotSignedIn);
-    EXPECT_CODE(call(), kNotSignedIn);
-    EXPECT_EQ(http.exchanges().size(), 1u);
 }
 
 }  // namespace

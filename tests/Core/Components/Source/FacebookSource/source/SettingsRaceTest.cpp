@@ -20,10 +20,7 @@ namespace {
 // page must still be read: the same account is configured each time, so each request is signed
 // with the old or the new settings, both valid.
 TEST(SettingsRaceTest, LoginChangesWhileCursorsPageAreSerialisedWithTheirSigning) {
-    emu::GeneratorOptions data;
-    data.users = 1000;
-    data.demoFriends = 400;
-    EmulatorHost host(data);
+    EmulatorHost host({.users = 1000, .demoFriends = 400});
     std::string error;
     ASSERT_TRUE(host.start(error)) << error;
 
