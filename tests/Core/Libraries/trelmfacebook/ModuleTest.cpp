@@ -13,6 +13,7 @@
 
 using trelm::Component;
 using trelm::String;
+using trelm::TRELM_TYPES::TYPES;
 
 namespace {
 
@@ -68,6 +69,31 @@ TEST_F(ModuleTest, EveryFactoryMakesIndependentComponentsOfItsOwnIdentifier) {
         EXPECT_EQ(first->componentId() + "|" + second->componentId(), id + "|" + id);
         EXPECT_EQ(first->name() + "|" + second->name(), "first|second");
         EXPECT_EQ(first->state(), Component::State::Created);
+    }
+}
+
+TEST_F(ModuleTest, LoadingRegistersTheSixteenKeysWithTheirTypes) {
+    struct Expected {
+        char const* name;
+        TYPES type;
+    };
+    // Coordinates and the modification time are text keys on purpose; only the photo count is a
+    // number.
+    TYPES const text = trelm::TRELM_TYPES::STRING;
+    Expected const keys[] = {
+        {"facebook_media_owner_service_id", text},      {"facebook_media_album_service_id", text},
+        {"facebook_media_thumb_uri", text},             {"facebook_photo_tag_photo_service_id", text},
+        {"facebook_photo_tag_tagged_service_id", text}, {"facebook_photo_tag_x", text},
+        {"facebook_photo_tag_y", text},                 {"facebook_photo_tag_text", text},
+        {"facebook_album_owner_service_id", text},      {"facebook_album_modified", text},
+        {"facebook_album_location", text},              {"facebook_album_link", text},
+        {"facebook_album_notes", text},                 {"facebook_album_photocount", trelm::TRELM_TYPES::INT32},
+        {"facebook_album_cover_service_id", text},      {"facebook_album_type", text},
+    };
+    for (Expected const& key : keys) {
+        TYPES type = trelm::TRELM_TYPES::NONE;
+        EXPECT_OK(trelm::Metadata::getType(key.name, type)) << key.name;
+        EXPECT_EQ(type, key.type) << key.name;
     }
 }
 

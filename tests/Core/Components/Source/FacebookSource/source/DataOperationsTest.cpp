@@ -96,5 +96,31 @@ TEST(DataOperationsTest, OperationsBeforeStartupFailWithNotSet) {
     EXPECT_FALSE(query.cursor);
 }
 
+// The dump pads every key to 30 columns; a longer key gets (length - 30) spaces instead.
+TEST(RecordDumpTest, PadsKeysToThirtyColumnsAndRendersByRegisteredType) {
+    trelm_RegisterMetadataType("test_dump_unsigned", TRELM_TYPES::UINT32);
+    GUID const guid = GUID::generate();
+    std::string const key30(30, 'k');
+    std::string const key33(33, 'k');
+    struct Case {
+        Record input;
+        std::string text;
+    };
+    std::vector<Case> const cases = {
+        {record({{"core_object_type", 4}}), "core_object_type:" + std::string(14, ' ') + "4\n"},
+        {record({{key30.c_str(), "v"}}), key30 + ":v\n"},
+        {record({{key33.c_str(), "v"}}), key33 + ":   v\n"},
+        {record({{"core_object_id", guid}}), "core_object_id:" + std::string(16, ' ') + guid.toString().str() + "\n"},
+        {record({{"test_dump_unsigned", 7u}, {"core_contact_name", "Ann"}}),
+         "core_contact_name:" + std::string(13, ' ') + "Ann\n" + "test_dump_unsigned:" + std::string(12, ' ') + "7\n"},
+        {Record(), ""},
+    };
+    for (Case const& c : cases) {
+        String out("> ");
+        sprintTags(out, c.input);
+        EXPECT_EQ(out.str(), "> " + c.text);
+    }
+}
+
 }  // namespace
 }  // namespace trelm
