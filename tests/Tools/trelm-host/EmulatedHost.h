@@ -29,16 +29,23 @@ public:
     void useConfig(std::string const& text) { config = runner.writeFile("config.json", text); }
     std::string stateDir() const { return runner.folder() + "/state"; }
 
-    // Runs the host with `command`; no password may show in what it prints.
-    ProgramRunner::Result run(std::vector<std::string> const& command, std::string const& format = "json",
-                              std::string const& input = {}, int signal = 0, int afterMs = 0,
-                              bool* signalled = nullptr) {
+    // The host's arguments for `command` against this emulator, in this scratch folder.
+    std::vector<std::string> arguments(std::vector<std::string> const& command) const {
         std::vector<std::string> args{
-            "--format", format, "--state-dir", stateDir(), "--no-emulator",
+            "--state-dir", stateDir(), "--no-emulator",
             "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator->httpPort()),
             "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator->httpsPort()),
             "--ca-file", emulator->caFile(), "--config", config, "--plugin", TRELMFACEBOOK_MODULE};
         args.insert(args.end(), command.begin(), command.end());
+        return args;
+    }
+
+    // Runs the host with `command`; no password may show in what it prints.
+    ProgramRunner::Result run(std::vector<std::string> const& command, std::string const& format = "json",
+                              std::string const& input = {}, int signal = 0, int afterMs = 0,
+                              bool* signalled = nullptr) {
+        std::vector<std::string> args{"--format", format};
+        for (std::string& arg : arguments(command)) args.push_back(std::move(arg));
         ProgramRunner::Result result = runner.run(TRELM_HOST_PROGRAM, args, input, signal, afterMs, signalled);
         for (std::string const& text : {result.out, result.err}) {
             EXPECT_EQ(text.find(emu::DemoAccount::password), std::string::npos) << text;

@@ -118,8 +118,8 @@ TEST_F(HostCommandsTest, DemoTourListsTheFriendsPostsUploadsAndFetchesTheFirstFr
 }
 
 // The session outlives the run in the state folder; when the service has forgotten it, the host
-// signs in once more and the command still succeeds.
-TEST_F(HostCommandsTest, StoredSessionIsReusedAndAForgottenOneCostsExactlyOneLogin) {
+// signs in once more and the command still succeeds; a changed login never uses the old session.
+TEST_F(HostCommandsTest, StoredSessionIsReusedForgottenCostsOneLoginAndChangedLoginSignsInAnew) {
     auto first = host({"query", "contacts", "--limit", "1"});
     ASSERT_EQ(first.exitCode, 0) << first.err;
     ASSERT_EQ(requests("auth.login").size(), 1u);
@@ -155,6 +155,21 @@ TEST_F(HostCommandsTest, StoredSessionIsReusedAndAForgottenOneCostsExactlyOneLog
     EXPECT_EQ(logins[1]["session"], "new");
     EXPECT_EQ(logins[1]["code"], "0x00000000");
     EXPECT_EQ(linesOfType(third, "record").size(), 3u);
+
+    // A session belongs to its account: after the login changes, the new account signs in.
+    useConfig(configWithPassword(emu::SecondAccount::password, emu::SecondAccount::email));
+    h.emulator->log().clear();
+    auto other = host({"insert", "status", "posted by the second account"});
+    ASSERT_EQ(other.exitCode, 0) << other.err;
+    logins = linesOfType(other, "login");
+    ASSERT_EQ(logins.size(), 1u) << other.out;
+    EXPECT_EQ(logins[0]["session"], "new");
+    EXPECT_NE(logins[0]["user"], kDemoUser);
+    ASSERT_EQ(requests("auth.login").size(), 1u);
+    auto posts = requests("users.setStatus");
+    ASSERT_EQ(posts.size(), 1u);
+    EXPECT_NE(posts[0].args.at("session_key").find(logins[0]["user"].get<std::string>()), std::string::npos)
+        << "the status went out with the new account's session";
 }
 
 TEST_F(HostCommandsTest, ShellFetchesRecordsOfTheLastListingAgain) {
@@ -280,31 +295,6 @@ TEST_P(StoppedSignInTest, LeavesNeitherPasswordNorApplicationSecretInTheStateFol
 INSTANTIATE_TEST_SUITE_P(Signals, StoppedSignInTest, ::testing::Values(SIGKILL, SIGTERM, SIGINT, SIGHUP),
                          [](auto const& info) { return std::string(sigabbrev_np(info.param)); });
 
-// A stored session belongs to the account it was made for: after the configured login changes,
-// the next command signs the new account in instead of acting with the old account's session.
-TEST_F(HostCommandsTest, ChangedLoginSignsTheNewAccountInInsteadOfUsingTheStoredSession) {
-    auto first = host({"query", "contacts", "--limit", "1"});
-    ASSERT_EQ(first.exitCode, 0) << first.err;
-    auto again = host({"query", "contacts", "--limit", "1"});
-    ASSERT_EQ(again.exitCode, 0) << again.err;
-    ASSERT_EQ(linesOfType(again, "login").at(0)["session"], "stored") << "the same account reuses its session";
-    ASSERT_EQ(requests("auth.login").size(), 1u);
-
-    useConfig(configWithPassword(emu::SecondAccount::password, emu::SecondAccount::email));
-    h.emulator->log().clear();
-    auto other = host({"insert", "status", "posted by the second account"});
-    ASSERT_EQ(other.exitCode, 0) << other.err;
-    auto logins = linesOfType(other, "login");
-    ASSERT_EQ(logins.size(), 1u) << other.out;
-    EXPECT_EQ(logins[0]["session"], "new");
-    EXPECT_NE(logins[0]["user"], kDemoUser);
-    ASSERT_EQ(requests("auth.login").size(), 1u);
-    auto posts = requests("users.setStatus");
-    ASSERT_EQ(posts.size(), 1u);
-    EXPECT_NE(posts[0].args.at("session_key").find(logins[0]["user"].get<std::string>()), std::string::npos)
-        << "the status went out with the new account's session";
-}
-
 // A throttled or briefly unavailable service is waited out step by step: the listing completes
 // with every friend exactly once, and each wait is reported on standard error.
 TEST_F(HostCommandsTest, ThrottledOrUnavailableServiceIsWaitedOutAndTheListingCompletes) {
@@ -356,14 +346,7 @@ TEST_F(HostCommandsTest, DamagedStateDatabaseIsNamedWithHowToStartAfresh) {
 TEST_F(HostCommandsTest, ListingOnATerminalShowsProgressWithTheTotal) {
     // `script` gives the host a terminal on every stream, as a user's shell does.
     std::string command = "exec '" + std::string(TRELM_HOST_PROGRAM) + "'";
-    for (std::string const& arg :
-         {std::string("--state-dir"), stateDir(), std::string("--no-emulator"), std::string("--connect-to"),
-          "api.facebook.com:80:127.0.0.1:" + std::to_string(h.emulator->httpPort()), std::string("--connect-to"),
-          "api.facebook.com:443:127.0.0.1:" + std::to_string(h.emulator->httpsPort()), std::string("--ca-file"),
-          h.emulator->caFile(), std::string("--config"), h.config, std::string("--plugin"),
-          std::string(TRELMFACEBOOK_MODULE), std::string("query"), std::string("contacts"), std::string("--all")}) {
-        command += " '" + arg + "'";
-    }
+    for (std::string const& arg : h.arguments({"query", "contacts", "--all"})) command += " '" + arg + "'";
     auto result = h.runner.run("/usr/bin/script", {"-qec", command, "/dev/null"});
     ASSERT_EQ(result.exitCode, 0) << result.out;
     std::size_t const friends = fql("select uid2 from friend where uid1=" + std::string(kDemoUser)).size();

@@ -81,19 +81,16 @@ TEST(FqlStatements, DeeplyNestedOrEndlessStatementsAreRefused) {
         const char* name;
         std::string query;
     };
-    std::string parens = "select uid from user where ";
-    for (int i = 0; i < 5000; ++i) parens += "(";
-    std::string nots = "select uid from user where ";
-    for (int i = 0; i < 5000; ++i) nots += "not ";
-    std::string minus = "select uid from user where uid = ";
-    for (int i = 0; i < 5000; ++i) minus += "-";
-    std::string ands = "select uid from user where uid = 1";
-    for (int i = 0; i < 5000; ++i) ands += " and uid = 1";
-    std::string sums = "select 1";
-    for (int i = 0; i < 5000; ++i) sums += " + 1";
-    sums += " from user where uid = 1";
-    const Case cases[] = {{"parentheses", parens + "uid = 1"}, {"not", nots + "uid = 1"}, {"minus", minus + "1"},
-                          {"and", ands},                       {"sum", sums}};
+    auto repeated = [](std::string head, const char* unit, const char* tail) {
+        for (int i = 0; i < 5000; ++i) head += unit;
+        return head + tail;
+    };
+    const std::string where = "select uid from user where ";
+    const Case cases[] = {{"parentheses", repeated(where, "(", "uid = 1")},
+                          {"not", repeated(where, "not ", "uid = 1")},
+                          {"minus", repeated(where + "uid = ", "-", "1")},
+                          {"and", repeated(where + "uid = 1", " and uid = 1", "")},
+                          {"sum", repeated("select 1", " + 1", " from user where uid = 1")}};
     for (const Case& c : cases) {
         FqlPlan plan;
         Status s = FqlEngine::compile(kViewer, 1300000000, c.query, plan);
