@@ -2,11 +2,15 @@
 
 #include <sqlite3.h>
 
+#include <sys/stat.h>
+
 #include <ctime>
 
 #include <nlohmann/json.hpp>
 
 #include "PrivateFile.h"
+#include "SqliteStatement.h"
+#include "SqliteTransaction.h"
 #include "WipeMessage.h"
 #include "trelm/GUID.h"
 
@@ -32,77 +36,8 @@ char const kSchema[] =
     " pass INTEGER NOT NULL, open INTEGER NOT NULL, resume TEXT NOT NULL, boundaries TEXT NOT NULL,"
     " rows INTEGER NOT NULL, PRIMARY KEY (source, account, object_type)) WITHOUT ROWID;";
 
-uError sqliteError(sqlite3* db, char const* what) {
-    return TRELM_ERROR_MSG(kFailure, String("item store: ") + what + ": " +
-                                         (db != nullptr ? sqlite3_errmsg(db) : "out of memory"));
-}
-
-// A prepared statement, finalised when it goes out of scope.
-class Statement {
-public:
-    Statement(sqlite3* db, char const* sql) : db_(db) {
-        if (sqlite3_prepare_v2(db, sql, -1, &stmt_, nullptr) != SQLITE_OK) stmt_ = nullptr;
-    }
-    ~Statement() { sqlite3_finalize(stmt_); }
-    Statement(Statement const&) = delete;
-    Statement& operator=(Statement const&) = delete;
-
-    uError ready() const { return stmt_ != nullptr ? TRELM_OK() : sqliteError(db_, "prepare"); }
-    Statement& reset() {
-        sqlite3_reset(stmt_);
-        sqlite3_clear_bindings(stmt_);
-        return *this;
-    }
-    Statement& text(int index, std::string const& value) {
-        sqlite3_bind_text(stmt_, index, value.data(), static_cast<int>(value.size()), SQLITE_TRANSIENT);
-        return *this;
-    }
-    Statement& text(int index, String const& value) { return text(index, value.str()); }
-    Statement& integer(int index, std::int64_t value) {
-        sqlite3_bind_int64(stmt_, index, value);
-        return *this;
-    }
-    // SQLITE_ROW, SQLITE_DONE or an error code.
-    int step() { return sqlite3_step(stmt_); }
-    uError run(char const* what) { return step() == SQLITE_DONE ? TRELM_OK() : sqliteError(db_, what); }
-    std::string column(int index) const {
-        auto const* text = reinterpret_cast<char const*>(sqlite3_column_text(stmt_, index));
-        return text != nullptr ? std::string(text, static_cast<std::size_t>(sqlite3_column_bytes(stmt_, index))) : "";
-    }
-    std::int64_t columnInt(int index) const { return sqlite3_column_int64(stmt_, index); }
-
-private:
-    sqlite3* db_;
-    sqlite3_stmt* stmt_ = nullptr;
-};
-
-uError exec(sqlite3* db, char const* sql) {
-    if (sqlite3_exec(db, sql, nullptr, nullptr, nullptr) != SQLITE_OK) return sqliteError(db, sql);
-    return TRELM_OK();
-}
-
-// Rolled back unless committed.
-class Transaction {
-public:
-    explicit Transaction(sqlite3* db) : db_(db) {}
-    ~Transaction() {
-        if (open_) sqlite3_exec(db_, "ROLLBACK", nullptr, nullptr, nullptr);
-    }
-    uError begin() {
-        uError e = exec(db_, "BEGIN IMMEDIATE");
-        open_ = e.ok();
-        return e;
-    }
-    uError commit() {
-        uError e = exec(db_, "COMMIT");
-        if (e.ok()) open_ = false;
-        return e;
-    }
-
-private:
-    sqlite3* db_;
-    bool open_ = false;
-};
+// Every error of the store's statements says which store it is about.
+char const kPrefix[] = "item store: ";
 
 json valueToJson(Variant const& value) {
     switch (value.type()) {
@@ -170,62 +105,65 @@ std::string ItemStore::encode(Record const& fields) {
 
 uError ItemStore::open(String const& path) {
     std::lock_guard<std::mutex> lock(mutex_);
-    return openLocked(path);
+    closeLocked();
+    path_ = path;
+    return openLocked();
 }
 
 void ItemStore::close() {
     std::lock_guard<std::mutex> lock(mutex_);
     closeLocked();
+    path_ = String();
 }
 
 void ItemStore::closeLocked() {
     if (db_ != nullptr) sqlite3_close_v2(db_);
     db_ = nullptr;
-    path_ = String();
 }
 
-uError ItemStore::openLocked(String const& path) {
-    closeLocked();
-    if (path.empty()) return TRELM_ERROR_MSG(kInvalid, "empty item store path");
-    if (path != kMemory) TRELM_RETURN_IF_ERROR(createPrivateFile(path));
+uError ItemStore::openLocked() {
+    if (db_ != nullptr) return TRELM_OK();
+    if (path_.empty()) return TRELM_ERROR_MSG(kFailure, "the item store is not open");
+    if (path_ != kMemory) TRELM_RETURN_IF_ERROR(createPrivateFile(path_));
     sqlite3* db = nullptr;
-    if (sqlite3_open_v2(path.cStr(), &db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE, nullptr) != SQLITE_OK) {
-        uError e = sqliteError(db, "cannot open");
-        sqlite3_close_v2(db);
-        return TRELM_WRAP_MSG(kFailure, e,
-                              "the item store " + path + " cannot be used; move it away or delete it to sync afresh");
+    uError e;
+    if (sqlite3_open_v2(path_.cStr(), &db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE, nullptr) != SQLITE_OK) {
+        e = sqliteError(db, "item store: cannot open");
+    } else {
+        sqlite3_busy_timeout(db, 5000);
+        // A killed host loses at most the window it was writing; the journal keeps the rest whole.
+        // Committed windows survive the process at once; only a power loss may take the last few.
+        e = sqliteExec(db, "PRAGMA journal_mode=WAL");
+        if (e.ok()) e = sqliteExec(db, "PRAGMA synchronous=NORMAL");
+        if (e.ok()) e = sqliteExec(db, kSchema);
     }
-    sqlite3_busy_timeout(db, 5000);
-    // A killed host loses at most the window it was writing; the journal keeps the rest whole.
-    // Committed windows survive the process at once; only a power loss may take the last few.
-    uError e = exec(db, "PRAGMA journal_mode=WAL");
-    if (e.ok()) e = exec(db, "PRAGMA synchronous=NORMAL");
-    if (e.ok()) e = exec(db, kSchema);
     if (e.failed()) {
         sqlite3_close_v2(db);
         return TRELM_WRAP_MSG(kFailure, e,
-                              "the item store " + path + " cannot be used; move it away or delete it to sync afresh");
+                              "the item store " + path_ + " cannot be used; move it away or delete it to sync afresh");
     }
     db_ = db;
-    path_ = path;
     return TRELM_OK();
 }
 
-uError ItemStore::usableLocked() const {
-    if (db_ == nullptr) return TRELM_ERROR_MSG(kFailure, "the item store is not open");
-    return TRELM_OK();
+bool ItemStore::existsLocked() const {
+    struct stat st {};
+    return db_ != nullptr || path_ == kMemory || ::stat(path_.cStr(), &st) == 0;
+}
+
+bool ItemStore::exists() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return existsLocked();
 }
 
 uError ItemStore::sendConfigImpl(Configuration::Group const& group) {
-    String path(kMemory);
-    Variant v = group.get(String("path"));
-    if (!v.empty()) {
-        uError e = v.as(path);
-        if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "configuration key path is not a string");
-    }
+    String path;
+    TRELM_RETURN_IF_ERROR(sqliteStorePath(group, path));
     std::lock_guard<std::mutex> lock(mutex_);
-    if (db_ != nullptr && path == path_) return TRELM_OK();
-    return openLocked(path);
+    if (path == path_) return TRELM_OK();
+    closeLocked();
+    path_ = path;
+    return TRELM_OK();
 }
 
 uError ItemStore::handleMessage(IMessage& msg) {
@@ -244,9 +182,9 @@ uError ItemStore::handleMessage(IMessage& msg) {
 
 uError ItemStore::openPass(Scope const& scope, Pass& pass) {
     std::lock_guard<std::mutex> lock(mutex_);
-    TRELM_RETURN_IF_ERROR(usableLocked());
-    Statement select(db_, "SELECT pass, open, resume, boundaries, rows FROM pass"
-                          " WHERE source = ?1 AND account = ?2 AND object_type = ?3");
+    TRELM_RETURN_IF_ERROR(openLocked());
+    SqliteStatement select(db_, "SELECT pass, open, resume, boundaries, rows FROM pass"
+                          " WHERE source = ?1 AND account = ?2 AND object_type = ?3", kPrefix);
     TRELM_RETURN_IF_ERROR(select.ready());
     select.text(1, scope.source).text(2, scope.account).integer(3, scope.type);
     Pass found;
@@ -262,11 +200,11 @@ uError ItemStore::openPass(Scope const& scope, Pass& pass) {
             return TRELM_OK();
         }
     } else if (rc != SQLITE_DONE) {
-        return sqliteError(db_, "reading a pass");
+        return sqliteError(db_, "item store: reading a pass");
     }
     found.id += 1;
-    Statement open(db_, "INSERT OR REPLACE INTO pass (source, account, object_type, pass, open, resume, boundaries, rows)"
-                        " VALUES (?1, ?2, ?3, ?4, 1, '', '', 0)");
+    SqliteStatement open(db_, "INSERT OR REPLACE INTO pass (source, account, object_type, pass, open, resume, boundaries, rows)"
+                        " VALUES (?1, ?2, ?3, ?4, 1, '', '', 0)", kPrefix);
     TRELM_RETURN_IF_ERROR(open.ready());
     open.text(1, scope.source).text(2, scope.account).integer(3, scope.type).integer(4, found.id);
     TRELM_RETURN_IF_ERROR(open.run("opening a pass"));
@@ -277,15 +215,15 @@ uError ItemStore::openPass(Scope const& scope, Pass& pass) {
 uError ItemStore::commitWindow(Scope const& scope, Pass const& pass, std::vector<Incoming> const& rows,
                                std::vector<std::string> const& firstSeenKeys, Counts& counts) {
     std::lock_guard<std::mutex> lock(mutex_);
-    TRELM_RETURN_IF_ERROR(usableLocked());
-    Transaction tx(db_);
+    TRELM_RETURN_IF_ERROR(openLocked());
+    SqliteTransaction tx(db_);
     TRELM_RETURN_IF_ERROR(tx.begin());
-    Statement select(db_, "SELECT fields, deleted, seen_pass FROM item"
-                          " WHERE account = ?1 AND object_type = ?2 AND service_id = ?3");
-    Statement insert(db_, "INSERT INTO item (account, object_type, service_id, host_id, source, fields, first_seen,"
-                          " last_seen, deleted, seen_pass) VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?7, 0, ?8)");
-    Statement update(db_, "UPDATE item SET fields = ?4, last_seen = ?5, deleted = 0, seen_pass = ?6, source = ?7"
-                          " WHERE account = ?1 AND object_type = ?2 AND service_id = ?3");
+    SqliteStatement select(db_, "SELECT fields, deleted, seen_pass FROM item"
+                          " WHERE account = ?1 AND object_type = ?2 AND service_id = ?3", kPrefix);
+    SqliteStatement insert(db_, "INSERT INTO item (account, object_type, service_id, host_id, source, fields, first_seen,"
+                          " last_seen, deleted, seen_pass) VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?7, 0, ?8)", kPrefix);
+    SqliteStatement update(db_, "UPDATE item SET fields = ?4, last_seen = ?5, deleted = 0, seen_pass = ?6, source = ?7"
+                          " WHERE account = ?1 AND object_type = ?2 AND service_id = ?3", kPrefix);
     TRELM_RETURN_IF_ERROR(select.ready());
     TRELM_RETURN_IF_ERROR(insert.ready());
     TRELM_RETURN_IF_ERROR(update.ready());
@@ -303,7 +241,7 @@ uError ItemStore::commitWindow(Scope const& scope, Pass const& pass, std::vector
             ++window.added;
             continue;
         }
-        if (rc != SQLITE_ROW) return sqliteError(db_, "reading an item");
+        if (rc != SQLITE_ROW) return sqliteError(db_, "item store: reading an item");
         std::string const stored = select.column(0);
         bool const wasDeleted = select.columnInt(1) != 0;
         bool const seenBefore = select.columnInt(2) == pass.id;
@@ -322,8 +260,8 @@ uError ItemStore::commitWindow(Scope const& scope, Pass const& pass, std::vector
         if (seenBefore && same) continue;  // a row seen again in the same pass counts once
         ++(same ? window.unchanged : window.changed);
     }
-    Statement progress(db_, "UPDATE pass SET resume = ?5, boundaries = ?6, rows = ?7"
-                            " WHERE source = ?1 AND account = ?2 AND object_type = ?3 AND pass = ?4 AND open = 1");
+    SqliteStatement progress(db_, "UPDATE pass SET resume = ?5, boundaries = ?6, rows = ?7"
+                            " WHERE source = ?1 AND account = ?2 AND object_type = ?3 AND pass = ?4 AND open = 1", kPrefix);
     TRELM_RETURN_IF_ERROR(progress.ready());
     progress.text(1, scope.source).text(2, scope.account).integer(3, scope.type).integer(4, pass.id);
     progress.text(5, pass.resume).text(6, boundariesText(pass.boundaries)).integer(7, pass.rows);
@@ -340,17 +278,17 @@ uError ItemStore::commitWindow(Scope const& scope, Pass const& pass, std::vector
 
 uError ItemStore::completePass(Scope const& scope, Pass const& pass, Counts& counts) {
     std::lock_guard<std::mutex> lock(mutex_);
-    TRELM_RETURN_IF_ERROR(usableLocked());
-    Transaction tx(db_);
+    TRELM_RETURN_IF_ERROR(openLocked());
+    SqliteTransaction tx(db_);
     TRELM_RETURN_IF_ERROR(tx.begin());
-    Statement remove(db_, "UPDATE item SET deleted = 1"
-                          " WHERE account = ?1 AND object_type = ?2 AND deleted = 0 AND seen_pass <> ?3");
+    SqliteStatement remove(db_, "UPDATE item SET deleted = 1"
+                          " WHERE account = ?1 AND object_type = ?2 AND deleted = 0 AND seen_pass <> ?3", kPrefix);
     TRELM_RETURN_IF_ERROR(remove.ready());
     remove.text(1, scope.account).integer(2, scope.type).integer(3, pass.id);
     TRELM_RETURN_IF_ERROR(remove.run("marking removed items"));
     unsigned const removed = static_cast<unsigned>(sqlite3_changes(db_));
-    Statement close(db_, "UPDATE pass SET open = 0, resume = '', boundaries = '', rows = ?5"
-                         " WHERE source = ?1 AND account = ?2 AND object_type = ?3 AND pass = ?4");
+    SqliteStatement close(db_, "UPDATE pass SET open = 0, resume = '', boundaries = '', rows = ?5"
+                         " WHERE source = ?1 AND account = ?2 AND object_type = ?3 AND pass = ?4", kPrefix);
     TRELM_RETURN_IF_ERROR(close.ready());
     close.text(1, scope.source).text(2, scope.account).integer(3, scope.type).integer(4, pass.id).integer(5, pass.rows);
     TRELM_RETURN_IF_ERROR(close.run("closing the pass"));
@@ -361,10 +299,15 @@ uError ItemStore::completePass(Scope const& scope, Pass const& pass, Counts& cou
 
 uError ItemStore::list(String const& account, int type, bool withRemoved, std::vector<Item>& out) {
     std::lock_guard<std::mutex> lock(mutex_);
-    TRELM_RETURN_IF_ERROR(usableLocked());
-    Statement plain(db_, "SELECT host_id, account, object_type, service_id, fields, first_seen, last_seen, deleted"
+    // Listing a store that was never made stores nothing and makes no file.
+    if (!existsLocked()) {
+        out.clear();
+        return TRELM_OK();
+    }
+    TRELM_RETURN_IF_ERROR(openLocked());
+    SqliteStatement plain(db_, "SELECT host_id, account, object_type, service_id, fields, first_seen, last_seen, deleted"
                          " FROM item WHERE object_type = ?1 AND (?2 = '' OR account = ?2) AND (?3 OR deleted = 0)"
-                         " ORDER BY first_seen, account, service_id");
+                         " ORDER BY first_seen, account, service_id", kPrefix);
     TRELM_RETURN_IF_ERROR(plain.ready());
     plain.integer(1, type).text(2, account).integer(3, withRemoved ? 1 : 0);
     std::vector<Item> items;
@@ -381,18 +324,23 @@ uError ItemStore::list(String const& account, int type, bool withRemoved, std::v
         item.deleted = plain.columnInt(7) != 0;
         items.push_back(std::move(item));
     }
-    if (rc != SQLITE_DONE) return sqliteError(db_, "listing items");
+    if (rc != SQLITE_DONE) return sqliteError(db_, "item store: listing items");
     out = std::move(items);
     return TRELM_OK();
 }
 
 uError ItemStore::wipe(String const& source, unsigned& items) {
     std::lock_guard<std::mutex> lock(mutex_);
-    TRELM_RETURN_IF_ERROR(usableLocked());
-    Transaction tx(db_);
+    // A store that was never made holds nothing to wipe; it is not made for that.
+    if (!existsLocked()) {
+        items = 0;
+        return TRELM_OK();
+    }
+    TRELM_RETURN_IF_ERROR(openLocked());
+    SqliteTransaction tx(db_);
     TRELM_RETURN_IF_ERROR(tx.begin());
-    Statement removeItems(db_, "DELETE FROM item WHERE source = ?1");
-    Statement removePasses(db_, "DELETE FROM pass WHERE source = ?1");
+    SqliteStatement removeItems(db_, "DELETE FROM item WHERE source = ?1", kPrefix);
+    SqliteStatement removePasses(db_, "DELETE FROM pass WHERE source = ?1", kPrefix);
     TRELM_RETURN_IF_ERROR(removeItems.ready());
     TRELM_RETURN_IF_ERROR(removePasses.ready());
     removeItems.text(1, source);

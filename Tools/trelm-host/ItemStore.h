@@ -35,7 +35,10 @@ namespace host {
 // Messages answered: "WipeMessage" (sent by a source when another person signs in): every item
 // and pass of each configuration tag named in the message is deleted. Other messages are ignored.
 //
-// Configuration group key (sendConfig): "path", the database file (default ":memory:").
+// Configuration group key (sendConfig): "path", the database file (default ":memory:"). The file
+// is opened (and made) by the first operation that needs it, so a host command that never syncs
+// neither makes it nor depends on it being usable; list() and wipe() of a store that was never
+// made find nothing and make nothing.
 //
 // Thread safety: every operation may be called from any thread; operations are serialised.
 class ItemStore : public Component {
@@ -93,10 +96,13 @@ public:
     explicit ItemStore(String name = kName, String componentId = kName);
     ~ItemStore() override;
 
-    // Closes the current database and opens (creating) the one at `path`. kFailure with the path
-    // and SQLite's reason when it cannot, and every operation fails until the next open().
+    // Closes the current database and opens (creating) the one at `path` now. kFailure with the
+    // path and SQLite's reason when it cannot; the operations then try the path again.
     uError open(String const& path);
+    // Closes the database; operations fail until the next open() or sendConfig().
     void close();
+    // Whether the database file exists (or is open, or is in memory).
+    bool exists() const;
 
     // The open pass of `scope`, or a new one after the last complete pass (ids count up).
     uError openPass(Scope const& scope, Pass& pass);
@@ -128,9 +134,10 @@ protected:
     uError handleMessage(IMessage& msg) override;
 
 private:
-    uError openLocked(String const& path);
+    // Opens path_ unless open.
+    uError openLocked();
     void closeLocked();
-    uError usableLocked() const;
+    bool existsLocked() const;
 
     // Guards db_, path_ and wipes_ (and serialises every use of the connection).
     mutable std::mutex mutex_;
