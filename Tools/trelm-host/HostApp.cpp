@@ -146,13 +146,12 @@ int HostApp::run(int argc, char const* const* argv) {
         std::string folder;
         ItemStore store;
         uError e = StateDirectory::prepare(options.stateDir, folder);
-        std::string const path = StateDirectory::itemStorePath(folder);
-        if (e.ok()) e = store.sendConfig(Configuration::Group(store.name(), {{"path", Variant(String(path))}}));
+        String const path(StateDirectory::itemStorePath(folder));
+        if (e.ok()) e = store.sendConfig(Configuration::Group(store.name(), {{"path", Variant(path)}}));
         if (e.failed()) {
             report(e);
             return kExitSetupFailed;
         }
-        if (!store.exists()) err_ << "trelm-host: nothing synced yet (no " << path << "); run trelm-host sync first\n";
         SyncReport listing(options.format, out_, err_, false);
         e = storedItems.run(store, listing);
         if (e.failed()) {

@@ -156,6 +156,11 @@ bool ItemStore::exists() const {
     return existsLocked();
 }
 
+String ItemStore::path() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return path_;
+}
+
 uError ItemStore::sendConfigImpl(Configuration::Group const& group) {
     String path;
     TRELM_RETURN_IF_ERROR(sqliteStorePath(group, path));

@@ -103,6 +103,8 @@ public:
     void close();
     // Whether the database file exists (or is open, or is in memory).
     bool exists() const;
+    // The database file configured.
+    String path() const;
 
     // The open pass of `scope`, or a new one after the last complete pass (ids count up).
     uError openPass(Scope const& scope, Pass& pass);

@@ -81,6 +81,7 @@ uError ItemsCommand::run(ItemStore& store, SyncReport& report) {
     IQueryItems::StartQueryMessage msg;
     TRELM_RETURN_IF_ERROR(query.fill(msg));
 
+    if (!store.exists()) report.nothingStored(store.path().str());
     std::vector<ItemStore::Item> items;
     TRELM_RETURN_IF_ERROR(store.list(String(account_), kind->type, removed_, items));
     std::size_t listed = 0;

@@ -162,5 +162,9 @@ void SyncReport::items(int type, std::size_t count) {
     out_.flush();
 }
 
+void SyncReport::nothingStored(std::string const& path) {
+    progress_ << "trelm-host: nothing synced yet (no " << path << "); run trelm-host sync first\n";
+}
+
 }  // namespace host
 }  // namespace trelm

@@ -63,6 +63,8 @@ public:
 
     void item(std::size_t index, ItemStore::Item const& item);
     void items(int type, std::size_t count);
+    // The store at `path` was never made: nothing was synced into this state folder yet.
+    void nothingStored(std::string const& path);
 
 private:
     Printer::Format const format_;
