@@ -167,6 +167,11 @@ uError ItemQuery::where(std::string const& text) {
     } else {
         uError e = typedValue(type, String(valueText), condition.value);
         if (e.failed()) return TRELM_WRAP_MSG(kInvalid, e, "condition \"" + text + "\": the value does not fit the key");
+        // The sources hand times to the service as unsigned seconds: a negative one would mean a
+        // time far in the future, and the listing would be silently empty.
+        if (key == "core_object_time" && condition.value.asInt64() < 0) {
+            return bad("a time is in seconds since 1970 and cannot be negative");
+        }
     }
     return conditions_.pushBack(condition);
 }
