@@ -4,27 +4,8 @@
 
 #include "ErrorAssertions.h"
 
-#include "ComponentRegistry.h"
-#include "HttpObjectRequestMessage.h"
-
 namespace trelm {
 namespace {
-
-TEST(HttpRequestFactoryTest, RequestMessageIsAnsweredWithANewRequest) {
-    HttpRequestFactory factory;
-    ComponentRegistry registry;
-    ASSERT_OK(registry.add(factory.name(), &factory));
-    registry.activate();
-
-    IHttpRequestFactory::HttpObjectRequestMessage first;
-    IHttpRequestFactory::HttpObjectRequestMessage second;
-    ASSERT_OK(first.send("HttpRequestFactory"));
-    ASSERT_OK(second.send("HttpRequestFactory"));
-    ASSERT_TRUE(first.request);
-    ASSERT_TRUE(second.request);
-    EXPECT_NE(first.request.get(), second.request.get());
-    EXPECT_EQ(first.request.useCount(), 1);
-}
 
 TEST(HttpRequestFactoryTest, ConfigurationSetsEveryKey) {
     HttpRequestFactory factory;
