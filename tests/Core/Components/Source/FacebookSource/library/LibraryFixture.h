@@ -13,6 +13,7 @@
 #include "FakeHttpRequestFactory.h"
 #include "FakeRuntimeConfiguration.h"
 #include "RecordingComponent.h"
+#include "ServiceTransport.h"
 
 namespace trelm::test {
 
@@ -22,6 +23,13 @@ inline Fields entries(Map<String, String> const& map) {
     Fields out;
     for (auto const& [key, value] : map) out.emplace_back(key.str(), value.str());
     return out;
+}
+
+// True when the "sig" of the request `fields` is their signature with `secret`.
+inline bool signedWith(Map<String, String> fields, String const& secret) {
+    String const* sig = fields.search("sig");
+    String const given = sig != nullptr ? *sig : String();
+    return fields.remove("sig").ok() && ServiceTransport::signature(fields, secret) == given;
 }
 
 // A test-owned registry with the two fakes, and a client set up with a ConnectionInfo under the
