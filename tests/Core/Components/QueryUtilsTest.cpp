@@ -4,10 +4,6 @@
 
 #include "ErrorAssertions.h"
 
-#include <algorithm>
-#include <string>
-#include <vector>
-
 namespace trelm {
 namespace {
 
@@ -65,21 +61,6 @@ INSTANTIATE_TEST_SUITE_P(
         LessCase{"EmptyOrderingIsNotLess", rec({{"t", 1LL}}), rec({{"t", 2LL}}), {}, false,
                  false}),
     [](testing::TestParamInfo<LessCase> const& info) { return info.param.name; });
-
-TEST(QueryUtilsSortTest, SortsNewestFirstWithIdAscendingOnTies) {
-    std::vector<Record> records = {rec({{"time", 100LL}, {"id", "c"}}),
-                                   rec({{"time", 300LL}, {"id", "a"}}),
-                                   rec({{"time", 100LL}, {"id", "a"}}),
-                                   rec({{"id", "z"}}),
-                                   rec({{"time", 200LL}, {"id", "b"}})};
-    Vector<Column> const ordering{col("time", false), col("id", true)};
-    std::stable_sort(records.begin(), records.end(), [&](Record const& a, Record const& b) {
-        return QueryUtils::isLess(a, b, ordering);
-    });
-    std::vector<std::string> ids;
-    for (auto const& r : records) ids.push_back(r.search("id")->asString().str());
-    EXPECT_EQ(ids, (std::vector<std::string>{"a", "b", "a", "c", "z"}));
-}
 
 }  // namespace
 }  // namespace trelm
