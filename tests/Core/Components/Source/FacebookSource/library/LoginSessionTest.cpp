@@ -77,7 +77,7 @@ TEST_F(LoginSessionTest, FailedLoginsAnswerTheirCodeAndChangeNothing) {
         EXPECT_CODE(lib->connectInternal(session, secret, user), c.code);
         EXPECT_EQ(user, "-");
         EXPECT_FALSE(info->hasSession());
-        EXPECT_TRUE(store.records().empty());
+        EXPECT_TRUE(store.received().empty());
     }
 }
 
@@ -105,20 +105,15 @@ TEST_F(LoginSessionTest, ConnectWipesAndWakesOnlyWhenAnotherUserSignsIn) {
     };
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
-        FakeRuntimeConfiguration fresh;
-        ASSERT_OK(registry.remove("RuntimeConfiguration"));
-        ASSERT_OK(registry.add("RuntimeConfiguration", &fresh));
-        if (c.lastUser) fresh.put(kTag, "facebook_source_lastuser", c.lastUser);
-        if (c.readFails) fresh.failType("GetRuntimeConfigurationMessage");
+        ASSERT_OK(store.reset(kTag, {"facebook_source_lastuser", "facebook_source_session_id"}));
+        if (c.lastUser) put("facebook_source_lastuser", c.lastUser);
+        store.failing = c.readFails ? "GetRuntimeConfigurationMessage" : "";
         http.queue(loginAnswer("42"));
         EXPECT_OK(lib->connect());
         EXPECT_EQ(takeEvents(), expected(c.wipes, "0", "42"));
-        EXPECT_EQ(fresh.get(kTag, "facebook_source_lastuser"), "42");
-        EXPECT_EQ(fresh.get(kTag, "facebook_source_session_id") + fresh.get(kTag, "facebook_source_session_secret") +
-                      fresh.get(kTag, "facebook_source_session_user"),
-                  "SKSS42");
-        ASSERT_OK(registry.remove("RuntimeConfiguration"));
-        ASSERT_OK(registry.add("RuntimeConfiguration", &store));
+        EXPECT_EQ(stored("facebook_source_lastuser") + stored("facebook_source_session_id") +
+                      stored("facebook_source_session_secret") + stored("facebook_source_session_user"),
+                  "42SKSS42");
     }
 }
 
@@ -128,7 +123,7 @@ TEST_F(LoginSessionTest, FailedConnectAnnouncesNotSignedInWithoutUserAndWipesNot
     for (bool const configured : {true, false}) {
         SCOPED_TRACE(configured ? "refused login" : "no credentials");
         size_t const sent = http.exchanges().size();
-        store.put(kTag, "facebook_source_lastuser", "7");
+        put("facebook_source_lastuser", "7");
         if (configured) {
             http.queue(errorAnswer("100"));
         } else {
@@ -144,17 +139,14 @@ TEST_F(LoginSessionTest, FailedConnectAnnouncesNotSignedInWithoutUserAndWipesNot
         }
         EXPECT_EQ(http.exchanges().size() - sent, configured ? 1u : 0u);
         EXPECT_EQ(takeEvents(), expected(false, "8000001c", ""));
-        EXPECT_EQ(store.get(kTag, "facebook_source_lastuser"), "7");
+        EXPECT_EQ(stored("facebook_source_lastuser"), "7");
     }
 }
 
 TEST_F(LoginSessionTest, AppliedSessionStaysInMemoryWhileTheLastUserIsStored) {
-    store.put(kTag, "facebook_source_lastuser", "7");
+    put("facebook_source_lastuser", "7");
     ASSERT_OK(lib->applySession("SK", "SS", "42"));
-    auto records = store.records();
-    ASSERT_EQ(records.size(), 2u);
-    EXPECT_EQ(records[0].type, "GetRuntimeConfigurationMessage");
-    EXPECT_EQ(entries(records[1].values), (Fields{{"facebook_source_lastuser", "42"}}));
+    EXPECT_EQ(stored("facebook_source_lastuser") + stored("facebook_source_session_id"), "42-");
     EXPECT_EQ(takeEvents(), expected(true, "0", "42"));
     String session;
     ASSERT_OK(info->getSessionId(session));
@@ -166,13 +158,11 @@ TEST_F(LoginSessionTest, ResetForgetsTheSessionButRemembersTheLastUser) {
     http.queue(loginAnswer("42"));
     ASSERT_OK(lib->connect());
     takeEvents();
-    store.clearRecords();
 
     ASSERT_OK(lib->resetAccount(true));
-    auto records = store.records();
-    ASSERT_EQ(records.size(), 1u);
-    EXPECT_EQ(records[0].keys, (Set<String>{"facebook_source_session_id", "facebook_source_session_secret",
-                                            "facebook_source_session_user"}));
+    EXPECT_EQ(stored("facebook_source_session_id") + stored("facebook_source_session_secret") +
+                  stored("facebook_source_session_user") + stored("facebook_source_lastuser"),
+              "---42");
     EXPECT_EQ(takeEvents(), expected(true, "8000001c", "", false));  // nobody is woken for a log-out
     String user;
     EXPECT_CODE(lib->getUserId(user), kNotSignedIn);
