@@ -27,12 +27,6 @@ protected:
     }
     void TearDown() override { module_.reset(); }
 
-    std::vector<std::string> idsOf(ModuleHandle::Table const& table) {
-        std::vector<std::string> ids;
-        for (auto const& [id, factory] : table) ids.push_back(id.str());
-        return ids;
-    }
-
     std::unique_ptr<ModuleHandle> module_;
 };
 
