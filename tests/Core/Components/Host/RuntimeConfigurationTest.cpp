@@ -104,20 +104,15 @@ TEST_F(RuntimeConfigurationTest, ValueWithoutTextFormStoresNothingOfItsMessage) 
 
 TEST_F(RuntimeConfigurationTest, StoreFileIsPrivateWhateverTheUmask) {
     TempDir dir;
-    std::string created = dir.file("new.db");
-    std::string existing = dir.file("existing.db");
+    std::string const created = dir.file("new.db"), existing = dir.file("existing.db");
     std::ofstream(existing) << "";
     ::chmod(existing.c_str(), 0666);
-
-    mode_t old = ::umask(0);
-    uError a = store_.open(String(created));
-    ASSERT_OK(put("src", {{"secret", Variant("x")}}));
+    mode_t const old = ::umask(0);
     RuntimeConfiguration other("Other");
-    uError b = other.open(String(existing));
+    EXPECT_OK(store_.open(String(created)));
+    EXPECT_OK(put("src", {{"secret", Variant("x")}}));
+    EXPECT_OK(other.open(String(existing)));
     ::umask(old);
-    ASSERT_OK(a);
-    ASSERT_OK(b);
-
     for (std::string const& p : {created, existing}) {
         struct stat st {};
         ASSERT_EQ(::stat(p.c_str(), &st), 0) << p;

@@ -25,7 +25,6 @@ protected:
         module_ = std::make_unique<ModuleHandle>(TRELMFACEBOOK_MODULE);
         ASSERT_EQ(module_->error(), "");
     }
-    void TearDown() override { module_.reset(); }
 
     std::unique_ptr<ModuleHandle> module_;
 };

@@ -41,22 +41,21 @@ protected:
         ASSERT_OK(connector.makeConnection(params, false));
     }
 
-    emu::test::Row user(std::string const& uid, std::string const& fields) {
+    emu::test::Row user(String const& uid, std::string const& fields) {
         return emu::test::fqlRows(emulator->store(), emu::DemoAccount::uid,
-                                  "SELECT " + fields + " FROM user WHERE uid = " + uid)
+                                  "SELECT " + fields + " FROM user WHERE uid = " + uid.str())
             .at(0);
     }
 
+    // In ascending order.
     Vector<String> friendIds() {
-        std::vector<std::string> ids;
+        Vector<String> ids;
         for (auto& row : emu::test::fqlRows(emulator->store(), emu::DemoAccount::uid,
                                             "SELECT uid2 FROM friend WHERE uid1 = me()")) {
-            ids.push_back(row["uid2"]);
+            EXPECT_OK(ids.pushBack(String(row["uid2"])));
         }
         std::sort(ids.begin(), ids.end());
-        Vector<String> out;
-        for (std::string const& id : ids) EXPECT_OK(out.pushBack(String(id)));
-        return out;
+        return ids;
     }
 
     EmulatorHost host{{.users = 90, .demoFriends = 55, .friendsPerUser = 2}};
@@ -100,7 +99,7 @@ TEST_F(ConnectorEmulatorTest, PeerInfoComesInTheOrderOfTheIdsFromOneRequestPerCa
     Peer one;
     ASSERT_OK(connector.getPeerInfo(friends[5], one));
     ASSERT_OK(peers.pushBack(one));
-    auto row = user(friends[5].str(), "name, profile_url");
+    auto row = user(friends[5], "name, profile_url");
     EXPECT_EQ((one.fullName + "|" + one.profileUrl).str(), row["name"] + "|" + row["profile_url"]);
     ASSERT_EQ(peers.size(), 4u);
     EXPECT_EQ(peers[0].serviceId + peers[1].serviceId + peers[2].serviceId + peers[3].serviceId,
@@ -122,7 +121,7 @@ TEST_F(ConnectorEmulatorTest, StatusesOfFiftyFriendsComeInOneRequestWithTextAndT
     ASSERT_EQ(events.size(), 50u);
     unsigned never = 0;
     for (unsigned i = 0; i < 50; ++i) {
-        auto row = user(ids[i].str(), "status");
+        auto row = user(ids[i], "status");
         std::string const time = row.count("status.time") ? row["status.time"] : "0";
         EXPECT_EQ(events[i].statusText.str() + "@" + std::to_string(events[i].statusTime),
                   row["status.message"] + "@" + time)
@@ -150,9 +149,7 @@ TEST_F(ConnectorEmulatorTest, ShortStatusAnswerFailsAndLeavesTheEventsAsTheyWere
 // forgotten, so nothing more is sent with it.
 TEST_F(ConnectorEmulatorTest, ServiceErrorsReachTheHostWithTheirCodes) {
     connect();
-    emu::FaultRule unavailable;
-    unavailable.errorCode = 2;
-    emulator->faults().set("users.getInfo", unavailable);
+    emulator->faults().set("users.getInfo", emu::FaultRule{.errorCode = 2});
     Vector<String> ids{friendIds()[0]};
     Vector<Event> events;
     uError err = connector.getPeerStatusBatch(ids, events);
@@ -161,9 +158,8 @@ TEST_F(ConnectorEmulatorTest, ServiceErrorsReachTheHostWithTheirCodes) {
     Peer peer;
     EXPECT_CODE(connector.getPeerInfo(ids[0], peer), kServiceUnavailable);
 
-    emu::FaultRule expired;
-    expired.expireAfter = 1;  // the session has made two calls already
-    emulator->faults().set("friends.get", expired);
+    // The session has made two calls already.
+    emulator->faults().set("friends.get", emu::FaultRule{.expireAfter = 1});
     EXPECT_CODE(connector.getPeers(ids), kNotSignedIn);
     std::uint64_t const sent = emulator->log().total();
     EXPECT_CODE(connector.setStatus("after the end"), kNotSignedIn);

@@ -11,7 +11,6 @@ public:
 
     uError setup(String const& url) override {
         exchange_ = {url, {}};
-        answered_ = false;
         return TRELM_OK();
     }
     uError setPostData(Map<String, String> const& fields) override {
@@ -20,16 +19,14 @@ public:
     }
     uError sendRequest() override {
         answer_ = factory_.answer(exchange_);
-        answered_ = answer_.sendError.ok();
         return answer_.sendError;
     }
+    // Read by the client only after a successful sendRequest.
     uError getResponseCode(int& code) override {
-        if (!answered_) return TRELM_ERROR(kInvalid);
         code = answer_.status;
         return TRELM_OK();
     }
     uError getResponseData(String& data) override {
-        if (!answered_) return TRELM_ERROR(kInvalid);
         data = answer_.body;
         return TRELM_OK();
     }
@@ -39,7 +36,6 @@ private:
     FakeHttpRequestFactory& factory_;
     FakeHttpRequestFactory::Exchange exchange_;
     FakeHttpRequestFactory::Answer answer_;
-    bool answered_ = false;
 };
 
 }  // namespace

@@ -60,10 +60,8 @@ TEST_F(LoginSessionTest, FailedLoginsAnswerTheirCodeAndChangeNothing) {
         unsigned code;
     } const cases[] = {
         {{200, errorAnswer("100"), {}}, kNotSignedIn},  // wrong e-mail or password
-        {{200, errorAnswer("4"), {}}, kRequestLimit},
-        {{200, errorAnswer("101"), {}}, kServiceError},
+        {{200, errorAnswer("4"), {}}, kRequestLimit},    // other codes: ServiceTransportTest
         {{200, "<error_response><error_msg>m</error_msg></error_response>", {}}, kFailure},
-        {{200, errorAnswer("x"), {}}, kFailure},
         {{200, "<auth_login_response><session_key>SK</session_key></auth_login_response>", {}}, kFailure},
         {{200, "<auth_login_response><uid>42</uid></auth_login_response>", {}}, kFailure},
         {{200, "<users_getInfo_response/>", {}}, kFailure},

@@ -61,19 +61,6 @@ TEST(ResponseParsersTest, ThreadsAreReadInOrderAndKeptWhenTheAnswerBreaks) {
     EXPECT_EQ(threads[2].lastUpdate, 12);  // atoi reads the leading number
 }
 
-TEST(ResponseParsersTest, MessagesCarryTheCallersContext) {
-    Vector<Message> messages;
-    ASSERT_OK(MessageParser(messages, "thread 9")
-                    .parse("<mailbox_getThreadMessages_response><message><mid>9_1</mid><tid>9</tid>"
-                           "<author>42</author><body>hi <b>x</b>there</body><time_sent>1700000001</time_sent>"
-                           "</message><message><mid>9_2</mid></message></mailbox_getThreadMessages_response>"));
-    ASSERT_EQ(messages.size(), 2u);
-    Message const& m = messages[0];
-    EXPECT_EQ(m.messageId + "|" + m.threadId + "|" + m.author + "|" + m.body, "9_1|9|42|hi there");
-    EXPECT_EQ(m.timeSent, 1700000001);
-    EXPECT_EQ(messages[1].context, "thread 9");
-}
-
 // The flag follows the time-sent text read before "has_attachment" ends (starting afresh with each
 // message), never the element's own text. Readers of these records depend on exactly this rule.
 TEST(ResponseParsersTest, AttachmentFlagFollowsTheTimeSentReadSoFar) {
