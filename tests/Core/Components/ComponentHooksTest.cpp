@@ -152,14 +152,14 @@ TEST(ComponentTest, StateFollowsTheEntryPointsThatSucceeded) {
     RecordingSource source;
     using State = Component::State;
     source.answers["sendConfigImpl"] = TRELM_ERROR(kInvalid);
+    auto configure = [&] { return source.sendConfig(Configuration::Group("g")); };
     std::vector<State> states{source.state()};
-    EXPECT_CODE(source.sendConfig(Configuration::Group("g")), kInvalid);
+    EXPECT_CODE(configure(), kInvalid);
     states.push_back(source.state());
     source.answers.clear();
-    for (auto step : std::vector<std::function<uError()>>{[&] { return source.sendConfig(Configuration::Group("g")); },
-                                                          [&] { return source.startup(); },
-                                                          [&] { return source.sendConfig(Configuration::Group("g")); },
-                                                          [&] { return source.stop(); }, [&] { return source.shutdown(); }}) {
+    for (auto const& step : std::vector<std::function<uError()>>{configure, [&] { return source.startup(); }, configure,
+                                                                 [&] { return source.stop(); },
+                                                                 [&] { return source.shutdown(); }}) {
         EXPECT_OK(step());
         states.push_back(source.state());
     }

@@ -78,15 +78,6 @@ TEST_F(ConnectorEmulatorTest, MakeConnectionLogsInOnceOverHttpsAndPeersAreTheDem
     ASSERT_OK(connector.getPeers(peers));
     std::sort(peers.begin(), peers.end());
     EXPECT_EQ(peers, friendIds());
-
-    // A refused login keeps the service's code, and later calls send nothing.
-    FacebookConnector refused("refused");
-    Map<String, String> wrong = demoParams("not the password");
-    EXPECT_CODE(refused.makeConnection(wrong, false), kNotSignedIn);
-    Vector<String> ids{"untouched"};
-    EXPECT_CODE(refused.getPeers(ids), kNotSignedIn);
-    EXPECT_EQ(ids, (Vector<String>{"untouched"}));
-    EXPECT_EQ(emulator->log().total(), 3u) << "the refused connector sends nothing after its login";
 }
 
 // The profile fields themselves: PeerCommandsTest.PeersListsEveryFriendWithProfileFromTwoRequests.
@@ -179,7 +170,8 @@ TEST_F(ConnectorEmulatorTest, BeforeConnectionQueriesSucceedWithTheirOutputsUnto
     EXPECT_OK(connector.getPeerInfoBatch(ids, peers));
     EXPECT_OK(connector.getPeerStatus("1", event));
     EXPECT_OK(connector.getPeerStatusBatch(ids, events));
-    EXPECT_EQ(peer.serviceId + String::from(peers.size()) + event.statusText + String::from(events.size()), "u1before1");
+    EXPECT_EQ(peer.serviceId + String::from(peers.size()) + event.statusText + String::from(events.size()),
+              "u1before1");
     EXPECT_CODE(connector.setStatus("nobody to set it for"), kNotSignedIn);
     EXPECT_OK(connector.publishPhoto("file:///tmp/x.png", "c"));
     EXPECT_EQ(emulator->log().total(), 0u);

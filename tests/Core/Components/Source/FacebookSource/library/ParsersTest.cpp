@@ -47,20 +47,6 @@ TEST(ResponseParsersTest, RootsAndErrorDocumentsGiveTheirCodes) {
     }
 }
 
-// Records appended before a broken answer stay, after what the caller already had.
-TEST(ResponseParsersTest, ThreadsAreReadInOrderAndKeptWhenTheAnswerBreaks) {
-    Vector<Thread> threads{Thread{"old", "", 1}};
-    EXPECT_CODE(ThreadParser(threads)
-                  .parse("<mailbox_getInbox_response><thread><tid>1</tid><subject>Hi &amp; bye</subject>"
-                         "<last_update>1700000000</last_update><unread>1</unread></thread>"
-                         "<thread><tid>2</tid><last_update>12abc</last_update></thread><thread><tid>3</ti"), kFailure);
-    ASSERT_EQ(threads.size(), 4u);
-    EXPECT_EQ(threads[0].threadId, "old");
-    EXPECT_EQ(threads[1].threadId + "|" + threads[1].subject, "1|Hi & bye");
-    EXPECT_EQ(threads[1].lastUpdate, 1700000000);
-    EXPECT_EQ(threads[2].lastUpdate, 12);  // atoi reads the leading number
-}
-
 // The flag follows the time-sent text read before "has_attachment" ends (starting afresh with each
 // message), never the element's own text. Readers of these records depend on exactly this rule.
 TEST(ResponseParsersTest, AttachmentFlagFollowsTheTimeSentReadSoFar) {
