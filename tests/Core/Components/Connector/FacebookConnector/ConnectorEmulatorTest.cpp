@@ -181,11 +181,8 @@ TEST(ConnectorConfigTest, BothTimesMustReadAsIntegers) {
     struct Case {
         Variant pollTime, maxTime;
         unsigned code;
-    } const cases[] = {{300, 3600, kSuccess},
-                       {"300", "3600", kSuccess},
-                       {"soon", 3600, kFailure},
-                       {300, Variant(), kFailure},
-                       {true, 3600, kFailure}};
+    } const cases[] = {{300, 3600, kSuccess},      {"300", "3600", kSuccess}, {"soon", 3600, kFailure},
+                       {300, Variant(), kFailure}, {true, 3600, kFailure}};
     for (Case const& c : cases) {
         FacebookConnector connector("facebook-connector");
         Map<String, Variant> values{{"facebook_polltime", c.pollTime}, {"facebook_maxtime", c.maxTime}};

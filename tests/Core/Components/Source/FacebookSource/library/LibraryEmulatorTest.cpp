@@ -27,7 +27,6 @@ protected:
     void TearDown() override { setTraceSink(previousSink); }
 
     EmulatorHost host{{.users = 20, .demoFriends = 5, .friendsPerUser = 3}};
-    emu::Emulator* emulator = &host.emulator();
     SmartPtr<FacebookLibrary::ConnectionInfo> info = makeSmart<FacebookLibrary::ConnectionInfo>("fbsource");
     SmartPtr<FacebookLibrary> lib = makeSmart<FacebookLibrary>();
     TraceSink previousSink;
@@ -40,9 +39,7 @@ protected:
 TEST_F(LibraryEmulatorTest, SecretsStayInTheLoginRequestAndOutOfTraces) {
     ASSERT_OK(host.runtime().store("fbsource", {Configuration::Value("facebook_source_lastuser", Variant("7"))}));
     ASSERT_OK(info->setWipeComponents({"NoSuchComponent"}));
-    emu::FaultRule rule;
-    rule.expireAfter = 1;
-    emulator->faults().set("users.setStatus", rule);
+    host.emulator().faults().set("users.setStatus", emu::FaultRule{.expireAfter = 1});
 
     std::vector<std::string> texts;  // the traces, then every error
     std::vector<std::string> secrets{emu::DemoAccount::password, "wrong-password"};
@@ -66,7 +63,7 @@ TEST_F(LibraryEmulatorTest, SecretsStayInTheLoginRequestAndOutOfTraces) {
     for (std::string const& text : texts) {
         for (std::string const& secret : secrets) EXPECT_EQ(text.find(secret), std::string::npos) << text;
     }
-    for (auto const& request : emulator->log().entries()) {
+    for (auto const& request : host.emulator().log().entries()) {
         bool const login = request.method == "facebook.auth.login";
         EXPECT_EQ(request.args.count("password"), login ? 1u : 0u) << request.method;
         if (login) {

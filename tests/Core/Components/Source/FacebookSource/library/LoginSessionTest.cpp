@@ -132,9 +132,7 @@ TEST_F(LoginSessionTest, FailedConnectAnnouncesNotSignedInWithoutUserAndWipesNot
         }
         uError const err = lib->connect();
         EXPECT_CODE(err, kNotSignedIn);
-        if (!configured) {
-            EXPECT_EQ(err.cause() ? err.cause()->code() : 0u, unsigned(kNotSet));
-        }
+        EXPECT_EQ(err.cause() ? err.cause()->code() : 0u, configured ? 0u : unsigned(kNotSet));
         EXPECT_EQ(http.exchanges().size() - sent, configured ? 1u : 0u);
         EXPECT_EQ(takeEvents(), expected(false, "8000001c", ""));
         EXPECT_EQ(stored("facebook_source_lastuser"), "7");
