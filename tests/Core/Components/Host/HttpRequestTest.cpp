@@ -4,6 +4,7 @@
 #include "trelm/HttpRequest.h"
 
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <cstdio>
 #include <fstream>
@@ -95,12 +96,13 @@ TEST_F(HttpRequestTest, FieldsAndUploadArriveIntact) {
         {"a key&=", "v"},
         {"lines", "one\r\ntwo\n"},
     };
-    std::string const path = ::testing::TempDir() + "holiday photo.jpg";
+    std::string const base = ::testing::TempDir() + "trelm-http-" + std::to_string(::getpid());  // one per run
+    std::string const path = base + " photo.jpg";
     std::string image;
     for (int b = 0; b < 256 * 300; ++b) image.push_back(static_cast<char>(b));  // NULs included
     std::ofstream(path, std::ios::binary) << image;
     auto upload = makeSmart<InputDataStream>();
-    ASSERT_OK(upload->setUri(String("file://" + ::testing::TempDir() + "holiday%20photo.jpg")));
+    ASSERT_OK(upload->setUri(String("file://" + base + "%20photo.jpg")));
     ASSERT_EQ(upload->path(), path);
 
     ASSERT_OK(post("form", fields));
