@@ -37,9 +37,7 @@ TEST(FrameworkConcurrencyTest, MessagesFlowWhileComponentsComeAndGo) {
     ASSERT_OK(registry.add("stable", &stable));
     // The churning components stay alive for the whole test: only their registration changes.
     std::vector<std::unique_ptr<Counter>> churn;
-    for (int i = 0; i < kThreads; ++i) {
-        churn.push_back(std::make_unique<Counter>(String("churn") + String::from(i)));
-    }
+    for (int i = 0; i < kThreads; ++i) churn.push_back(std::make_unique<Counter>("churn" + String::from(i)));
 
     constexpr int kRounds = 500;
     std::vector<std::thread> threads;
@@ -48,13 +46,13 @@ TEST(FrameworkConcurrencyTest, MessagesFlowWhileComponentsComeAndGo) {
         threads.emplace_back([&, t] {
             Counter* mine = churn[t].get();
             for (int i = 0; i < kRounds; ++i) {
-                if (registry.add(mine->name(), mine).failed()) failures.fetch_add(1);
                 IMessage targeted("Ping");
-                if (targeted.send("stable").failed()) failures.fetch_add(1);
                 IMessage broadcast("Ping");
-                if (broadcast.send("").failed()) failures.fetch_add(1);
                 registry.names();
-                if (registry.remove(mine->name()).failed()) failures.fetch_add(1);
+                if (registry.add(mine->name(), mine).failed() || targeted.send("stable").failed() ||
+                    broadcast.send("").failed() || registry.remove(mine->name()).failed()) {
+                    failures.fetch_add(1);
+                }
             }
         });
     }
@@ -68,8 +66,7 @@ TEST(FrameworkConcurrencyTest, MessagesFlowWhileComponentsComeAndGo) {
 
 TEST(FrameworkConcurrencyTest, ConcurrentRegistrationKeepsOneTypePerName) {
     constexpr int kNames = 200;
-    std::vector<std::vector<TRELM_TYPES::TYPES>> seen(kThreads,
-                                                       std::vector<TRELM_TYPES::TYPES>(kNames));
+    std::vector<std::vector<TRELM_TYPES::TYPES>> seen(kThreads, std::vector<TRELM_TYPES::TYPES>(kNames));
     std::vector<std::thread> threads;
     for (int t = 0; t < kThreads; ++t) {
         threads.emplace_back([&, t] {
@@ -103,8 +100,7 @@ TEST(FrameworkConcurrencyTest, SharedPointerCopiesAcrossThreadsDeleteOnce) {
             threads.emplace_back([copy = shared] {
                 for (int i = 0; i < 1000; ++i) {
                     SmartPtr<Tracked> local = copy;
-                    SmartPtr<Tracked> other(local);
-                    other.reset();
+                    SmartPtr<Tracked>(local).reset();
                 }
             });
         }

@@ -68,40 +68,27 @@ TEST_F(MessagingTest, MessageReachesItsTargetOrEveryoneAndReturnsTheirResult) {
     }
 }
 
-// On a WipeMessage, sends a second message to `next` (and to everyone), and registers a new
-// component, all from inside the handler: nothing may deadlock.
-class Forwarder : public Component {
-public:
-    Forwarder(String name, String next, std::vector<std::string>& log, ComponentRegistry& registry,
-              Component* late)
-        : Component(name, "@test:/forwarder"),
-          next_(next),
-          log_(log),
-          registry_(registry),
-          late_(late) {}
-
-protected:
-    uError handleMessage(IMessage& msg) override {
-        log_.push_back(name().str() + ":" + msg.type().str());
-        if (msg.type() != "WipeMessage") return TRELM_OK();
-        TRELM_RETURN_IF_ERROR(registry_.add(late_->name(), late_));
-        IMessage inner("Inner");
-        TRELM_RETURN_IF_ERROR(inner.send(next_));
-        IMessage everyone("Everyone");
-        return everyone.send("");
-    }
-
-private:
-    String next_;
-    std::vector<std::string>& log_;
-    ComponentRegistry& registry_;
-    Component* late_;
-};
-
+// On a WipeMessage, "a" registers a new component and sends a message to "b" and one to everyone,
+// all from inside its handler: nothing may deadlock.
 TEST_F(MessagingTest, HandlerMaySendAndRegisterReentrantly) {
+    struct Forwarder : Recorder {
+        Forwarder(std::vector<std::string>& log, ComponentRegistry& registry, Component& late)
+            : Recorder("a", log), registry(registry), late(late) {}
+        uError handleMessage(IMessage& msg) override {
+            TRELM_RETURN_IF_ERROR(Recorder::handleMessage(msg));
+            if (msg.type() != "WipeMessage") return TRELM_OK();
+            TRELM_RETURN_IF_ERROR(registry.add(late.name(), &late));
+            IMessage inner("Inner");
+            TRELM_RETURN_IF_ERROR(inner.send("b"));
+            IMessage everyone("Everyone");
+            return everyone.send("");
+        }
+        ComponentRegistry& registry;
+        Component& late;
+    };
     Recorder late("late", log_);
     Recorder b("b", log_);
-    Forwarder a("a", "b", log_, registry_, &late);
+    Forwarder a(log_, registry_, late);
     ASSERT_OK(registry_.add("a", &a));
     ASSERT_OK(registry_.add("b", &b));
     WipeMessage msg;

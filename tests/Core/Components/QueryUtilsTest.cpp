@@ -4,10 +4,6 @@
 
 #include "ErrorAssertions.h"
 
-#include <algorithm>
-#include <string>
-#include <vector>
-
 namespace trelm {
 namespace {
 
@@ -24,61 +20,32 @@ Record rec(std::initializer_list<std::pair<char const*, Variant>> fields) {
     return r;
 }
 
-struct LessCase {
-    char const* name;
-    Record a;
-    Record b;
-    Vector<Column> ordering;
-    bool aBeforeB;
-    bool bBeforeA;
-};
-
-void PrintTo(LessCase const& c, std::ostream* os) { *os << c.name; }
-
-class QueryUtilsTest : public testing::TestWithParam<LessCase> {};
-
-TEST_P(QueryUtilsTest, IsLessFollowsTheOrdering) {
-    LessCase const& c = GetParam();
-    EXPECT_EQ(QueryUtils::isLess(c.a, c.b, c.ordering), c.aBeforeB);
-    EXPECT_EQ(QueryUtils::isLess(c.b, c.a, c.ordering), c.bBeforeA);
-}
-
-INSTANTIATE_TEST_SUITE_P(
-    Table, QueryUtilsTest,
-    testing::Values(
-        LessCase{"AscendingSingleColumn", rec({{"t", 1LL}}), rec({{"t", 2LL}}), {col("t", true)},
-                 true, false},
-        LessCase{"DescendingSingleColumn", rec({{"t", 1LL}}), rec({{"t", 2LL}}),
-                 {col("t", false)}, false, true},
-        LessCase{"TieOnFirstDecidedBySecond", rec({{"t", 5LL}, {"id", "b"}}),
-                 rec({{"t", 5LL}, {"id", "a"}}), {col("t", false), col("id", true)}, false, true},
-        LessCase{"FirstColumnWinsOverSecond", rec({{"t", 9LL}, {"id", "a"}}),
-                 rec({{"t", 5LL}, {"id", "z"}}), {col("t", false), col("id", true)}, true, false},
-        LessCase{"AbsentBeforePresentAscending", rec({}), rec({{"t", 0LL}}), {col("t", true)},
-                 true, false},
-        LessCase{"AbsentAfterPresentDescending", rec({}), rec({{"t", 0LL}}), {col("t", false)},
-                 false, true},
-        LessCase{"BothAbsentFallThrough", rec({{"id", "a"}}), rec({{"id", "b"}}),
-                 {col("t", true), col("id", true)}, true, false},
-        LessCase{"EqualRecordsAreNotLess", rec({{"t", 1LL}}), rec({{"t", 1LL}}),
-                 {col("t", true)}, false, false},
-        LessCase{"EmptyOrderingIsNotLess", rec({{"t", 1LL}}), rec({{"t", 2LL}}), {}, false,
-                 false}),
-    [](testing::TestParamInfo<LessCase> const& info) { return info.param.name; });
-
-TEST(QueryUtilsSortTest, SortsNewestFirstWithIdAscendingOnTies) {
-    std::vector<Record> records = {rec({{"time", 100LL}, {"id", "c"}}),
-                                   rec({{"time", 300LL}, {"id", "a"}}),
-                                   rec({{"time", 100LL}, {"id", "a"}}),
-                                   rec({{"id", "z"}}),
-                                   rec({{"time", 200LL}, {"id", "b"}})};
-    Vector<Column> const ordering{col("time", false), col("id", true)};
-    std::stable_sort(records.begin(), records.end(), [&](Record const& a, Record const& b) {
-        return QueryUtils::isLess(a, b, ordering);
-    });
-    std::vector<std::string> ids;
-    for (auto const& r : records) ids.push_back(r.search("id")->asString().str());
-    EXPECT_EQ(ids, (std::vector<std::string>{"a", "b", "a", "c", "z"}));
+// Each case's records are compared both ways: whether a comes before b, and b before a.
+TEST(QueryUtilsTest, IsLessFollowsTheOrdering) {
+    Vector<Column> const t{col("t", true)}, tDesc{col("t", false)};
+    Vector<Column> const tDescId{col("t", false), col("id", true)}, tId{col("t", true), col("id", true)};
+    struct Case {
+        char const* name;
+        Record a, b;
+        Vector<Column> ordering;
+        bool aBeforeB, bBeforeA;
+    } const cases[] = {
+        {"ascending single column", rec({{"t", 1LL}}), rec({{"t", 2LL}}), t, true, false},
+        {"descending single column", rec({{"t", 1LL}}), rec({{"t", 2LL}}), tDesc, false, true},
+        {"tie on first decided by second", rec({{"t", 5LL}, {"id", "b"}}), rec({{"t", 5LL}, {"id", "a"}}), tDescId,
+         false, true},
+        {"first column wins over second", rec({{"t", 9LL}, {"id", "a"}}), rec({{"t", 5LL}, {"id", "z"}}), tDescId,
+         true, false},
+        {"absent before present ascending", rec({}), rec({{"t", 0LL}}), t, true, false},
+        {"absent after present descending", rec({}), rec({{"t", 0LL}}), tDesc, false, true},
+        {"both absent fall through", rec({{"id", "a"}}), rec({{"id", "b"}}), tId, true, false},
+        {"equal records are not less", rec({{"t", 1LL}}), rec({{"t", 1LL}}), t, false, false},
+        {"empty ordering is not less", rec({{"t", 1LL}}), rec({{"t", 2LL}}), {}, false, false},
+    };
+    for (Case const& c : cases) {
+        EXPECT_EQ(QueryUtils::isLess(c.a, c.b, c.ordering), c.aBeforeB) << c.name;
+        EXPECT_EQ(QueryUtils::isLess(c.b, c.a, c.ordering), c.bBeforeA) << c.name;
+    }
 }
 
 }  // namespace

@@ -2,23 +2,32 @@
 
 #include <gtest/gtest.h>
 
-#include "ErrorAssertions.h"
+#include <stdlib.h>
 #include <sys/stat.h>
 
+#include <filesystem>
 #include <fstream>
 #include <thread>
 #include <vector>
 
 #include "ComponentRegistry.h"
+#include "ErrorAssertions.h"
 #include "GetRuntimeConfigurationMessage.h"
 #include "ResetRuntimeConfigurationMessage.h"
 #include "RuntimeConfigurationMessage.h"
-#include "TempDir.h"
 
 namespace trelm {
 namespace {
 
-using test::TempDir;
+// A fresh private directory, removed with its contents at the end of the test.
+struct TempDir {
+    std::string path = [] {
+        std::string pattern = (std::filesystem::temp_directory_path() / "trelm-store-test-XXXXXX").string();
+        return std::string(::mkdtemp(pattern.data()));
+    }();
+    ~TempDir() { std::filesystem::remove_all(path); }
+    std::string file(std::string const& name) const { return path + "/" + name; }
+};
 
 // A registry with one "RuntimeConfiguration" component; talks to it by messages as components do.
 class RuntimeConfigurationTest : public ::testing::Test {
@@ -68,11 +77,16 @@ TEST_F(RuntimeConfigurationTest, StoredValuesComeBackAsTextAndUnknownKeysStayEmp
               (Texts{"s1", "", "42", "-5000000000", "true", std::string("a\0b", 3), "-"}));
 }
 
+// Configuring the store again keeps its values (an in-memory store opened afresh would lose
+// them). A file store's values reaching the next run: HostProgramTest.
 TEST_F(RuntimeConfigurationTest, StoringAgainReplacesAndResetForgetsOnlyNamedKeysOfItsTag) {
+    Configuration::Group const group("RuntimeConfiguration");
+    ASSERT_OK(store_.sendConfig(group));
     ASSERT_OK(put("src", {{"a", Variant("1")}, {"b", Variant("2")}, {"c", Variant("3")}}));
     ASSERT_OK(put("other", {{"a", Variant("100")}, {"b", Variant("200")}}));
     ASSERT_OK(put("src", {{"a", Variant("one")}}));
     ASSERT_OK(reset("src", {"b", "never-stored"}));
+    ASSERT_OK(store_.sendConfig(group));
     EXPECT_EQ(get("src", {"a", "b", "c"}), (Texts{"one", "-", "3"}));
     EXPECT_EQ(get("other", {"a", "b"}), (Texts{"100", "200"}));
 
@@ -88,44 +102,17 @@ TEST_F(RuntimeConfigurationTest, ValueWithoutTextFormStoresNothingOfItsMessage) 
     EXPECT_EQ(get("src", {"a", "list", "z"}), (Texts{"-", "-", "-"}));
 }
 
-// Configuring a store again keeps its values (the in-memory store would lose them if it were
-// opened afresh); a file store keeps them for the next store opening the file.
-TEST_F(RuntimeConfigurationTest, StoreKeepsItsValuesAcrossConfigurationAndReopen) {
-    TempDir dir;
-    std::string const path = dir.file("runtime.db");
-    for (bool const file : {false, true}) {
-        SCOPED_TRACE(file ? "file" : "memory");
-        Configuration::Group group("RuntimeConfiguration");
-        if (file) group = Configuration::Group("RuntimeConfiguration", {{"path", Variant(String(path))}});
-        ASSERT_OK(store_.sendConfig(group));
-        ASSERT_OK(put("src", {{"a", Variant(file ? "kept" : "1")}}));
-        ASSERT_OK(store_.sendConfig(group));
-        EXPECT_EQ(get("src", {"a"}), (Texts{file ? "kept" : "1"}));
-    }
-    store_.close();
-    RuntimeConfiguration again("RuntimeConfiguration2");
-    ASSERT_OK(again.open(String(path)));
-    Map<String, Variant> values{{"a", Variant()}};
-    ASSERT_OK(again.get("src", values));
-    EXPECT_EQ(values.search("a")->asString(), "kept");
-}
-
 TEST_F(RuntimeConfigurationTest, StoreFileIsPrivateWhateverTheUmask) {
     TempDir dir;
-    std::string created = dir.file("new.db");
-    std::string existing = dir.file("existing.db");
+    std::string const created = dir.file("new.db"), existing = dir.file("existing.db");
     std::ofstream(existing) << "";
     ::chmod(existing.c_str(), 0666);
-
-    mode_t old = ::umask(0);
-    uError a = store_.open(String(created));
-    ASSERT_OK(put("src", {{"secret", Variant("x")}}));
+    mode_t const old = ::umask(0);
     RuntimeConfiguration other("Other");
-    uError b = other.open(String(existing));
+    EXPECT_OK(store_.open(String(created)));
+    EXPECT_OK(put("src", {{"secret", Variant("x")}}));
+    EXPECT_OK(other.open(String(existing)));
     ::umask(old);
-    ASSERT_OK(a);
-    ASSERT_OK(b);
-
     for (std::string const& p : {created, existing}) {
         struct stat st {};
         ASSERT_EQ(::stat(p.c_str(), &st), 0) << p;
@@ -137,10 +124,6 @@ TEST_F(RuntimeConfigurationTest, FailedOpenLeavesNoStoreInsteadOfAFreshOne) {
     TempDir dir;
     EXPECT_CODE(store_.open(String(dir.file("missing/dir/x.db"))), kFailure);
     EXPECT_CODE(put("src", {{"a", Variant("1")}}), kFailure);
-
-    std::string notDb = dir.file("text.db");
-    std::ofstream(notDb) << "this is not a database file, not at all, really not";
-    EXPECT_CODE(store_.open(String(notDb)), kFailure);
 
     EXPECT_CODE(store_.open(""), kInvalid);
     EXPECT_OK(store_.open(":memory:"));

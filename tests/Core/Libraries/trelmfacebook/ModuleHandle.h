@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 #include "Component.h"
 #include "trelm/Map.h"
@@ -31,6 +32,13 @@ private:
     void* handle_ = nullptr;
     std::string error_;
 };
+
+// The identifiers in `table`, in its order.
+inline std::vector<std::string> idsOf(ModuleHandle::Table const& table) {
+    std::vector<std::string> ids;
+    for (auto const& [id, factory] : table) ids.push_back(id.str());
+    return ids;
+}
 
 inline constexpr char const* kSourceId = "@trelm.example:/facebooksource";
 inline constexpr char const* kConnectorId = "@trelm.example:/facebookconnector";

@@ -73,8 +73,7 @@ TEST(ModuleOutOfMemoryTest, FailedInsertIsWrappedAndKeepsTheEntriesInsertedBefor
         }
         allocationsLeft = -1;
 
-        std::vector<std::string> ids;
-        for (auto const& [id, factory] : table) ids.push_back(id.str());
+        std::vector<std::string> const ids = idsOf(table);
         if (threw) continue;
         if (result.ok()) {
             succeeded = true;

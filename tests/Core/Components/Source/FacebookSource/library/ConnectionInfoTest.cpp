@@ -37,57 +37,44 @@ TEST_F(ConnectionInfoTest, GettersRefuseUntilTheirValueIsKnownAndLeaveTheOutputA
         EXPECT_OK((subject.*c.get)(out));
         EXPECT_EQ(out, c.value);
     }
-    EXPECT_TRUE(store.records().empty());
+    EXPECT_TRUE(store.received().empty());
 }
 
-TEST_F(ConnectionInfoTest, SettersSendExactlyTheirStoreMessages) {
-    struct Sent {
-        char const* type;
-        Fields values;                  // of a store message
-        Set<String> keys;               // of a reset message
-    };
-    char const* const kStore = "RuntimeConfigurationMessage";
-    char const* const kReset = "ResetRuntimeConfigurationMessage";
-    Fields const session{{"facebook_source_session_id", "sid"},
-                         {"facebook_source_session_secret", "ssec"},
-                         {"facebook_source_session_user", "7"}};
-    Sent const last{kStore, {{"facebook_source_lastuser", "7"}}, {}};
+// What each setter leaves in the store, which held "old" under the session's keys and the last
+// user, and how many messages it sent: only what it is asked to persist is stored or forgotten.
+TEST_F(ConnectionInfoTest, SettersStoreAndForgetExactlyTheirKeys) {
+    char const* const keys[] = {"facebook_source_session_id", "facebook_source_session_secret",
+                                "facebook_source_session_user", "facebook_source_lastuser"};
+    char const* const untouched = "old old old old";
     struct Case {
         char const* name;
         std::function<uError(Info&)> call;
-        std::vector<Sent> sent;
+        char const* after;  // the four keys' values, "-" for none
+        size_t messages;
     } const cases[] = {
-        {"session+last", [](Info& i) { return i.setSessionConfig("sid", "ssec", "7", true, true); },
-         {{kStore, session, {}}, last}},
-        {"session", [](Info& i) { return i.setSessionConfig("sid", "ssec", "7", true, false); },
-         {{kStore, session, {}}}},
-        {"last", [](Info& i) { return i.setSessionConfig("sid", "ssec", "7", false, true); }, {last}},
-        {"memory", [](Info& i) { return i.setSessionConfig("sid", "ssec", "7", false, false); }, {}},
-        {"user+last", [](Info& i) { return i.setUserConfig("7", true, true); },
-         {{kStore, {{"facebook_source_session_user", "7"}}, {}}, last}},
-        {"user memory", [](Info& i) { return i.setUserConfig("7", false, false); }, {}},
-        {"drop all", [](Info& i) { return i.invalidateSessionConfigWithUser(true); },
-         {{kReset, {}, {"facebook_source_session_id", "facebook_source_session_secret", "facebook_source_session_user"}}}},
-        {"drop all memory", [](Info& i) { return i.invalidateSessionConfigWithUser(false); }, {}},
-        {"drop session", [](Info& i) { return i.invalidateSessionConfigWithoutUser(true); },
-         {{kReset, {}, {"facebook_source_session_id", "facebook_source_session_secret"}}}},
-        {"drop session memory", [](Info& i) { return i.invalidateSessionConfigWithoutUser(false); }, {}},
-        {"application", [](Info& i) { return i.setAppConfig("other", "s"); }, {}},
-        {"login", [](Info& i) { return i.setLoginConfig("a@b", "pw"); }, {}},
+        {"session+last", [](Info& i) { return i.setSessionConfig("sid", "ssec", "7", true, true); }, "sid ssec 7 7", 2},
+        {"session", [](Info& i) { return i.setSessionConfig("sid", "ssec", "7", true, false); }, "sid ssec 7 old", 1},
+        {"last", [](Info& i) { return i.setSessionConfig("sid", "ssec", "7", false, true); }, "old old old 7", 1},
+        {"memory", [](Info& i) { return i.setSessionConfig("sid", "ssec", "7", false, false); }, untouched, 0},
+        {"user+last", [](Info& i) { return i.setUserConfig("7", true, true); }, "old old 7 7", 2},
+        {"user memory", [](Info& i) { return i.setUserConfig("7", false, false); }, untouched, 0},
+        {"drop all", [](Info& i) { return i.invalidateSessionConfigWithUser(true); }, "- - - old", 1},
+        {"drop all memory", [](Info& i) { return i.invalidateSessionConfigWithUser(false); }, untouched, 0},
+        {"drop session", [](Info& i) { return i.invalidateSessionConfigWithoutUser(true); }, "- - old old", 1},
+        {"drop session memory", [](Info& i) { return i.invalidateSessionConfigWithoutUser(false); }, untouched, 0},
+        {"application", [](Info& i) { return i.setAppConfig("other", "s"); }, untouched, 0},
+        {"login", [](Info& i) { return i.setLoginConfig("a@b", "pw"); }, untouched, 0},
     };
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
-        store.clearRecords();
+        for (char const* key : keys) put(key, "old");
+        store.clearReceived();
         Info subject(kTag);
         ASSERT_OK(c.call(subject));
-        auto records = store.records();
-        ASSERT_EQ(records.size(), c.sent.size());
-        for (size_t n = 0; n < records.size(); ++n) {
-            EXPECT_EQ(records[n].type, c.sent[n].type);
-            EXPECT_EQ(records[n].tag, kTag);
-            EXPECT_EQ(entries(records[n].values), c.sent[n].values);
-            EXPECT_TRUE(records[n].keys == c.sent[n].keys);
-        }
+        String after;
+        for (char const* key : keys) after += (after.empty() ? "" : " ") + stored(key);
+        EXPECT_EQ(after, c.after);
+        EXPECT_EQ(store.received().size(), c.messages);
     }
 }
 
@@ -107,28 +94,28 @@ TEST_F(ConnectionInfoTest, ChangedApplicationDropsSessionAndUserDroppingTheSessi
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
         signIn("sid", "ssec", "7");
-        store.clearRecords();
+        store.clearReceived();
         ASSERT_OK(c.change(*info));
         String out;
         EXPECT_EQ(info->getSessionId(out).ok(), c.keepsSession);
         EXPECT_EQ(info->getSessionSecret(out).ok(), c.keepsSession);
         EXPECT_EQ(info->getUserId(out).ok() && out == "7", c.keepsUser);
-        EXPECT_TRUE(store.records().empty());
+        EXPECT_TRUE(store.received().empty());
         ASSERT_OK(info->setAppConfig("k", "s"));
     }
 }
 
 // A failed store is reported, memory keeps the change, and the second message is not sent.
 TEST_F(ConnectionInfoTest, FailedStoreIsReportedWhileMemoryKeepsTheChange) {
-    store.failType("RuntimeConfigurationMessage");
+    store.failing = "RuntimeConfigurationMessage";
     EXPECT_CODE(info->setSessionConfig("sid", "ssec", "7", true, true), kFailure);
-    EXPECT_EQ(store.records().size(), 1u) << "a session that could not be stored stops there";
+    EXPECT_EQ(store.received().size(), 1u) << "a session that could not be stored stops there";
     EXPECT_TRUE(info->hasSession());
     // The user is another matter: the last user is what tells a change of person later, so it is
     // stored even when storing the session's user failed, and the first failure is reported.
     EXPECT_CODE(info->setUserConfig("8", true, true), kFailure);
-    EXPECT_EQ(store.records().size(), 3u) << "both stores are tried";
-    store.failType("ResetRuntimeConfigurationMessage");
+    EXPECT_EQ(store.received().size(), 3u) << "both stores are tried";
+    store.failing = "ResetRuntimeConfigurationMessage";
     EXPECT_CODE(info->invalidateSessionConfigWithUser(true), kFailure);
     EXPECT_FALSE(info->hasSession());
 }

@@ -10,30 +10,23 @@ public:
     explicit FakeHttpRequest(FakeHttpRequestFactory& factory) : factory_(factory) {}
 
     uError setup(String const& url) override {
-        exchange_ = {url, {}, {}};
-        answered_ = false;
+        exchange_ = {url, {}};
         return TRELM_OK();
     }
     uError setPostData(Map<String, String> const& fields) override {
         exchange_.fields = fields;
         return TRELM_OK();
     }
-    uError setUploadData(SmartPtr<InputDataStream> data) override {
-        exchange_.upload = data;
-        return TRELM_OK();
-    }
     uError sendRequest() override {
         answer_ = factory_.answer(exchange_);
-        answered_ = answer_.sendError.ok();
         return answer_.sendError;
     }
+    // Read by the client only after a successful sendRequest.
     uError getResponseCode(int& code) override {
-        if (!answered_) return TRELM_ERROR(kInvalid);
         code = answer_.status;
         return TRELM_OK();
     }
     uError getResponseData(String& data) override {
-        if (!answered_) return TRELM_ERROR(kInvalid);
         data = answer_.body;
         return TRELM_OK();
     }
@@ -43,7 +36,6 @@ private:
     FakeHttpRequestFactory& factory_;
     FakeHttpRequestFactory::Exchange exchange_;
     FakeHttpRequestFactory::Answer answer_;
-    bool answered_ = false;
 };
 
 }  // namespace
@@ -53,31 +45,15 @@ void FakeHttpRequestFactory::queue(Answer answer) {
     queue_.push_back(std::move(answer));
 }
 
-void FakeHttpRequestFactory::setDefault(Answer answer) {
-    std::lock_guard<std::mutex> lock(mutex_);
-    default_ = std::move(answer);
-}
-
-void FakeHttpRequestFactory::refuseRequests(bool refuse) {
-    std::lock_guard<std::mutex> lock(mutex_);
-    refuse_ = refuse;
-}
-
 std::vector<FakeHttpRequestFactory::Exchange> FakeHttpRequestFactory::exchanges() const {
     std::lock_guard<std::mutex> lock(mutex_);
     return exchanges_;
 }
 
-void FakeHttpRequestFactory::clear() {
-    std::lock_guard<std::mutex> lock(mutex_);
-    exchanges_.clear();
-    queue_.clear();
-}
-
 FakeHttpRequestFactory::Answer FakeHttpRequestFactory::answer(Exchange const& exchange) {
     std::lock_guard<std::mutex> lock(mutex_);
     exchanges_.push_back(exchange);
-    if (queue_.empty()) return default_;
+    if (queue_.empty()) return Answer();
     Answer next = std::move(queue_.front());
     queue_.pop_front();
     return next;
@@ -85,8 +61,6 @@ FakeHttpRequestFactory::Answer FakeHttpRequestFactory::answer(Exchange const& ex
 
 uError FakeHttpRequestFactory::handleMessage(IMessage& msg) {
     if (msg.type() != IHttpRequestFactory::HttpObjectRequestMessage::kType) return TRELM_OK();
-    std::lock_guard<std::mutex> lock(mutex_);
-    if (refuse_) return TRELM_ERROR(kResource);
     static_cast<IHttpRequestFactory::HttpObjectRequestMessage&>(msg).request =
         SmartPtr<HttpRequest>(new FakeHttpRequest(*this));
     return TRELM_OK();

@@ -10,14 +10,13 @@
 namespace trelm::test {
 
 // Stands in for the host's "HttpRequestFactory": its requests record what the client sends and
-// answer from a queue of canned answers (then from the default answer: 200, empty body).
+// answer from a queue of canned answers (then 200 with an empty body).
 // Thread safety: every member may be called from any thread.
 class FakeHttpRequestFactory : public Component {
 public:
     struct Exchange {
         String url;
         Map<String, String> fields;
-        SmartPtr<InputDataStream> upload;
     };
     // A failed `sendError` makes sendRequest fail with it.
     struct Answer {
@@ -30,11 +29,7 @@ public:
 
     void queue(Answer answer);
     void queue(String body) { queue(Answer{200, std::move(body), uError()}); }
-    void setDefault(Answer answer);
-    // The factory message fails (no request is handed out).
-    void refuseRequests(bool refuse);
     std::vector<Exchange> exchanges() const;
-    void clear();
 
     // Records `exchange` and gives the next answer; called by the fake requests.
     Answer answer(Exchange const& exchange);
@@ -46,8 +41,6 @@ private:
     mutable std::mutex mutex_;  // guards the fields below
     std::vector<Exchange> exchanges_;
     std::deque<Answer> queue_;
-    Answer default_;
-    bool refuse_ = false;
 };
 
 }  // namespace trelm::test

@@ -1,42 +1,20 @@
 #include <gtest/gtest.h>
 
-#include "ErrorAssertions.h"
-
-#include <memory>
 #include <mutex>
 
-#include "ComponentRegistry.h"
-#include "ConnectionInfo.h"
-#include "Emulator.h"
-#include "HttpRequestFactory.h"
-#include "RuntimeConfiguration.h"
+#include "EmulatorHost.h"
+#include "ErrorAssertions.h"
 #include "trelm/Trace.h"
 
 namespace trelm::test {
 namespace {
 
-constexpr char const* kTag = "fbsource";
-
-// The client against the in-process emulator over real HTTP and HTTPS, through the host's own
-// "HttpRequestFactory" (trusting the emulator's CA, sending api.facebook.com to its ports) and an
-// in-memory "RuntimeConfiguration". Every trace line is kept.
+// The client against the in-process emulator over real HTTP and HTTPS. Every trace line is kept.
 class LibraryEmulatorTest : public ::testing::Test {
 protected:
     void SetUp() override {
-        emu::Emulator::Options options;
-        options.generator.users = 20;
-        options.generator.demoFriends = 5;
-        options.generator.friendsPerUser = 3;
-        options.threads = 4;
-        emulator = std::make_unique<emu::Emulator>(options);
         std::string error;
-        ASSERT_TRUE(emulator->start(error)) << error;
-        factory.setCaFile(emulator->caFile());
-        factory.setConnectTo({"api.facebook.com:80:127.0.0.1:" + std::to_string(emulator->httpPort()),
-                              "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator->httpsPort())});
-        ASSERT_OK(registry.add(HttpRequestFactory::kName, &factory));
-        ASSERT_OK(registry.add(RuntimeConfiguration::kName, &store));
-        registry.activate();
+        ASSERT_TRUE(host.start(error)) << error;
         previousSink = setTraceSink([this](String const& line) {
             std::lock_guard<std::mutex> lock(traceMutex);
             traces.push_back(line.str());
@@ -48,11 +26,8 @@ protected:
 
     void TearDown() override { setTraceSink(previousSink); }
 
-    ComponentRegistry registry;
-    HttpRequestFactory factory;
-    RuntimeConfiguration store;
-    std::unique_ptr<emu::Emulator> emulator;
-    SmartPtr<FacebookLibrary::ConnectionInfo> info = makeSmart<FacebookLibrary::ConnectionInfo>(kTag);
+    EmulatorHost host{{.users = 20, .demoFriends = 5, .friendsPerUser = 3}};
+    SmartPtr<FacebookLibrary::ConnectionInfo> info = makeSmart<FacebookLibrary::ConnectionInfo>("fbsource");
     SmartPtr<FacebookLibrary> lib = makeSmart<FacebookLibrary>();
     TraceSink previousSink;
     std::mutex traceMutex;  // guards traces
@@ -62,11 +37,9 @@ protected:
 // The password goes out only in the HTTPS login; the session secret never goes out; neither
 // appears in a trace line or an error text, even while the client has failures to report.
 TEST_F(LibraryEmulatorTest, SecretsStayInTheLoginRequestAndOutOfTraces) {
-    ASSERT_OK(store.store(kTag, {Configuration::Value("facebook_source_lastuser", Variant("7"))}));
+    ASSERT_OK(host.runtime().store("fbsource", {Configuration::Value("facebook_source_lastuser", Variant("7"))}));
     ASSERT_OK(info->setWipeComponents({"NoSuchComponent"}));
-    emu::FaultRule rule;
-    rule.expireAfter = 1;
-    emulator->faults().set("users.setStatus", rule);
+    host.emulator().faults().set("users.setStatus", emu::FaultRule{.expireAfter = 1});
 
     std::vector<std::string> texts;  // the traces, then every error
     std::vector<std::string> secrets{emu::DemoAccount::password, "wrong-password"};
@@ -90,7 +63,7 @@ TEST_F(LibraryEmulatorTest, SecretsStayInTheLoginRequestAndOutOfTraces) {
     for (std::string const& text : texts) {
         for (std::string const& secret : secrets) EXPECT_EQ(text.find(secret), std::string::npos) << text;
     }
-    for (auto const& request : emulator->log().entries()) {
+    for (auto const& request : host.emulator().log().entries()) {
         bool const login = request.method == "facebook.auth.login";
         EXPECT_EQ(request.args.count("password"), login ? 1u : 0u) << request.method;
         if (login) {

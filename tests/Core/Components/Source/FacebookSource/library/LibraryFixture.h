@@ -13,15 +13,15 @@
 #include "FakeHttpRequestFactory.h"
 #include "FakeRuntimeConfiguration.h"
 #include "RecordingComponent.h"
+#include "ServiceTransport.h"
 
 namespace trelm::test {
 
-using Fields = std::vector<std::pair<std::string, std::string>>;
-
-inline Fields entries(Map<String, String> const& map) {
-    Fields out;
-    for (auto const& [key, value] : map) out.emplace_back(key.str(), value.str());
-    return out;
+// True when the "sig" of the request `fields` is their signature with `secret`.
+inline bool signedWith(Map<String, String> fields, String const& secret) {
+    String const* sig = fields.search("sig");
+    String const given = sig != nullptr ? *sig : String();
+    return fields.remove("sig").ok() && ServiceTransport::signature(fields, secret) == given;
 }
 
 // A test-owned registry with the two fakes, and a client set up with a ConnectionInfo under the
@@ -48,6 +48,17 @@ protected:
     void addRecorder(String const& name, bool fail = false) {
         recorders.push_back(std::make_unique<RecordingComponent>(name, events, fail));
         ASSERT_OK(registry.add(name, recorders.back().get()));
+    }
+
+    // The store's value of `key` under kTag, or "-".
+    String stored(char const* key) {
+        Map<String, Variant> values{{key, Variant()}};
+        EXPECT_OK(store.get(kTag, values));
+        Variant const& value = *values.search(key);
+        return value.empty() ? String("-") : value.asString();
+    }
+    void put(char const* key, String const& value) {
+        ASSERT_OK(store.store(kTag, {Configuration::Value(key, Variant(value))}));
     }
 
     Map<String, String> lastFields() const {

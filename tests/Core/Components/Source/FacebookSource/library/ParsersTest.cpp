@@ -14,7 +14,8 @@ namespace {
 using Thread = FacebookLibrary::ThreadObj;
 using Message = FacebookLibrary::MessageObj;
 
-// The three parsers share their handling of roots and error documents.
+// The three parsers share their handling of roots and error documents (the translation of each
+// service code: RequestTest.ServiceErrorsTranslateAndSessionErrorsDropTheSession).
 TEST(ResponseParsersTest, RootsAndErrorDocumentsGiveTheirCodes) {
     struct Parser {
         std::function<uError(String const&)> parse;
@@ -31,10 +32,7 @@ TEST(ResponseParsersTest, RootsAndErrorDocumentsGiveTheirCodes) {
         unsigned code;
     } const docs[] = {
         {"<@/>", kSuccess},
-        {"<error_response><code>2</code></error_response>", kServiceUnavailable},
-        {"<error_response><code>4</code></error_response>", kRequestLimit},
         {"<error_response><code>102</code></error_response>", kNotSignedIn},
-        {"<error_response><code>321</code></error_response>", kServiceError},
         {"<error_response><code>x</code></error_response>", kFailure},
         {"<fql_query_response/>", kFailure},
         {"<@><unclosed></@>", kFailure},
@@ -47,33 +45,6 @@ TEST(ResponseParsersTest, RootsAndErrorDocumentsGiveTheirCodes) {
             EXPECT_CODE(p.parse(String(xml)), d.code) << xml;
         }
     }
-}
-
-// Records appended before a broken answer stay, after what the caller already had.
-TEST(ResponseParsersTest, ThreadsAreReadInOrderAndKeptWhenTheAnswerBreaks) {
-    Vector<Thread> threads{Thread{"old", "", 1}};
-    EXPECT_CODE(ThreadParser(threads)
-                  .parse("<mailbox_getInbox_response><thread><tid>1</tid><subject>Hi &amp; bye</subject>"
-                         "<last_update>1700000000</last_update><unread>1</unread></thread>"
-                         "<thread><tid>2</tid><last_update>12abc</last_update></thread><thread><tid>3</ti"), kFailure);
-    ASSERT_EQ(threads.size(), 4u);
-    EXPECT_EQ(threads[0].threadId, "old");
-    EXPECT_EQ(threads[1].threadId + "|" + threads[1].subject, "1|Hi & bye");
-    EXPECT_EQ(threads[1].lastUpdate, 1700000000);
-    EXPECT_EQ(threads[2].lastUpdate, 12);  // atoi reads the leading number
-}
-
-TEST(ResponseParsersTest, MessagesCarryTheCallersContext) {
-    Vector<Message> messages;
-    ASSERT_OK(MessageParser(messages, "thread 9")
-                    .parse("<mailbox_getThreadMessages_response><message><mid>9_1</mid><tid>9</tid>"
-                           "<author>42</author><body>hi <b>x</b>there</body><time_sent>1700000001</time_sent>"
-                           "</message><message><mid>9_2</mid></message></mailbox_getThreadMessages_response>"));
-    ASSERT_EQ(messages.size(), 2u);
-    Message const& m = messages[0];
-    EXPECT_EQ(m.messageId + "|" + m.threadId + "|" + m.author + "|" + m.body, "9_1|9|42|hi there");
-    EXPECT_EQ(m.timeSent, 1700000001);
-    EXPECT_EQ(messages[1].context, "thread 9");
 }
 
 // The flag follows the time-sent text read before "has_attachment" ends (starting afresh with each
