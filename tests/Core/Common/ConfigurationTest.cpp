@@ -18,13 +18,6 @@ Configuration::Group makeGroup() {
     return Configuration::Group("source", values);
 }
 
-TEST(ConfigurationTest, GetGivesTheValueOrAnEmptyVariant) {
-    auto group = makeGroup();
-    EXPECT_EQ(group.name(), "source");
-    EXPECT_EQ(group.get("number"), Variant(7));
-    EXPECT_TRUE(group.get("absent").empty());
-}
-
 TEST(ConfigurationTest, GetBoolAcceptsBoolLikeValuesAndDefaultsWhenAbsent) {
     auto group = makeGroup();
     struct Case {
