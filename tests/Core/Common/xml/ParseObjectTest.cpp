@@ -53,11 +53,6 @@ TEST(HashParseObjTest, AnswerDocumentsGiveTheirFieldsWithEntitiesDecodedAndNilFi
         {"auth_login_response", "auth_login_response.xml",
          {{"session_key", "2.b1c2d3e4f5a6b7c8d9e0f1a2.3600.1262307600-1001"}, {"uid", "1001"},
           {"secret", "9f8e7d6c5b4a39281706f5e4d3c2b1a0"}, {"expires", "0"}}},
-        {"photos_upload_response", "photos_upload_response.xml",
-         {{"pid", "1001_90210"}, {"aid", "1001_7"}, {"owner", "1001"}, {"src", "http://photos.example/s1001_90210.jpg"},
-          {"src_big", "http://photos.example/n1001_90210.jpg"}, {"src_small", "http://photos.example/t1001_90210.jpg"},
-          {"link", "http://www.facebook.com/photo.php?pid=90210&id=1001"}, {"caption", "Harbour at dusk"},
-          {"created", "1262390400"}}},
         {"r", R"(<r xmlns:xsi="x"><a xsi:nil="true"/><b/><c></c><d> </d></r>)", {{"b", ""}, {"c", ""}, {"d", " "}}},
     };
     for (auto const& c : cases) {
@@ -65,12 +60,6 @@ TEST(HashParseObjTest, AnswerDocumentsGiveTheirFieldsWithEntitiesDecodedAndNilFi
         ASSERT_OK(HashParseObj(c.root).parse(document(c.source), out)) << c.source;
         EXPECT_EQ(out.map(), c.expected) << c.source;
     }
-}
-
-TEST(FlatParseObjTest, StatusAnswerGivesItsValue) {
-    String out = "old";
-    ASSERT_OK(FlatParseObj("users_setStatus_response").parse(loadXml("users_setStatus_response.xml"), out));
-    EXPECT_EQ(out, "1");
 }
 
 TEST(ListParseObjTest, ValuesFollowExistingEntriesInOrderWithoutNilEntries) {
@@ -89,26 +78,14 @@ TEST(ListParseObjTest, ValuesFollowExistingEntriesInOrderWithoutNilEntries) {
     }
 }
 
-TEST(ListHashParseObjTest, MailboxAnswersGiveOneRecordPerEntry) {
-    struct Case {
-        char const* root;
-        std::vector<Row> expected;
-    } const cases[] = {
-        {"mailbox_getInbox_response",
-         {{{"tid", "3001"}, {"subject", "Dinner on Friday?"}, {"last_update", "1262400000"}, {"unread", "1"},
-           {"message_count", "4"}},
-          {{"tid", "3000"}, {"subject", ""}, {"last_update", "1262300000"}, {"unread", "0"}, {"message_count", "1"}}}},
-        {"mailbox_getThreadMessages_response",
-         {{{"mid", "3001_4"}, {"tid", "3001"}, {"author", "1002"}, {"body", "Sounds good \xE2\x80\x94 8pm?"},
-           {"time_sent", "1262400000"}, {"has_attachment", "false"}},
-          {{"mid", "3001_3"}, {"tid", "3001"}, {"author", "1001"}, {"body", "See the photo"},
-           {"time_sent", "1262390000"}, {"has_attachment", "true"}}}},
-    };
-    for (auto const& c : cases) {
-        Rows rows;
-        ASSERT_OK(ListHashParseObj(c.root).parse(loadXml(std::string(c.root) + ".xml"), rows));
-        EXPECT_EQ(plain(rows), c.expected) << c.root;
-    }
+TEST(ListHashParseObjTest, MailboxAnswerGivesOneRecordPerEntry) {
+    Rows rows;
+    ASSERT_OK(ListHashParseObj("mailbox_getInbox_response").parse(loadXml("mailbox_getInbox_response.xml"), rows));
+    EXPECT_EQ(plain(rows),
+              (std::vector<Row>{{{"tid", "3001"}, {"subject", "Dinner on Friday?"}, {"last_update", "1262400000"},
+                                 {"unread", "1"}, {"message_count", "4"}},
+                                {{"tid", "3000"}, {"subject", ""}, {"last_update", "1262300000"}, {"unread", "0"},
+                                 {"message_count", "1"}}}));
 }
 
 // --- FqlParseObj ----------------------------------------------------------------------------
