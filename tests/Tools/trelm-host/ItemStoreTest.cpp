@@ -109,34 +109,6 @@ TEST_F(ItemStoreTest, PassesCountEachRowOnceKeepHostIdsAndRemoveWhatACompletePas
     EXPECT_EQ(items().at("a").fields, R"({"t":1,"v":2})") << "t kept from the first pass";
 }
 
-TEST_F(ItemStoreTest, AnOpenPassIsContinuedByTheNextRunWithItsProgress) {
-    ItemStore::Pass pass;
-    ASSERT_OK(store_.openPass(contacts_, pass));
-    pass.resume = "core_object_time<=5";
-    pass.boundaries = {7, 5};
-    pass.rows = 2;
-    commit(pass, {{"a", 1}, {"b", 1}}, contacts_);
-    store_.close();
-    ASSERT_OK(store_.open(String(path())));
-
-    ItemStore::Pass again;
-    ASSERT_OK(store_.openPass(contacts_, again));
-    EXPECT_TRUE(again.continued);
-    EXPECT_EQ(again.id, pass.id);
-    EXPECT_EQ(again.resume, pass.resume);
-    EXPECT_EQ(again.boundaries, pass.boundaries);
-    EXPECT_EQ(again.rows, 2);
-    ItemStore::Counts counts;
-    ASSERT_OK(store_.completePass(contacts_, again, counts));
-
-    ItemStore::Pass next;
-    ASSERT_OK(store_.openPass(contacts_, next));
-    EXPECT_EQ(next.id, pass.id + 1);
-    EXPECT_FALSE(next.continued);
-    EXPECT_TRUE(next.resume.empty());
-    EXPECT_TRUE(next.boundaries.empty());
-}
-
 TEST_F(ItemStoreTest, WipeMessageRemovesTheNamedSourcesItemsAndTheFileIsPrivate) {
     ItemStore::Scope const other{String("other"), String("7"), 2};
     ItemStore::Pass mine, theirs;

@@ -211,6 +211,7 @@ struct Interruption {
     char const* kind;
     char const* method;
     bool kill;
+    int postsPerSecond = 0;  // not 0: posts share seconds at window boundaries
 };
 
 class InterruptedSyncTest : public SyncCommandTest, public ::testing::WithParamInterface<Interruption> {};
@@ -222,6 +223,10 @@ TEST_P(InterruptedSyncTest, NextSyncAsksOnlyForTheWindowsNotCommittedAndStoresEa
     if (contacts) {
         generator.demoFriends = 5000;
         generator.users = 10100;
+    }
+    if (c.postsPerSecond != 0) {
+        generator.postsPerSecond = c.postsPerSecond;
+        generator.postsPerUser = 8;
     }
     start(generator);
     emu::FaultRule rule;
@@ -271,7 +276,7 @@ TEST_P(InterruptedSyncTest, NextSyncAsksOnlyForTheWindowsNotCommittedAndStoresEa
 INSTANTIATE_TEST_SUITE_P(Stops, InterruptedSyncTest,
                          ::testing::Values(Interruption{"ServiceError", "contacts", "fql.query", false},
                                            Interruption{"Killed", "contacts", "fql.query", true},
-                                           Interruption{"StatusServiceError", "status", "stream.get", false},
+                                           Interruption{"StatusServiceError", "status", "stream.get", false, 6},
                                            Interruption{"PhotosServiceError", "photos", "fql.query", false}),
                          [](auto const& info) { return std::string(info.param.name); });
 
