@@ -18,8 +18,6 @@ using nlohmann::json;
 
 namespace {
 
-using Row = emu::test::Row;
-
 constexpr char const* kDemoUser = "100000001";
 
 // The demo configuration with only the data source, so that every request in the log is the
@@ -43,8 +41,6 @@ protected:
         EXPECT_EQ(result.err.find("rows/s"), std::string::npos) << "no progress line off a terminal";
         return result;
     }
-    std::vector<Row> fql(std::string const& query) { return h.fql(query); }
-    std::vector<emu::LoggedRequest> requests(std::string const& method) { return h.requests(method); }
 
     EmulatedHost h;
 };
@@ -55,20 +51,20 @@ TEST_F(HostCommandsTest, DemoTourListsTheFriendsPostsUploadsAndFetchesTheFirstFr
     ASSERT_EQ(result.exitCode, 0) << result.err;
 
     EXPECT_EQ(linesOfType(result, "login").at(0)["session"], "new");
-    EXPECT_TRUE(requests("auth.login").at(0).https);
+    EXPECT_TRUE(h.requests("auth.login").at(0).https);
     auto records = linesOfType(result, "record");
     ASSERT_EQ(records.size(), 10u) << result.out;
     EXPECT_EQ(linesOfType(result, "listed").at(0)["total"],
-              fql(std::string("select uid2 from friend where uid1 = ") + kDemoUser).size());
+              h.fql(std::string("select uid2 from friend where uid1 = ") + kDemoUser).size());
 
-    EXPECT_EQ(fql(std::string("SELECT status FROM user WHERE uid = ") + kDemoUser).at(0)["status.message"], status);
+    EXPECT_EQ(h.fql(std::string("SELECT status FROM user WHERE uid = ") + kDemoUser).at(0)["status.message"], status);
     auto inserted = linesOfType(result, "inserted");
     ASSERT_EQ(inserted.size(), 2u) << result.out;
     EXPECT_EQ(inserted[0]["object_type"], 4);
     EXPECT_EQ(inserted[1]["object_type"], 9);
     std::string const pid = inserted[1]["core_service_id"];
-    EXPECT_EQ(fql("SELECT owner FROM photo WHERE pid = '" + pid + "'").at(0)["owner"], kDemoUser);
-    EXPECT_EQ(requests("photos.upload").at(0).fileSize, std::filesystem::file_size(h.stateDir() + "/demo-photo.png"));
+    EXPECT_EQ(h.fql("SELECT owner FROM photo WHERE pid = '" + pid + "'").at(0)["owner"], kDemoUser);
+    EXPECT_EQ(h.requests("photos.upload").at(0).fileSize, std::filesystem::file_size(h.stateDir() + "/demo-photo.png"));
 
     auto retrieved = linesOfType(result, "retrieved");
     ASSERT_EQ(retrieved.size(), 1u);
@@ -81,27 +77,27 @@ TEST_F(HostCommandsTest, DemoTourListsTheFriendsPostsUploadsAndFetchesTheFirstFr
 TEST_F(HostCommandsTest, StoredSessionIsReusedForgottenCostsOneLoginAndChangedLoginSignsInAnew) {
     auto first = host({"query", "contacts", "--limit", "1"});
     ASSERT_EQ(first.exitCode, 0) << first.err;
-    ASSERT_EQ(requests("auth.login").size(), 1u);
-    std::string const session = requests("fql.query").back().args["session_key"];
+    ASSERT_EQ(h.requests("auth.login").size(), 1u);
+    std::string const session = h.requests("fql.query").back().args["session_key"];
     ASSERT_FALSE(session.empty());
 
     h.emulator->log().clear();
     auto second = host({"query", "contacts", "--limit", "1"});
     ASSERT_EQ(second.exitCode, 0) << second.err;
-    EXPECT_TRUE(requests("auth.login").empty());
+    EXPECT_TRUE(h.requests("auth.login").empty());
     auto logins = linesOfType(second, "login");
     ASSERT_EQ(logins.size(), 1u);
     EXPECT_EQ(logins[0]["session"], "stored");
     EXPECT_EQ(logins[0]["user"], kDemoUser);
-    for (auto const& request : requests("fql.query")) EXPECT_EQ(request.args.at("session_key"), session);
+    for (auto const& request : h.requests("fql.query")) EXPECT_EQ(request.args.at("session_key"), session);
     EXPECT_EQ(linesOfType(second, "record").size(), 1u);
 
     h.emulator->sessions().remove(session);
     h.emulator->log().clear();
     auto third = host({"query", "contacts", "--limit", "3"});
     ASSERT_EQ(third.exitCode, 0) << third.err;
-    EXPECT_EQ(requests("auth.login").size(), 1u);
-    auto queries = requests("fql.query");
+    EXPECT_EQ(h.requests("auth.login").size(), 1u);
+    auto queries = h.requests("fql.query");
     ASSERT_FALSE(queries.empty());
     EXPECT_EQ(queries.front().errorCode, 102);
     logins = linesOfType(third, "login");
@@ -119,8 +115,8 @@ TEST_F(HostCommandsTest, StoredSessionIsReusedForgottenCostsOneLoginAndChangedLo
     ASSERT_EQ(logins.size(), 1u) << other.out;
     EXPECT_EQ(logins[0]["session"], "new");
     EXPECT_NE(logins[0]["user"], kDemoUser);
-    ASSERT_EQ(requests("auth.login").size(), 1u);
-    auto posts = requests("users.setStatus");
+    ASSERT_EQ(h.requests("auth.login").size(), 1u);
+    auto posts = h.requests("users.setStatus");
     ASSERT_EQ(posts.size(), 1u);
     EXPECT_NE(posts[0].args.at("session_key").find(logins[0]["user"].get<std::string>()), std::string::npos)
         << "the status went out with the new account's session";
@@ -131,7 +127,7 @@ TEST_F(HostCommandsTest, InsertedPhotoArrivesWithItsCaption) {
     auto result = host({"insert", "photo", image, "--caption", "Harbour at dusk"});
     ASSERT_EQ(result.exitCode, 0) << result.err;
     std::string const pid = linesOfType(result, "inserted").at(0)["core_service_id"];
-    EXPECT_EQ(fql("SELECT caption FROM photo WHERE pid = '" + pid + "'").at(0)["caption"], "Harbour at dusk");
+    EXPECT_EQ(h.fql("SELECT caption FROM photo WHERE pid = '" + pid + "'").at(0)["caption"], "Harbour at dusk");
 }
 
 struct RefusedCase {
@@ -158,7 +154,7 @@ TEST_P(RefusedCommandTest, ExitsNonZeroAndSaysWhy) {
     EXPECT_EQ(result.out.find(c.password), std::string::npos) << result.out;
     EXPECT_TRUE(linesOfType(result, "record").empty());
     EXPECT_TRUE(linesOfType(result, "inserted").empty());
-    EXPECT_TRUE(requests("photos.upload").empty()) << "a refused photo is refused before any request";
+    EXPECT_TRUE(h.requests("photos.upload").empty()) << "a refused photo is refused before any request";
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -267,7 +263,7 @@ TEST_F(HostCommandsTest, ListingOnATerminalShowsProgressWithTheTotal) {
     for (std::string const& arg : h.arguments({"query", "contacts", "--all"})) command += " '" + arg + "'";
     auto result = h.runner.run("/usr/bin/script", {"-qec", command, "/dev/null"});
     ASSERT_EQ(result.exitCode, 0) << result.out;
-    std::size_t const friends = fql("select uid2 from friend where uid1=" + std::string(kDemoUser)).size();
+    std::size_t const friends = h.fql("select uid2 from friend where uid1=" + std::string(kDemoUser)).size();
     ASSERT_GT(friends, 0u);
     EXPECT_NE(result.out.find(" of " + std::to_string(friends) + " rows, "), std::string::npos) << result.out;
 }

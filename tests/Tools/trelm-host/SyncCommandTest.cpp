@@ -28,7 +28,6 @@ protected:
         options.databasePath = serviceDatabase();
         options.generator = generator;
         h.restart(options);
-        emulator_ = h.emulator.get();
     }
     ProgramRunner::Result host(std::vector<std::string> const& command, int signal = 0, int afterMs = 0) {
         return h.run(command, "json", {}, signal, afterMs);
@@ -59,7 +58,7 @@ protected:
         std::set<std::string> ids;
         if (kind == "status") {
             emu::XmlNode root("stream_get_response");
-            EXPECT_FALSE(emulator_->store().streamGet(uid, std::to_string(uid), "0", "0", "100000", root));
+            EXPECT_FALSE(h.emulator->store().streamGet(uid, std::to_string(uid), "0", "0", "100000", root));
             trelm::Vector<trelm::Map<trelm::String, trelm::String>> rows;
             unsigned total = 0;
             EXPECT_TRUE(trelm::FStreamParseObj().parse(emu::renderDocument(root), rows, total).ok());
@@ -70,28 +69,24 @@ protected:
             }
             return ids;
         }
+        // A service id is the row's fields joined, as the source makes it.
         std::string const me = std::to_string(uid);
-        std::map<std::string, std::pair<std::string, std::string>> const statements{
-            {"contacts", {"select uid from user where uid in (select uid2 from friend where uid1 = " + me + ")", ""}},
-            {"photos",
-             {"select pid from photo where aid in (select aid from album where owner in (select uid2 from friend "
-              "where uid1 = " + me + "))", ""}},
-            {"media", {"select pid from photo where owner = " + me, ""}},
-            {"albums", {"select aid from album where owner = " + me, ""}},
-            {"friend-requests", {"select uid_from from friend_request where uid_to = " + me, "FriendRequest: "}},
-            {"photo-tags", {"select pid, subject from photo_tag where subject = " + me, ""}},
-            {"messages",
-             {"select thread_id, message_id from message where thread_id in (select thread_id from thread where "
-              "folder_id = 0)", ""}},
+        std::string const friends = "(select uid2 from friend where uid1 = " + me + ")";
+        std::map<std::string, std::string> const statements{
+            {"contacts", "select uid from user where uid in " + friends},
+            {"photos", "select pid from photo where aid in (select aid from album where owner in " + friends + ")"},
+            {"media", "select pid from photo where owner = " + me},
+            {"albums", "select aid from album where owner = " + me},
+            {"friend-requests", "select uid_from from friend_request where uid_to = " + me},
+            {"photo-tags", "select pid, subject from photo_tag where subject = " + me},
+            {"messages", "select thread_id, message_id from message where thread_id in (select thread_id from thread "
+                         "where folder_id = 0)"},
         };
-        auto const& [statement, prefix] = statements.at(kind);
         emu::XmlNode root("fql_query_response");
-        EXPECT_FALSE(emulator_->store().fqlQuery(uid, statement, root).has_value()) << statement;
+        EXPECT_FALSE(h.emulator->store().fqlQuery(uid, statements.at(kind), root).has_value()) << kind;
         for (emu::XmlNode const& row : root.children) {
-            std::string id = prefix;
-            for (emu::XmlNode const& field : row.children) {
-                id += (id.size() > prefix.size() ? (kind == "messages" ? "-" : " ") : "") + field.text;
-            }
+            std::string id = kind == "friend-requests" ? "FriendRequest: " + row.children[0].text : row.children[0].text;
+            if (row.children.size() == 2) id += (kind == "messages" ? "-" : " ") + row.children[1].text;
             ids.insert(id);
         }
         return ids;
@@ -108,10 +103,9 @@ protected:
     }
     std::string serviceDatabase() const { return h.runner.folder() + "/service.db"; }
 
-    void fault(std::string const& method, emu::FaultRule const& rule) { emulator_->faults().set(method, rule); }
+    void fault(std::string const& method, emu::FaultRule const& rule) { h.emulator->faults().set(method, rule); }
 
     EmulatedHost h{std::nullopt};
-    emu::Emulator* emulator_ = nullptr;
 };
 
 std::set<std::string> keys(std::map<std::string, json> const& items) {
@@ -187,7 +181,7 @@ TEST_F(SyncCommandTest, RemovedFriendIsMarkedOnlyAfterACompletePass) {
     EXPECT_EQ(summary["removed"], 0);
     EXPECT_TRUE(stored("contacts").count(gone));
 
-    emulator_->faults().clearAll();
+    h.emulator->faults().clearAll();
     ProgramRunner::Result rest = host({"sync", "contacts"});
     ASSERT_EQ(rest.exitCode, 0) << rest.err;
     json const begun = linesOfType(rest, "sync").at(0);
@@ -244,8 +238,8 @@ TEST_P(InterruptedSyncTest, NextSyncAsksOnlyForTheWindowsNotCommittedAndStoresEa
     ASSERT_GT(committed.size(), 0u);
     ASSERT_LT(committed.size(), expected.size());
 
-    emulator_->faults().clearAll();
-    emulator_->log().clear();
+    h.emulator->faults().clearAll();
+    h.emulator->log().clear();
     ProgramRunner::Result rest = host({"sync", c.kind});
     ASSERT_EQ(rest.exitCode, 0) << rest.err;
     json const begun = linesOfType(rest, "sync").at(0);
@@ -262,7 +256,7 @@ TEST_P(InterruptedSyncTest, NextSyncAsksOnlyForTheWindowsNotCommittedAndStoresEa
     std::string const last = *keys(committed).rbegin();  // the windows come in the text order of the ids
     EXPECT_EQ(begun["from"], "core_contact_service_id>" + last);
     std::vector<std::string> windows;
-    for (emu::LoggedRequest const& request : emulator_->log().entriesFor("fql.query")) {
+    for (emu::LoggedRequest const& request : h.emulator->log().entriesFor("fql.query")) {
         if (request.fql.find(kContactWindow) != std::string::npos) windows.push_back(request.fql);
     }
     EXPECT_EQ(windows.size(), (5000 - committed.size()) / 150 + 1);
@@ -305,7 +299,7 @@ TEST_F(SyncCommandTest, AnotherPersonsSignInWipesTheStoreAndTheSameOneAgainDoesN
     config["components"][0]["config"]["facebook_source_login"] = emu::SecondAccount::email;
     config["components"][0]["config"]["facebook_source_password"] = emu::SecondAccount::password;
     h.useConfig(config.dump());
-    std::int64_t const secondUid = *emulator_->store().checkLogin(emu::SecondAccount::email, emu::SecondAccount::password);
+    std::int64_t const secondUid = *h.emulator->store().checkLogin(emu::SecondAccount::email, emu::SecondAccount::password);
 
     ProgramRunner::Result switched = host({"sync", "contacts"});
     ASSERT_EQ(switched.exitCode, 0) << switched.err;
