@@ -27,10 +27,11 @@ constexpr char const* kConnectorId = "@trelm.example:/facebookconnector";
 class HostProgramTest : public ::testing::Test {
 protected:
     // Runs the host with JSON-lines output and, unless `args` give others, the scratch folder's
-    // state folder and the demo configuration.
+    // state folder, the demo configuration and the built plug-in.
     ProgramRunner::Result host(std::vector<std::string> args) {
         for (auto const& [option, value] : {std::pair<std::string, std::string>{"--state-dir", stateDir()},
-                                            {"--config", TRELM_DEMO_CONFIG}, {"--format", "json"}}) {
+                                            {"--config", TRELM_DEMO_CONFIG}, {"--plugin", TRELMFACEBOOK_MODULE},
+                                            {"--format", "json"}}) {
             if (std::find(args.begin(), args.end(), option) == args.end()) args.insert(args.begin(), {option, value});
         }
         return runner_.run(TRELM_HOST_PROGRAM, args);
@@ -41,7 +42,7 @@ protected:
 };
 
 TEST_F(HostProgramTest, DemoConfigurationStartsBothComponentsAgainstTheEmbeddedEmulator) {
-    auto result = host({"--plugin", TRELMFACEBOOK_MODULE});
+    auto result = host({});
     ASSERT_EQ(result.exitCode, 0) << result.err;
 
     auto plugins = linesOfType(result, "plugin");
@@ -65,30 +66,12 @@ TEST_F(HostProgramTest, DemoConfigurationStartsBothComponentsAgainstTheEmbeddedE
     EXPECT_EQ(result.err.find("demo-password"), std::string::npos);
 }
 
-TEST_F(HostProgramTest, BrokenPluginIsReportedWithItsPathAndStopsTheHost) {
-    struct Case {
-        std::string plugin;
-        std::vector<std::string> said;
-    } const cases[] = {
-        {"/nonexistent/libmissing.so", {"0x80000006", "cannot load plug-in"}},
-        {NO_ENTRY_PLUGIN, {"0x80000006", "has no entry point getComponents"}},
-        {FAILING_PLUGIN, {"0x80000001", "getComponents of plug-in", "caused by: this is not supported [0x80000002]"}},
-    };
-    for (Case const& c : cases) {
-        auto result = host({"--no-emulator", "--plugin", c.plugin});
-        EXPECT_EQ(result.exitCode, 1) << result.err;
-        EXPECT_TRUE(linesOfType(result, "component").empty()) << result.out;
-        EXPECT_NE(result.err.find(c.plugin), std::string::npos) << result.err;
-        for (std::string const& words : c.said) EXPECT_NE(result.err.find(words), std::string::npos) << result.err;
-    }
-}
-
 TEST_F(HostProgramTest, ComponentIdThatNoPluginOffersFailsTheRunButNotTheOthers) {
     std::string config = runner_.writeFile("config.json", R"({"components": [
         {"name": "ghost", "id": "@trelm.example:/nothing"},
         {"name": "presence", "id": "@trelm.example:/facebookconnector",
          "config": {"facebook_polltime": 300, "facebook_maxtime": 3600}}]})");
-    auto result = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
+    auto result = host({"--no-emulator", "--config", config});
     EXPECT_EQ(result.exitCode, 2);
     auto components = linesOfType(result, "component");
     ASSERT_EQ(components.size(), 2u) << result.out;
@@ -108,7 +91,7 @@ TEST_F(HostProgramTest, StoredValueIsRestoredOnTheNextRunAndTheStoreIsPrivate) {
     ASSERT_EQ(stat((stateDir() + "/runtime-configuration.db").c_str(), &st), 0);
     EXPECT_EQ(st.st_mode & 0777, 0600u);
 
-    auto started = host({"--no-emulator", "--plugin", TRELMFACEBOOK_MODULE});
+    auto started = host({"--no-emulator"});
     ASSERT_EQ(started.exitCode, 0) << started.err;
     auto components = linesOfType(started, "component");
     ASSERT_EQ(components.size(), 2u) << started.out;
@@ -119,9 +102,10 @@ TEST_F(HostProgramTest, StoredValueIsRestoredOnTheNextRunAndTheStoreIsPrivate) {
 
 }  // namespace
 
-// A path the host cannot use (state folder or its database, configuration file, CA file) or a
-// malformed configuration is named, with why and what to do, before any request is sent.
-TEST_F(HostProgramTest, UnusablePathIsNamedWithTheReasonAndARemedy) {
+// A path the host cannot use (state folder or its database, configuration file, CA file,
+// plug-in) or a malformed configuration is named, with why and what to do, before any component
+// starts.
+TEST_F(HostProgramTest, UnusablePathOrPluginIsNamedWithTheReasonAndARemedy) {
     std::string const file = runner_.writeFile("plain-file", "x");
     std::string const big = runner_.writeFile("big.json", "{\"pad\": \"" + std::string(1 << 20, 'x') + "\"}");
     std::string const config = runner_.writeFile("config.json", R"({"components": [
@@ -138,8 +122,13 @@ TEST_F(HostProgramTest, UnusablePathIsNamedWithTheReasonAndARemedy) {
     struct Case {
         std::vector<std::string> args;
         std::string words;
+        std::vector<std::string> more = {};
     };
     std::vector<Case> cases{
+        {{"--plugin", "/nonexistent/libmissing.so"}, "/nonexistent/libmissing.so", {"0x80000006", "cannot load plug-in"}},
+        {{"--plugin", NO_ENTRY_PLUGIN}, NO_ENTRY_PLUGIN, {"0x80000006", "has no entry point getComponents"}},
+        {{"--plugin", FAILING_PLUGIN}, FAILING_PLUGIN,
+         {"0x80000001", "getComponents of plug-in", "caused by: this is not supported [0x80000002]"}},
         {{"--state-dir", file}, "state folder " + file + " is not a folder; choose another with --state-dir"},
         {{"--state-dir", file + "/state"}, "cannot create state folder " + file + "/state: Not a directory"},
         {{"--state-dir", damaged},
@@ -154,9 +143,10 @@ TEST_F(HostProgramTest, UnusablePathIsNamedWithTheReasonAndARemedy) {
     };
     if (lockable) cases.push_back({{"--state-dir", locked}, "state folder " + locked + " cannot be written ("});
     for (Case const& c : cases) {
-        auto result = host({"--plugin", TRELMFACEBOOK_MODULE, c.args[0], c.args[1], "query", "contacts"});
+        auto result = host({c.args[0], c.args[1], "query", "contacts"});
         EXPECT_EQ(result.exitCode, 1) << c.words;
         EXPECT_NE(result.err.find(c.words), std::string::npos) << result.err;
+        for (std::string const& words : c.more) EXPECT_NE(result.err.find(words), std::string::npos) << result.err;
         EXPECT_TRUE(linesOfType(result, "component").empty()) << c.words << "\n" << result.out;
     }
     if (immutable) {
