@@ -10,19 +10,12 @@ namespace trelm {
 namespace {
 
 Configuration::Group makeGroup() {
+    // The conversions themselves are VariantTest's: here, what the group adds to them.
     Map<String, Variant> const values{
-        {"flag_true", true},  {"flag_text", "false"},          {"flag_one", 1},
-        {"flag_two", 2},      {"flag_word", "yes"},            {"list", Vector<String>{"a", "b"}},
-        {"single", "solo"},   {"int_list", Vector<int>{3, 4}}, {"number", 7},
+        {"flag_true", true}, {"flag_text", "false"}, {"list", Vector<String>{"a", "b"}},
+        {"single", "solo"},  {"number", 7},
     };
     return Configuration::Group("source", values);
-}
-
-TEST(ConfigurationTest, GetGivesTheValueOrAnEmptyVariant) {
-    auto group = makeGroup();
-    EXPECT_EQ(group.name(), "source");
-    EXPECT_EQ(group.get("number"), Variant(7));
-    EXPECT_TRUE(group.get("absent").empty());
 }
 
 TEST(ConfigurationTest, GetBoolAcceptsBoolLikeValuesAndDefaultsWhenAbsent) {
@@ -33,9 +26,8 @@ TEST(ConfigurationTest, GetBoolAcceptsBoolLikeValuesAndDefaultsWhenAbsent) {
         unsigned code;
         bool expected;  // value of out afterwards (starts as !def ^ ... see below)
     } const cases[] = {{"flag_true", false, kSuccess, true}, {"flag_text", true, kSuccess, false},
-                       {"flag_one", false, kSuccess, true},  {"absent", true, kSuccess, true},
-                       {"absent", false, kSuccess, false},   {"flag_two", true, kInvalid, false},
-                       {"flag_word", true, kInvalid, false}, {"list", true, kInvalid, false}};
+                       {"absent", true, kSuccess, true},     {"absent", false, kSuccess, false},
+                       {"list", true, kInvalid, false}};
     for (auto const& c : cases) {
         // out starts as !def for successes so that a skipped write would show; for failures it
         // must keep its start value `expected`.
@@ -53,11 +45,9 @@ TEST(ConfigurationTest, GetListAcceptsListsAndASingleString) {
         unsigned code;
         Vector<String> expected;
     } const cases[] = {{"list", kSuccess, {"a", "b"}},
-                       {"int_list", kSuccess, {"3", "4"}},
                        {"single", kSuccess, {"solo"}},
                        {"absent", kSuccess, {"default"}},
-                       {"number", kInvalid, {"untouched"}},
-                       {"flag_true", kInvalid, {"untouched"}}};
+                       {"number", kInvalid, {"untouched"}}};
     for (auto const& c : cases) {
         Vector<String> out{"untouched"};
         EXPECT_CODE(group.get(c.key, out, def), c.code) << c.key;

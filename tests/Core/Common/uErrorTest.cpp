@@ -24,19 +24,6 @@ TEST(uErrorTest, HighBitDecidesFailureAndNoDataIsNotAFailure) {
     EXPECT_EQ(uError().cause(), nullptr);
 }
 
-TEST(uErrorTest, MacrosStampTheProjectRelativePathWithoutExtension) {
-    int const line = __LINE__ + 1;
-    uError e = TRELM_ERROR(kInvalid);
-    EXPECT_STREQ(e.file(), "tests/Core/Common/uErrorTest");
-    EXPECT_EQ(e.line(), line);
-    EXPECT_CODE(e, kInvalid);
-    EXPECT_TRUE(e.message().empty());
-
-    uError ok = TRELM_OK();
-    EXPECT_CODE(ok, kSuccess);
-    EXPECT_STREQ(ok.file(), "tests/Core/Common/uErrorTest");
-}
-
 TEST(uErrorTest, FormatRendersTheWholeChainOuterFirst) {
     uError inner(kOutOfMemory, "node", "Core/Common/Include/trelm/Map", 31);
     uError middle(kInvalid, inner, "", "Core/Components/Source/FacebookSource/FacebookSource", 7);

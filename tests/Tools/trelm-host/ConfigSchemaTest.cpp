@@ -66,10 +66,4 @@ TEST(ConfigSchemaTest, BadFilesAreRefusedByPlaceWithWhatToDo) {
     }
 }
 
-TEST(ConfigSchemaTest, ComponentsOfOtherPlugInsAreNotChecked) {
-    HostConfig config;
-    EXPECT_OK(HostConfig::parse(R"({"components": [{"name": "x", "id": "@other:/x", "config": {"anything": "yes"}}]})",
-                                "conf.json", config));
-}
-
 }  // namespace

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -16,7 +17,10 @@
 
 class EmulatedHost {
 public:
-    explicit EmulatedHost(emu::Emulator::Options options = {}) { restart(std::move(options)); }
+    // Starts an emulator with `options`, or with none until restart().
+    explicit EmulatedHost(std::optional<emu::Emulator::Options> options = emu::Emulator::Options{}) {
+        if (options) restart(std::move(*options));
+    }
 
     // A fresh emulator with `options` (four workers unless they say otherwise).
     void restart(emu::Emulator::Options options) {

@@ -18,41 +18,29 @@ using nlohmann::json;
 
 namespace {
 
-using Row = emu::test::Row;
-
 constexpr char const* kDemoUser = "100000001";
 
-// The demo account with only the data source, so that every request in the log is the source's.
-std::string configWithPassword(std::string const& password, std::string const& login = emu::DemoAccount::email) {
-    json config = {
-        {"components",
-         json::array({{{"name", "facebook"},
-                       {"id", "@trelm.example:/facebooksource"},
-                       {"config",
-                        {{"facebook_source_appkey", emu::DemoAccount::apiKey},
-                         {"facebook_source_appsecret", emu::DemoAccount::appSecret},
-                         {"facebook_source_login", login},
-                         {"facebook_source_password", password},
-                         {"wipeComponents", json::array()},
-                         {"wakeupComponents", json::array()},
-                         {"haveExtendedApi", true}}}}})}};
-    return config.dump(2);
+// The demo configuration with only the data source, so that every request in the log is the
+// source's.
+std::string sourceOnly(std::string const& password = emu::DemoAccount::password,
+                       std::string const& login = emu::DemoAccount::email) {
+    json config = json::parse(std::ifstream(TRELM_DEMO_CONFIG));
+    config["components"].erase(1);
+    config["components"][0]["config"]["facebook_source_login"] = login;
+    config["components"][0]["config"]["facebook_source_password"] = password;
+    return config.dump();
 }
 
 class HostCommandsTest : public ::testing::Test {
 protected:
-    void SetUp() override { useConfig(configWithPassword(emu::DemoAccount::password)); }
-    void useConfig(std::string const& text) { h.useConfig(text); }
-    std::string stateDir() const { return h.stateDir(); }
+    void SetUp() override { h.useConfig(sourceOnly()); }
 
-    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& input = {},
-                               int signal = 0, int afterMs = 0, bool* signalled = nullptr) {
-        ProgramRunner::Result result = h.run(command, "json", input, signal, afterMs, signalled);
+    ProgramRunner::Result host(std::vector<std::string> const& command, int signal = 0, int afterMs = 0,
+                               bool* signalled = nullptr) {
+        ProgramRunner::Result result = h.run(command, "json", {}, signal, afterMs, signalled);
         EXPECT_EQ(result.err.find("rows/s"), std::string::npos) << "no progress line off a terminal";
         return result;
     }
-    std::vector<Row> fql(std::string const& query) { return h.fql(query); }
-    std::vector<emu::LoggedRequest> requests(std::string const& method) { return h.requests(method); }
 
     EmulatedHost h;
 };
@@ -62,59 +50,26 @@ TEST_F(HostCommandsTest, DemoTourListsTheFriendsPostsUploadsAndFetchesTheFirstFr
     auto result = host({"demo", "--friends", "10", "--status", status});
     ASSERT_EQ(result.exitCode, 0) << result.err;
 
-    auto logins = linesOfType(result, "login");
-    ASSERT_EQ(logins.size(), 1u) << result.out;
-    EXPECT_EQ(logins[0]["code"], "0x00000000");
-    EXPECT_EQ(logins[0]["user"], kDemoUser);
-    EXPECT_EQ(logins[0]["session"], "new");
-    auto login = requests("auth.login");
-    ASSERT_EQ(login.size(), 1u);
-    EXPECT_TRUE(login[0].https);
-
-    // The contact cursor pages in the order of the text of the ids.
-    auto friends = fql("SELECT uid, name FROM user WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me()) "
-                       "ORDER BY concat(uid, ' ')");
-    ASSERT_GE(friends.size(), 10u);
+    EXPECT_EQ(linesOfType(result, "login").at(0)["session"], "new");
+    EXPECT_TRUE(h.requests("auth.login").at(0).https);
     auto records = linesOfType(result, "record");
     ASSERT_EQ(records.size(), 10u) << result.out;
-    for (std::size_t i = 0; i < records.size(); ++i) {
-        json const& fields = records[i]["fields"];
-        EXPECT_EQ(fields["core_contact_service_id"], friends[i]["uid"]) << i;
-        EXPECT_EQ(fields["core_contact_name"], friends[i]["name"]) << i;
-        EXPECT_EQ(fields["core_object_type"], 2) << i;
-        EXPECT_TRUE(fields["core_object_id"].is_string()) << i;
-    }
-    auto listed = linesOfType(result, "listed");
-    ASSERT_EQ(listed.size(), 1u);
-    EXPECT_EQ(listed[0]["rows"], 10);
-    EXPECT_EQ(listed[0]["total"], friends.size());
+    EXPECT_EQ(linesOfType(result, "listed").at(0)["total"],
+              h.fql(std::string("select uid2 from friend where uid1 = ") + kDemoUser).size());
 
-    auto setStatus = requests("users.setStatus");
-    ASSERT_EQ(setStatus.size(), 1u);
-    EXPECT_EQ(setStatus[0].args["status"], status);
-    EXPECT_EQ(fql(std::string("SELECT status FROM user WHERE uid = ") + kDemoUser).at(0)["status.message"], status);
-
+    EXPECT_EQ(h.fql(std::string("SELECT status FROM user WHERE uid = ") + kDemoUser).at(0)["status.message"], status);
     auto inserted = linesOfType(result, "inserted");
     ASSERT_EQ(inserted.size(), 2u) << result.out;
     EXPECT_EQ(inserted[0]["object_type"], 4);
     EXPECT_EQ(inserted[1]["object_type"], 9);
-    ASSERT_TRUE(inserted[1]["core_service_id"].is_string()) << inserted[1];
     std::string const pid = inserted[1]["core_service_id"];
-    auto photo = fql("SELECT pid, owner FROM photo WHERE pid = '" + pid + "'");
-    ASSERT_EQ(photo.size(), 1u) << pid;
-    EXPECT_EQ(photo[0]["owner"], kDemoUser);
-    auto uploads = requests("photos.upload");
-    ASSERT_EQ(uploads.size(), 1u);
-    EXPECT_TRUE(uploads[0].hadFile);
-    EXPECT_EQ(uploads[0].fileSize, std::filesystem::file_size(stateDir() + "/demo-photo.png"));
+    EXPECT_EQ(h.fql("SELECT owner FROM photo WHERE pid = '" + pid + "'").at(0)["owner"], kDemoUser);
+    EXPECT_EQ(h.requests("photos.upload").at(0).fileSize, std::filesystem::file_size(h.stateDir() + "/demo-photo.png"));
 
     auto retrieved = linesOfType(result, "retrieved");
     ASSERT_EQ(retrieved.size(), 1u);
-    EXPECT_EQ(retrieved[0]["guid"], records[0]["fields"]["core_object_id"]);
     EXPECT_EQ(retrieved[0]["fields"], records[0]["fields"]);
-    auto checks = linesOfType(result, "check");
-    ASSERT_EQ(checks.size(), 1u);
-    EXPECT_EQ(checks[0]["ok"], true);
+    EXPECT_EQ(linesOfType(result, "check").at(0)["ok"], true);
 }
 
 // The session outlives the run in the state folder; when the service has forgotten it, the host
@@ -122,42 +77,37 @@ TEST_F(HostCommandsTest, DemoTourListsTheFriendsPostsUploadsAndFetchesTheFirstFr
 TEST_F(HostCommandsTest, StoredSessionIsReusedForgottenCostsOneLoginAndChangedLoginSignsInAnew) {
     auto first = host({"query", "contacts", "--limit", "1"});
     ASSERT_EQ(first.exitCode, 0) << first.err;
-    ASSERT_EQ(requests("auth.login").size(), 1u);
-    std::string const session = requests("fql.query").back().args["session_key"];
+    ASSERT_EQ(h.requests("auth.login").size(), 1u);
+    std::string const session = h.requests("fql.query").back().args["session_key"];
     ASSERT_FALSE(session.empty());
 
     h.emulator->log().clear();
     auto second = host({"query", "contacts", "--limit", "1"});
     ASSERT_EQ(second.exitCode, 0) << second.err;
-    EXPECT_TRUE(requests("auth.login").empty());
+    EXPECT_TRUE(h.requests("auth.login").empty());
     auto logins = linesOfType(second, "login");
     ASSERT_EQ(logins.size(), 1u);
     EXPECT_EQ(logins[0]["session"], "stored");
     EXPECT_EQ(logins[0]["user"], kDemoUser);
-    for (auto const& request : requests("fql.query")) EXPECT_EQ(request.args.at("session_key"), session);
-    auto before = linesOfType(first, "record");
-    auto after = linesOfType(second, "record");
-    ASSERT_EQ(before.size(), 1u);
-    ASSERT_EQ(after.size(), 1u);
-    EXPECT_EQ(after[0]["fields"]["core_contact_service_id"], before[0]["fields"]["core_contact_service_id"]);
+    for (auto const& request : h.requests("fql.query")) EXPECT_EQ(request.args.at("session_key"), session);
+    EXPECT_EQ(linesOfType(second, "record").size(), 1u);
 
     h.emulator->sessions().remove(session);
     h.emulator->log().clear();
     auto third = host({"query", "contacts", "--limit", "3"});
     ASSERT_EQ(third.exitCode, 0) << third.err;
-    EXPECT_EQ(requests("auth.login").size(), 1u);
-    auto queries = requests("fql.query");
+    EXPECT_EQ(h.requests("auth.login").size(), 1u);
+    auto queries = h.requests("fql.query");
     ASSERT_FALSE(queries.empty());
     EXPECT_EQ(queries.front().errorCode, 102);
     logins = linesOfType(third, "login");
     ASSERT_EQ(logins.size(), 2u) << third.out;
     EXPECT_EQ(logins[0]["session"], "stored");
     EXPECT_EQ(logins[1]["session"], "new");
-    EXPECT_EQ(logins[1]["code"], "0x00000000");
     EXPECT_EQ(linesOfType(third, "record").size(), 3u);
 
     // A session belongs to its account: after the login changes, the new account signs in.
-    useConfig(configWithPassword(emu::SecondAccount::password, emu::SecondAccount::email));
+    h.useConfig(sourceOnly(emu::SecondAccount::password, emu::SecondAccount::email));
     h.emulator->log().clear();
     auto other = host({"insert", "status", "posted by the second account"});
     ASSERT_EQ(other.exitCode, 0) << other.err;
@@ -165,43 +115,19 @@ TEST_F(HostCommandsTest, StoredSessionIsReusedForgottenCostsOneLoginAndChangedLo
     ASSERT_EQ(logins.size(), 1u) << other.out;
     EXPECT_EQ(logins[0]["session"], "new");
     EXPECT_NE(logins[0]["user"], kDemoUser);
-    ASSERT_EQ(requests("auth.login").size(), 1u);
-    auto posts = requests("users.setStatus");
+    ASSERT_EQ(h.requests("auth.login").size(), 1u);
+    auto posts = h.requests("users.setStatus");
     ASSERT_EQ(posts.size(), 1u);
     EXPECT_NE(posts[0].args.at("session_key").find(logins[0]["user"].get<std::string>()), std::string::npos)
         << "the status went out with the new account's session";
-}
-
-TEST_F(HostCommandsTest, ShellFetchesRecordsOfTheLastListingAgain) {
-    auto result = host({"shell"}, "query contacts --limit 3\n"
-                                  "retrieve #1\n"
-                                  "# the third, by its number\n"
-                                  "retrieve #3\n"
-                                  "quit\n"
-                                  "query contacts --limit 1\n");
-    ASSERT_EQ(result.exitCode, 0) << result.err;
-    auto records = linesOfType(result, "record");
-    ASSERT_EQ(records.size(), 3u) << result.out;
-    auto retrieved = linesOfType(result, "retrieved");
-    ASSERT_EQ(retrieved.size(), 2u) << result.out;
-    EXPECT_EQ(retrieved[0]["fields"], records[0]["fields"]);
-    EXPECT_EQ(retrieved[1]["guid"], records[2]["fields"]["core_object_id"]);
-    EXPECT_EQ(retrieved[1]["fields"], records[2]["fields"]);
 }
 
 TEST_F(HostCommandsTest, InsertedPhotoArrivesWithItsCaption) {
     std::string const image = h.runner.writeFile("image.png", std::string("\x89PNG\r\n\x1a\n", 8) + "not really");
     auto result = host({"insert", "photo", image, "--caption", "Harbour at dusk"});
     ASSERT_EQ(result.exitCode, 0) << result.err;
-    auto inserted = linesOfType(result, "inserted");
-    ASSERT_EQ(inserted.size(), 1u) << result.out;
-    std::string const pid = inserted[0]["core_service_id"];
-    auto photo = fql("SELECT caption FROM photo WHERE pid = '" + pid + "'");
-    ASSERT_EQ(photo.size(), 1u);
-    EXPECT_EQ(photo[0]["caption"], "Harbour at dusk");
-    auto uploads = requests("photos.upload");
-    ASSERT_EQ(uploads.size(), 1u);
-    EXPECT_EQ(uploads[0].args.count("aid"), 0u);
+    std::string const pid = linesOfType(result, "inserted").at(0)["core_service_id"];
+    EXPECT_EQ(h.fql("SELECT caption FROM photo WHERE pid = '" + pid + "'").at(0)["caption"], "Harbour at dusk");
 }
 
 struct RefusedCase {
@@ -218,7 +144,7 @@ class RefusedCommandTest : public HostCommandsTest, public ::testing::WithParamI
 
 TEST_P(RefusedCommandTest, ExitsNonZeroAndSaysWhy) {
     RefusedCase const& c = GetParam();
-    useConfig(configWithPassword(c.password));
+    h.useConfig(sourceOnly(c.password));
     auto result = host(c.command);
     EXPECT_EQ(result.exitCode, c.exitCode) << result.err;
     for (std::string const& expected : c.expectedInError) {
@@ -228,7 +154,7 @@ TEST_P(RefusedCommandTest, ExitsNonZeroAndSaysWhy) {
     EXPECT_EQ(result.out.find(c.password), std::string::npos) << result.out;
     EXPECT_TRUE(linesOfType(result, "record").empty());
     EXPECT_TRUE(linesOfType(result, "inserted").empty());
-    EXPECT_TRUE(requests("photos.upload").empty()) << "a refused photo is refused before any request";
+    EXPECT_TRUE(h.requests("photos.upload").empty()) << "a refused photo is refused before any request";
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -278,10 +204,10 @@ TEST_P(StoppedSignInTest, LeavesNeitherPasswordNorApplicationSecretInTheStateFol
     slowLogin.delayMs = 3000;
     h.emulator->faults().set("auth.login", slowLogin);
     bool signalled = false;
-    host({"query", "contacts"}, {}, GetParam(), 1500, &signalled);
+    host({"query", "contacts"}, GetParam(), 1500, &signalled);
     ASSERT_TRUE(signalled) << "the host ended before it could be stopped during its sign-in";
     int files = 0;
-    for (auto const& entry : std::filesystem::recursive_directory_iterator(stateDir())) {
+    for (auto const& entry : std::filesystem::recursive_directory_iterator(h.stateDir())) {
         if (!entry.is_regular_file()) continue;
         ++files;
         std::ifstream in(entry.path(), std::ios::binary);
@@ -313,7 +239,7 @@ TEST_F(HostCommandsTest, ThrottledOrUnavailableServiceIsWaitedOutAndTheListingCo
         emu::FaultRule rule;
         ASSERT_TRUE(emu::Faults::parse(c.fault, method, rule, error)) << error;
         h.emulator->faults().set(method, rule);
-        std::filesystem::remove_all(stateDir());
+        std::filesystem::remove_all(h.stateDir());
 
         auto result = host({"query", "contacts", "--all", "--retries", "20", "--retry-time", "120"});
         ASSERT_EQ(result.exitCode, 0) << result.err;
@@ -329,18 +255,6 @@ TEST_F(HostCommandsTest, ThrottledOrUnavailableServiceIsWaitedOutAndTheListingCo
     }
 }
 
-// A damaged state database is named with what to do about it; nothing is listed.
-TEST_F(HostCommandsTest, DamagedStateDatabaseIsNamedWithHowToStartAfresh) {
-    std::filesystem::create_directories(stateDir());
-    std::string const path = stateDir() + "/runtime-configuration.db";
-    std::ofstream(path, std::ios::binary) << std::string(4096, '\x5a');
-    auto result = host({"query", "contacts"});
-    EXPECT_NE(result.exitCode, 0);
-    EXPECT_NE(result.err.find("the state database " + path + " cannot be used"), std::string::npos) << result.err;
-    EXPECT_NE(result.err.find("move it away or delete it"), std::string::npos) << result.err;
-    EXPECT_TRUE(linesOfType(result, "record").empty());
-}
-
 }  // namespace
 
 TEST_F(HostCommandsTest, ListingOnATerminalShowsProgressWithTheTotal) {
@@ -349,7 +263,7 @@ TEST_F(HostCommandsTest, ListingOnATerminalShowsProgressWithTheTotal) {
     for (std::string const& arg : h.arguments({"query", "contacts", "--all"})) command += " '" + arg + "'";
     auto result = h.runner.run("/usr/bin/script", {"-qec", command, "/dev/null"});
     ASSERT_EQ(result.exitCode, 0) << result.out;
-    std::size_t const friends = fql("select uid2 from friend where uid1=" + std::string(kDemoUser)).size();
+    std::size_t const friends = h.fql("select uid2 from friend where uid1=" + std::string(kDemoUser)).size();
     ASSERT_GT(friends, 0u);
     EXPECT_NE(result.out.find(" of " + std::to_string(friends) + " rows, "), std::string::npos) << result.out;
 }

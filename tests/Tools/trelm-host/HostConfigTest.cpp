@@ -1,8 +1,5 @@
 #include <string>
 
-#include <cstdio>
-#include <fstream>
-
 #include <gtest/gtest.h>
 
 #include "ErrorAssertions.h"
@@ -41,38 +38,6 @@ TEST(HostConfigTest, ValuesKeepTheirKindAndComponentsTheirOrder) {
     EXPECT_EQ(config.components()[1].runtimeKeys, (Vector<String>{"k"}));
     EXPECT_TRUE(config.namesEndpoint());
     EXPECT_EQ(*config.runtime().search("path"), Variant(":memory:"));
-}
-
-TEST(HostConfigTest, EmptyDocumentNamesNoEndpointAndNoComponents) {
-    HostConfig config;
-    ASSERT_OK(HostConfig::parse("{}", "test", config));
-    EXPECT_FALSE(config.namesEndpoint());
-    EXPECT_TRUE(config.components().empty());
-}
-
-// A missing file and one too large to be a configuration are named (folders and devices: in the
-// program's tests).
-TEST(HostConfigTest, PathThatIsNoConfigurationFileIsRefusedWithItsName) {
-    std::string const big = ::testing::TempDir() + "big-config.json";
-    {
-        std::ofstream out(big);
-        out << "{\"http\": {}, \"pad\": \"" << std::string(HostConfig::kMaxFileBytes, 'x') << "\"}";
-    }
-    struct Case {
-        std::string path;
-        trelm::ErrorCode code;
-        std::string words;
-    } const cases[] = {
-        {"/nonexistent/config.json", trelm::kNotFound, "cannot read configuration file /nonexistent/config.json"},
-        {big, trelm::kInvalid, "is larger than 1 MiB"},
-    };
-    for (Case const& c : cases) {
-        HostConfig config;
-        trelm::uError e = HostConfig::load(c.path, config);
-        EXPECT_CODE(e, c.code);
-        EXPECT_NE(e.message().str().find(c.words), std::string::npos) << e.message().str();
-    }
-    std::remove(big.c_str());
 }
 
 }  // namespace

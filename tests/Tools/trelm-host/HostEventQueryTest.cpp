@@ -80,19 +80,14 @@ protected:
         return out;
     }
 
-    // Runs the host; the JSON lines of `type` it printed (all of them for "").
-    std::vector<json> host(std::vector<std::string> const& command, std::string const& type) {
+    // Runs the host, which must succeed.
+    ProgramRunner::Result host(std::vector<std::string> const& command) {
         std::vector<std::string> args{"--format", "json", "--state-dir", runner_.folder() + "/state",
                                       "--config", TRELM_DEMO_CONFIG, "--plugin", TRELMFACEBOOK_MODULE};
         args.insert(args.end(), command.begin(), command.end());
         ProgramRunner::Result result = runner_.run(TRELM_HOST_PROGRAM, args);
         EXPECT_EQ(result.exitCode, 0) << result.err;
-        std::vector<json> lines;
-        for (std::string const& line : result.outLines()) {
-            json object = json::parse(line);
-            if (type.empty() || object.at("type") == type) lines.push_back(object);
-        }
-        return lines;
+        return result;
     }
 
     static emu::Store* store;
@@ -116,7 +111,7 @@ TEST_F(HostEventQueryTest, StatusAndPhotoListingsShowTheEmulatorsPostsAndPhotos)
     for (Case const& c : cases) {
         SCOPED_TRACE(c.command[1] + " " + c.command.back());
         ASSERT_EQ(c.expected.size(), 5u);
-        std::vector<json> records = host(c.command, "record");
+        std::vector<json> records = linesOfType(host(c.command), "record");
         ASSERT_EQ(records.size(), 5u);
         for (std::size_t i = 0; i < records.size(); ++i) {
             for (auto const& [key, value] : c.expected[i]) {
@@ -131,10 +126,10 @@ TEST_F(HostEventQueryTest, StatusAndPhotoListingsShowTheEmulatorsPostsAndPhotos)
 // stored. The stream cursor answers such a refusal as an empty stream; the host still notices
 // and signs in again.
 TEST_F(HostEventQueryTest, SessionRefusedWhileReadingTheStreamIsRenewed) {
-    ASSERT_EQ(host({"query", "status", "--limit", "1"}, "record").size(), 1u);
-    std::vector<json> lines = host({"query", "status", "--limit", "2"}, "");
+    ASSERT_EQ(linesOfType(host({"query", "status", "--limit", "1"}), "record").size(), 1u);
     std::vector<std::string> types;
-    for (json const& line : lines) {
+    for (std::string const& text : host({"query", "status", "--limit", "2"}).outLines()) {
+        json const line = json::parse(text);
         if (line["type"] != "component") types.push_back(line["type"].get<std::string>() + " " + line.value("session", ""));
     }
     EXPECT_EQ(types, (std::vector<std::string>{"plugin ", "endpoint ", "login stored", "login new", "record ", "record ",

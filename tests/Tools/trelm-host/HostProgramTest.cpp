@@ -5,7 +5,11 @@
 
 #include <cstdlib>
 
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -20,82 +24,46 @@ namespace {
 constexpr char const* kSourceId = "@trelm.example:/facebooksource";
 constexpr char const* kConnectorId = "@trelm.example:/facebookconnector";
 
-// The emulator's demo account, as the demo configuration holds it.
-constexpr char const* kConfig = R"({
-  "components": [
-    { "name": "facebook", "id": "@trelm.example:/facebooksource",
-      "config": {
-        "facebook_source_appkey": "4f6b1e0c9a7d4c2e8b3a5d6f7e8c9b0a",
-        "facebook_source_appsecret": "c3d2e1f0a9b8c7d6e5f4a3b2c1d0e9f8",
-        "facebook_source_login": "demo@trelm.example",
-        "facebook_source_password": "demo-password",
-        "wipeComponents": [], "wakeupComponents": [], "haveExtendedApi": true } },
-    { "name": "presence", "id": "@trelm.example:/facebookconnector",
-      "config": { "facebook_polltime": 300, "facebook_maxtime": 3600 } }
-  ]
-})";
-
 class HostProgramTest : public ::testing::Test {
 protected:
-    // Runs the host with the scratch folder's state folder and JSON-lines output.
+    // Runs the host with JSON-lines output and, unless `args` give others, the scratch folder's
+    // state folder, the demo configuration and the built plug-in.
     ProgramRunner::Result host(std::vector<std::string> args) {
-        args.insert(args.begin(), {"--format", "json", "--state-dir", stateDir()});
+        for (auto const& [option, value] : {std::pair<std::string, std::string>{"--state-dir", stateDir()},
+                                            {"--config", TRELM_DEMO_CONFIG}, {"--plugin", TRELMFACEBOOK_MODULE},
+                                            {"--format", "json"}}) {
+            if (std::find(args.begin(), args.end(), option) == args.end()) args.insert(args.begin(), {option, value});
+        }
         return runner_.run(TRELM_HOST_PROGRAM, args);
     }
     std::string stateDir() const { return runner_.folder() + "/state"; }
-
 
     ProgramRunner runner_;
 };
 
 TEST_F(HostProgramTest, DemoConfigurationStartsBothComponentsAgainstTheEmbeddedEmulator) {
-    std::string config = runner_.writeFile("config.json", kConfig);
-    auto result = host({"--config", config, "--plugin", TRELMFACEBOOK_MODULE});
+    auto result = host({});
     ASSERT_EQ(result.exitCode, 0) << result.err;
 
     auto plugins = linesOfType(result, "plugin");
     ASSERT_EQ(plugins.size(), 1u) << result.out;
     EXPECT_EQ(plugins[0]["path"], TRELMFACEBOOK_MODULE);
     EXPECT_EQ(plugins[0]["components"], json::array({kConnectorId, kSourceId}));
-
     auto endpoints = linesOfType(result, "endpoint");
     ASSERT_EQ(endpoints.size(), 1u);
     EXPECT_EQ(endpoints[0]["emulator"], true);
-    ASSERT_EQ(endpoints[0]["connect_to"].size(), 2u);
-    EXPECT_EQ(endpoints[0]["connect_to"][0].get<std::string>().rfind("api.facebook.com:80:127.0.0.1:", 0), 0u);
-    EXPECT_EQ(endpoints[0]["connect_to"][1].get<std::string>().rfind("api.facebook.com:443:127.0.0.1:", 0), 0u);
+    EXPECT_EQ(endpoints[0]["connect_to"].at(1).get<std::string>().rfind("api.facebook.com:443:127.0.0.1:", 0), 0u);
 
-    auto components = linesOfType(result, "component");
-    ASSERT_EQ(components.size(), 2u) << result.out;
-    EXPECT_EQ(components[0]["name"], "facebook");
-    EXPECT_EQ(components[0]["id"], kSourceId);
-    EXPECT_EQ(components[1]["name"], "presence");
-    EXPECT_EQ(components[1]["id"], kConnectorId);
-    for (json const& component : components) {
-        EXPECT_EQ(component["state"], "started") << component;
+    std::vector<std::string> started;
+    for (json const& component : linesOfType(result, "component")) {
         EXPECT_EQ(component["error"], nullptr) << component;
+        started.push_back(component["name"].get<std::string>() + " " + component["id"].get<std::string>() + " " +
+                          component["state"].get<std::string>());
     }
+    EXPECT_EQ(started, (std::vector<std::string>{std::string("facebook ") + kSourceId + " started",
+                                                 std::string("facebook-connector ") + kConnectorId + " started"}));
     EXPECT_EQ(result.out.find("demo-password"), std::string::npos);
     EXPECT_EQ(result.err.find("demo-password"), std::string::npos);
-}
-
-TEST_F(HostProgramTest, BrokenPluginIsReportedWithItsPathAndStopsTheHost) {
-    struct Case {
-        std::string plugin;
-        std::vector<std::string> said;
-    } const cases[] = {
-        {"/nonexistent/libmissing.so", {"0x80000006", "cannot load plug-in"}},
-        {NO_ENTRY_PLUGIN, {"0x80000006", "has no entry point getComponents"}},
-        {FAILING_PLUGIN, {"0x80000001", "getComponents of plug-in", "caused by: this is not supported [0x80000002]"}},
-    };
-    std::string config = runner_.writeFile("config.json", kConfig);
-    for (Case const& c : cases) {
-        auto result = host({"--no-emulator", "--config", config, "--plugin", c.plugin});
-        EXPECT_EQ(result.exitCode, 1) << result.err;
-        EXPECT_TRUE(linesOfType(result, "component").empty()) << result.out;
-        EXPECT_NE(result.err.find(c.plugin), std::string::npos) << result.err;
-        for (std::string const& words : c.said) EXPECT_NE(result.err.find(words), std::string::npos) << result.err;
-    }
 }
 
 TEST_F(HostProgramTest, ComponentIdThatNoPluginOffersFailsTheRunButNotTheOthers) {
@@ -103,64 +71,48 @@ TEST_F(HostProgramTest, ComponentIdThatNoPluginOffersFailsTheRunButNotTheOthers)
         {"name": "ghost", "id": "@trelm.example:/nothing"},
         {"name": "presence", "id": "@trelm.example:/facebookconnector",
          "config": {"facebook_polltime": 300, "facebook_maxtime": 3600}}]})");
-    auto result = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
+    auto result = host({"--no-emulator", "--config", config});
     EXPECT_EQ(result.exitCode, 2);
     auto components = linesOfType(result, "component");
     ASSERT_EQ(components.size(), 2u) << result.out;
     EXPECT_EQ(components[0]["state"], "not created");
-    EXPECT_NE(components[0]["error"].get<std::string>().find("@trelm.example:/nothing"),
-              std::string::npos);
+    EXPECT_NE(components[0]["error"].get<std::string>().find("@trelm.example:/nothing"), std::string::npos);
     EXPECT_EQ(components[1]["state"], "started");
 }
 
 // The store keeps a component's session between runs: a value put there by one run is handed
-// to the component by the next, and the file stays private to its owner.
+// to the component by the next, and the folder and file stay private to their owner.
 TEST_F(HostProgramTest, StoredValueIsRestoredOnTheNextRunAndTheStoreIsPrivate) {
-    std::string config = runner_.writeFile("config.json", kConfig);
     auto stored = host({"state", "set", "facebook", "facebook_source_session_id", "stored-session-key"});
     ASSERT_EQ(stored.exitCode, 0) << stored.err;
-
     struct stat st {};
     ASSERT_EQ(stat(stateDir().c_str(), &st), 0);
     EXPECT_EQ(st.st_mode & 0777, 0700u);
     ASSERT_EQ(stat((stateDir() + "/runtime-configuration.db").c_str(), &st), 0);
     EXPECT_EQ(st.st_mode & 0777, 0600u);
 
-    auto started = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
+    auto started = host({"--no-emulator"});
     ASSERT_EQ(started.exitCode, 0) << started.err;
     auto components = linesOfType(started, "component");
     ASSERT_EQ(components.size(), 2u) << started.out;
     EXPECT_EQ(components[0]["restored"], json::array({"facebook_source_session_id"}));
     EXPECT_EQ(components[1]["restored"], json::array());
     EXPECT_EQ(started.out.find("stored-session-key"), std::string::npos);
-
-    auto reset = host({"state", "reset", "facebook", "facebook_source_session_id"});
-    ASSERT_EQ(reset.exitCode, 0) << reset.err;
-    auto again = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
-    ASSERT_EQ(again.exitCode, 0) << again.err;
-    components = linesOfType(again, "component");
-    ASSERT_EQ(components.size(), 2u);
-    EXPECT_EQ(components[0]["restored"], json::array());
-}
-
-TEST_F(HostProgramTest, MalformedConfigurationNamesThePlaceAndStopsTheHost) {
-    std::string config = runner_.writeFile("config.json", R"({"components": [
-        {"name": "facebook", "id": "@trelm.example:/facebooksource",
-         "config": {"facebook_polltime": 1.5}}]})");
-    auto result = host({"--no-emulator", "--config", config, "--plugin", TRELMFACEBOOK_MODULE});
-    EXPECT_EQ(result.exitCode, 1);
-    EXPECT_NE(result.err.find("components[0].config.facebook_polltime"), std::string::npos)
-        << result.err;
-    EXPECT_TRUE(result.out.empty()) << result.out;
 }
 
 }  // namespace
 
-// A path the host cannot use (state folder, configuration file, CA file) is named, with why and
-// what to do, before any request is sent.
-TEST_F(HostProgramTest, UnusablePathIsNamedWithTheReasonAndARemedy) {
+// A path the host cannot use (state folder or its database, configuration file, CA file,
+// plug-in) or a malformed configuration is named, with why and what to do, before any component
+// starts.
+TEST_F(HostProgramTest, UnusablePathOrPluginIsNamedWithTheReasonAndARemedy) {
     std::string const file = runner_.writeFile("plain-file", "x");
-    std::string const config = runner_.writeFile("config.json", kConfig);
+    std::string const big = runner_.writeFile("big.json", "{\"pad\": \"" + std::string(1 << 20, 'x') + "\"}");
+    std::string const config = runner_.writeFile("config.json", R"({"components": [
+        {"name": "facebook", "id": "@trelm.example:/facebooksource", "config": {"facebook_polltime": 1.5}}]})");
+    std::string const damaged = runner_.folder() + "/damaged";
+    std::filesystem::create_directories(damaged);
+    std::ofstream(damaged + "/runtime-configuration.db", std::ios::binary) << std::string(4096, '\x5a');
     std::string const locked = runner_.folder() + "/locked";
     ASSERT_EQ(::mkdir(locked.c_str(), 0700), 0);
     // Root passes every permission test: only the immutable flag keeps it out, where the file
@@ -170,23 +122,32 @@ TEST_F(HostProgramTest, UnusablePathIsNamedWithTheReasonAndARemedy) {
     struct Case {
         std::vector<std::string> args;
         std::string words;
+        std::vector<std::string> more = {};
     };
     std::vector<Case> cases{
+        {{"--plugin", "/nonexistent/libmissing.so"}, "/nonexistent/libmissing.so", {"0x80000006", "cannot load plug-in"}},
+        {{"--plugin", NO_ENTRY_PLUGIN}, NO_ENTRY_PLUGIN, {"0x80000006", "has no entry point getComponents"}},
+        {{"--plugin", FAILING_PLUGIN}, FAILING_PLUGIN,
+         {"0x80000001", "getComponents of plug-in", "caused by: this is not supported [0x80000002]"}},
         {{"--state-dir", file}, "state folder " + file + " is not a folder; choose another with --state-dir"},
         {{"--state-dir", file + "/state"}, "cannot create state folder " + file + "/state: Not a directory"},
+        {{"--state-dir", damaged},
+         "the state database " + damaged + "/runtime-configuration.db cannot be used; if it is damaged, move it away"},
+        {{"--config", "/nonexistent/config.json"}, "cannot read configuration file /nonexistent/config.json"},
+        {{"--config", big}, "configuration file " + big + " is larger than 1 MiB"},
         {{"--config", "/dev/zero"}, "configuration file /dev/zero is not a regular file"},
         {{"--config", runner_.folder()}, "configuration file " + runner_.folder() + " is a folder"},
-        {{"--config", config, "--ca-file", "/dev/zero"}, "CA file /dev/zero is not a regular file; give a PEM file"},
-        {{"--config", config, "--ca-file", file}, "CA file " + file + " holds no PEM certificate"},
+        {{"--config", config}, "components[0].config.facebook_polltime"},
+        {{"--ca-file", "/dev/zero"}, "CA file /dev/zero is not a regular file; give a PEM file"},
+        {{"--ca-file", file}, "CA file " + file + " holds no PEM certificate"},
     };
     if (lockable) cases.push_back({{"--state-dir", locked}, "state folder " + locked + " cannot be written ("});
     for (Case const& c : cases) {
-        std::vector<std::string> args{"--plugin", TRELMFACEBOOK_MODULE};
-        if (c.args[0] != "--state-dir") args.insert(args.end(), {"--state-dir", stateDir()});
-        args.insert(args.end(), c.args.begin(), c.args.end());
-        auto result = runner_.run(TRELM_HOST_PROGRAM, args);
+        auto result = host({c.args[0], c.args[1], "query", "contacts"});
         EXPECT_EQ(result.exitCode, 1) << c.words;
         EXPECT_NE(result.err.find(c.words), std::string::npos) << result.err;
+        for (std::string const& words : c.more) EXPECT_NE(result.err.find(words), std::string::npos) << result.err;
+        EXPECT_TRUE(linesOfType(result, "component").empty()) << c.words << "\n" << result.out;
     }
     if (immutable) {
         EXPECT_EQ(std::system(("chattr -i '" + locked + "'").c_str()), 0);

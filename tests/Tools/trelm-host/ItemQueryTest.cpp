@@ -94,40 +94,6 @@ TEST(ConditionRejectTest, MalformedConditionsAreInvalidAndAddNothing) {
     }
 }
 
-// The event cursors refuse to start without their exact ordering; friend requests want the
-// opposite sense; the FQL cursors of other kinds take none.
-TEST(ItemQueryTest, EachKindAsksForTheOrderingItsCursorServes) {
-    using Column = trelm::IQueryItems::Column;
-    using trelm::Metadata::Key;
-    Vector<Column> const events{{Key("core_object_time", Types::INT32), false},
-                                {Key("core_event_service", Types::STRING), false},
-                                {Key("core_event_serviceid", Types::STRING), false}};
-    Vector<Column> const requests{{Key("core_event_service", Types::STRING), true},
-                                  {Key("core_event_serviceid", Types::STRING), true}};
-    struct Expected {
-        char const* kind;
-        int type;
-        Vector<Column> ordering;
-    };
-    Expected const kinds[] = {
-        {"contacts", 2, {}},     {"status", 4, events},          {"photos", 5, events},
-        {"media", 9, {}},        {"messages", 10, events},       {"albums", 11, {}},
-        {"friend-requests", 12, requests}, {"photo-tags", 13, {}},
-    };
-    ASSERT_EQ(ItemQuery::kindNames().size(), std::size(kinds));
-    for (Expected const& k : kinds) {
-        ItemQuery::Kind const* kind = ItemQuery::findKind(k.kind);
-        ASSERT_NE(kind, nullptr) << k.kind;
-        trelm::IQueryItems::StartQueryMessage msg;
-        ASSERT_CODE(ItemQuery(*kind).fill(msg), trelm::kSuccess);
-        EXPECT_EQ(msg.columns, k.ordering) << k.kind;
-        ASSERT_EQ(msg.constraints.size(), 1u);
-        EXPECT_EQ(msg.constraints[0].function, Constraint::Equal);
-        EXPECT_EQ(msg.constraints[0].value, Variant(k.type)) << k.kind;
-        EXPECT_EQ(msg.position, -1);
-    }
-}
-
 // A cursor over `rows` records {"n": i} that moves only by seek(1), like the stream cursor, and
 // can be told to fail reading one row.
 class StepCursor : public trelm::IQueryItems::ICursor {
@@ -178,7 +144,6 @@ TEST(WalkTest, ListsTheRowsBetweenSkipAndLimit) {
         unsigned code = trelm::kSuccess;
         int failAt = -1;
     } const cases[] = {
-        {"first page", 5, 0, 3, {0, 1, 2}},
         {"limit beyond the end", 3, 0, 10, {0, 1, 2}},
         {"skip then limit", 10, 4, 3, {4, 5, 6}},
         {"skip to the last row", 5, 4, std::nullopt, {4}},

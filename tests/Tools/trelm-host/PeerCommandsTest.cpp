@@ -21,22 +21,13 @@ json demoConfig() { return json::parse(std::ifstream(TRELM_DEMO_CONFIG)); }
 
 class PeerCommandsTest : public ::testing::Test {
 protected:
-    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& format = "json") {
-        return h.run(command, format);
-    }
-    std::vector<Row> fql(std::string const& query) { return h.fql(query); }
-    std::vector<emu::LoggedRequest> requests(std::string const& method) { return h.requests(method); }
-
     EmulatedHost h;
 };
 
 TEST_F(PeerCommandsTest, PeersListsEveryFriendWithProfileFromTwoRequests) {
-    auto result = host({"peers"});
+    auto result = h.run({"peers"});
     ASSERT_EQ(result.exitCode, 0) << result.err;
-    auto connection = linesOfType(result, "connection");
-    ASSERT_EQ(connection.size(), 1u) << result.out;
-    EXPECT_EQ(connection[0]["name"].get<std::string>() + " " + connection[0]["user"].get<std::string>(),
-              std::string("facebook-connector ") + kDemoUser);
+    EXPECT_EQ(linesOfType(result, "connection").at(0)["user"], kDemoUser);
     std::vector<Row> listed;
     for (json peer : linesOfType(result, "peer")) {
         peer.erase("type");
@@ -44,27 +35,27 @@ TEST_F(PeerCommandsTest, PeersListsEveryFriendWithProfileFromTwoRequests) {
         listed.push_back(peer.get<Row>());
     }
     std::vector<Row> expected =
-        fql("SELECT uid, first_name, last_name, name, profile_url FROM user "
+        h.fql("SELECT uid, first_name, last_name, name, profile_url FROM user "
             "WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
     std::sort(listed.begin(), listed.end());
     std::sort(expected.begin(), expected.end());
     EXPECT_EQ(listed, expected);
     EXPECT_EQ(linesOfType(result, "peers").at(0)["count"], expected.size());
-    EXPECT_EQ(requests("friends.get").size() + requests("users.getInfo").size(), 2u);
+    EXPECT_EQ(h.requests("friends.get").size() + h.requests("users.getInfo").size(), 2u);
     EXPECT_EQ(h.emulator->log().total(), 3u) << "one login, and the data source sent nothing";
 }
 
 // One friend with a status, one who never set one, asked for in one request; the table shows the
 // time in UTC, or "-" for none.
 TEST_F(PeerCommandsTest, PeerStatusAsksOnceForAllIdsInBothFormats) {
-    std::vector<Row> all = fql("SELECT uid, status FROM user WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
+    std::vector<Row> all = h.fql("SELECT uid, status FROM user WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
     auto with = std::find_if(all.begin(), all.end(), [](Row& r) { return r.count("status.time") != 0; });
     auto without = std::find_if(all.begin(), all.end(), [](Row& r) { return r.count("status.time") == 0; });
     ASSERT_TRUE(with != all.end() && without != all.end());
     std::string const a = (*with)["uid"];
     std::string const b = (*without)["uid"];
 
-    auto result = host({"peer-status", a, b});
+    auto result = h.run({"peer-status", a, b});
     ASSERT_EQ(result.exitCode, 0) << result.err;
     auto statuses = linesOfType(result, "peer_status");
     ASSERT_EQ(statuses.size(), 2u) << result.out;
@@ -73,11 +64,11 @@ TEST_F(PeerCommandsTest, PeerStatusAsksOnceForAllIdsInBothFormats) {
                                  {"status", (*with)["status.message"]},
                                  {"time", std::stoll((*with)["status.time"])}}));
     EXPECT_EQ(statuses[1], json({{"type", "peer_status"}, {"uid", b}, {"status", ""}, {"time", 0}}));
-    auto calls = requests("users.getInfo");
+    auto calls = h.requests("users.getInfo");
     ASSERT_EQ(calls.size(), 1u);
     EXPECT_EQ(calls[0].args["uids"], a + "," + b);
 
-    auto table = host({"peer-status", b}, "table");
+    auto table = h.run({"peer-status", b}, "table");
     ASSERT_EQ(table.exitCode, 0) << table.err;
     auto lines = table.outLines();
     ASSERT_GE(lines.size(), 2u);
@@ -89,23 +80,14 @@ TEST_F(PeerCommandsTest, PeerStatusAsksOnceForAllIdsInBothFormats) {
 // the newest status post.
 TEST_F(PeerCommandsTest, StatusSetThroughTheConnectorIsReadBackByTheSourcesStatusQuery) {
     std::string const text = "is testing the connector from the host";
-    auto result = host({"set-status", "is", "testing", "the", "connector", "from", "the", "host"});
+    auto result = h.run({"set-status", "is", "testing", "the", "connector", "from", "the", "host"});
     ASSERT_EQ(result.exitCode, 0) << result.err;
-    auto set = linesOfType(result, "status_set");
-    ASSERT_EQ(set.size(), 1u) << result.out;
-    EXPECT_EQ(set[0]["text"], text);
-    auto calls = requests("users.setStatus");
-    ASSERT_EQ(calls.size(), 1u);
-    EXPECT_EQ(calls[0].args["status"], text);
-    EXPECT_EQ(fql("SELECT status FROM user WHERE uid = me()").at(0)["status.message"], text);
-
-    auto listed = host({"query", "status", "--limit", "1"});
-    ASSERT_EQ(listed.exitCode, 0) << listed.err;
-    auto records = linesOfType(listed, "record");
-    ASSERT_EQ(records.size(), 1u) << listed.out;
-    json const& fields = records[0]["fields"];
-    EXPECT_EQ(fields["core_event_text"], text);
-    EXPECT_EQ(fields["core_event_contactid"], kDemoUser);
+    EXPECT_EQ(linesOfType(result, "status_set").at(0)["text"], text);
+    EXPECT_EQ(h.requests("users.setStatus").size(), 1u);
+    std::vector<json> const records = h.records({"query", "status", "--limit", "1"});
+    ASSERT_EQ(records.size(), 1u);
+    EXPECT_EQ(records[0]["core_event_text"], text);
+    EXPECT_EQ(records[0]["core_event_contactid"], kDemoUser);
 }
 
 // A failed connection or command ends the run with status 3 and says why.
@@ -122,11 +104,11 @@ TEST_F(PeerCommandsTest, ConnectionFailuresEndTheCommandWithTheReason) {
         json& connector = config.at("components").at(1).at("config");
         c.value ? void(connector[c.key] = c.value) : void(connector.erase(c.key));
         h.useConfig(config.dump());
-        auto result = host(c.command);
+        auto result = h.run(c.command);
         EXPECT_EQ(result.exitCode, 3) << result.out << result.err;
         EXPECT_NE(result.err.find(c.says), std::string::npos) << result.err;
     }
-    EXPECT_EQ(requests("users.setStatus").size(), 0u);
+    EXPECT_EQ(h.requests("users.setStatus").size(), 0u);
 }
 
 }  // namespace

@@ -19,18 +19,10 @@ protected:
     static void TearDownTestSuite() { delete h; }
     void SetUp() override { h->emulator->log().clear(); }
 
-    // Runs the host as the demo user; each printed record's `key`, and the lines of the
-    // "record" and "retrieved" types.
-    static std::vector<std::string> host(std::vector<std::string> const& command, std::string const& key,
-                                         std::vector<json>* records = nullptr, std::vector<json>* retrieved = nullptr) {
-        ProgramRunner::Result const result = h->run(command);
-        EXPECT_EQ(result.exitCode, 0) << result.err;
+    // Runs the host as the demo user; each printed record's `key`.
+    static std::vector<std::string> host(std::vector<std::string> const& command, std::string const& key) {
         std::vector<std::string> values;
-        for (json const& object : linesOfType(result, "record")) {
-            values.push_back(object["fields"].value(key, std::string("?")));
-            if (records != nullptr) records->push_back(object);
-        }
-        if (retrieved != nullptr) *retrieved = linesOfType(result, "retrieved");
+        for (json const& fields : h->records(command)) values.push_back(fields.value(key, std::string("?")));
         return values;
     }
 
@@ -75,16 +67,32 @@ TEST_F(PhotoLibraryCommandsTest, ConditionListsExactlyTheServicesRowsForIt) {
     }
 }
 
-// In one run: list a kind, then fetch its second record again by the GUID it was listed with.
+// In one run: list a kind, then fetch listed records again by the GUIDs they were listed with,
+// from the command line or in the shell ("#N": the Nth record of the last listing).
 TEST_F(PhotoLibraryCommandsTest, RetrieveFetchesTheListedRecordAgainByItsGuid) {
-    for (char const* kind : {"contacts", "albums", "media", "photo-tags"}) {
-        SCOPED_TRACE(kind);
-        std::vector<json> records, retrieved;
-        host({"retrieve", "#2", "--from", kind, "--limit", "2"}, "core_object_id", &records, &retrieved);
-        ASSERT_EQ(records.size(), 2u);
-        ASSERT_EQ(retrieved.size(), 1u);
-        EXPECT_EQ(retrieved[0]["guid"], records[1]["fields"]["core_object_id"]);
-        EXPECT_EQ(retrieved[0]["fields"], records[1]["fields"]);
+    struct Case {
+        std::string name;
+        std::vector<std::string> command;
+        std::string input;
+        std::size_t listed;
+        std::vector<std::size_t> fetched;
+    };
+    std::vector<Case> cases{{"shell", {"shell"}, "query contacts --limit 3\nretrieve #1\n# the third, by its number\n"
+                                                 "retrieve #3\nquit\nquery contacts --limit 1\n", 3, {0, 2}}};
+    for (std::string kind : {"contacts", "albums", "media", "photo-tags"}) {
+        cases.push_back({kind, {"retrieve", "#2", "--from", kind, "--limit", "2"}, "", 2, {1}});
+    }
+    for (Case const& c : cases) {
+        SCOPED_TRACE(c.name);
+        ProgramRunner::Result const result = h->run(c.command, "json", c.input);
+        ASSERT_EQ(result.exitCode, 0) << result.err;
+        std::vector<json> const records = linesOfType(result, "record"), retrieved = linesOfType(result, "retrieved");
+        ASSERT_EQ(records.size(), c.listed);
+        ASSERT_EQ(retrieved.size(), c.fetched.size());
+        for (std::size_t i = 0; i < retrieved.size(); ++i) {
+            EXPECT_EQ(retrieved[i]["guid"], records[c.fetched[i]]["fields"]["core_object_id"]);
+            EXPECT_EQ(retrieved[i]["fields"], records[c.fetched[i]]["fields"]);
+        }
     }
 }
 

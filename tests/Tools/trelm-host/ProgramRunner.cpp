@@ -82,28 +82,24 @@ ProgramRunner::Result ProgramRunner::run(std::string const& program,
         execve(program.c_str(), argv.data(), envp.data());
         _exit(127);
     }
-    Result result;
     int status = 0;
+    bool reaped = false;
     if (signalled != nullptr) *signalled = false;
-    if (pid > 0 && signal > 0) {
-        // Polls, so that a program that ends early is not waited for in full.
-        for (int waited = 0; waited < afterMs; waited += 10) {
-            if (waitpid(pid, &status, WNOHANG) == pid) {
-                pid = -pid;  // reaped
-                break;
-            }
-            usleep(10000);
-        }
-        if (pid > 0) {
+    // Polls, so that a program that ends early is not waited for in full.
+    for (int waited = 0; pid > 0 && signal > 0 && !reaped; waited += 10) {
+        if (waitpid(pid, &status, WNOHANG) == pid) {
+            reaped = true;
+        } else if (waited >= afterMs) {
             kill(pid, signal);
             if (signalled != nullptr) *signalled = true;
+            break;
+        } else {
+            usleep(10000);
         }
     }
-    if (pid < 0) {
-        if (WIFEXITED(status)) result.exitCode = WEXITSTATUS(status);
-    } else if (pid > 0 && waitpid(pid, &status, 0) == pid && WIFEXITED(status)) {
-        result.exitCode = WEXITSTATUS(status);
-    }
+    if (pid > 0 && !reaped) reaped = waitpid(pid, &status, 0) == pid;
+    Result result;
+    if (reaped && WIFEXITED(status)) result.exitCode = WEXITSTATUS(status);
     result.out = readAll(outPath);
     result.err = readAll(errPath);
     return result;

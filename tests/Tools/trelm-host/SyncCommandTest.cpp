@@ -5,20 +5,13 @@
 #include <sqlite3.h>
 
 #include <fstream>
+#include <future>
 #include <map>
-#include <memory>
 #include <set>
-#include <sstream>
 #include <string>
 #include <vector>
 
-#include <future>
-
-#include <gtest/gtest.h>
-#include <nlohmann/json.hpp>
-
-#include "Emulator.h"
-#include "ProgramRunner.h"
+#include "EmulatedHost.h"
 #include "trelm/FStreamParseObj.h"
 
 using nlohmann::json;
@@ -32,23 +25,12 @@ class SyncCommandTest : public ::testing::Test {
 protected:
     void start(emu::GeneratorOptions generator = {}) {
         emu::Emulator::Options options;
-        options.threads = 4;
         options.databasePath = serviceDatabase();
         options.generator = generator;
-        emulator_ = std::make_unique<emu::Emulator>(options);
-        std::string error;
-        ASSERT_TRUE(emulator_->start(error)) << error;
+        h.restart(options);
     }
-
-    ProgramRunner::Result host(std::vector<std::string> const& command, std::string const& config = TRELM_DEMO_CONFIG,
-                               int signal = 0, int afterMs = 0, ProgramRunner const* runner = nullptr) {
-        std::vector<std::string> args{
-            "--format", "json", "--state-dir", runner_.folder() + "/state", "--no-emulator",
-            "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator_->httpPort()),
-            "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator_->httpsPort()),
-            "--ca-file", emulator_->caFile(), "--config", config, "--plugin", TRELMFACEBOOK_MODULE};
-        args.insert(args.end(), command.begin(), command.end());
-        return (runner == nullptr ? runner_ : *runner).run(TRELM_HOST_PROGRAM, args, {}, signal, afterMs);
+    ProgramRunner::Result host(std::vector<std::string> const& command, int signal = 0, int afterMs = 0) {
+        return h.run(command, "json", {}, signal, afterMs);
     }
 
     // Each kind's summary line of a sync, by kind.
@@ -76,7 +58,7 @@ protected:
         std::set<std::string> ids;
         if (kind == "status") {
             emu::XmlNode root("stream_get_response");
-            EXPECT_FALSE(emulator_->store().streamGet(uid, std::to_string(uid), "0", "0", "100000", root));
+            EXPECT_FALSE(h.emulator->store().streamGet(uid, std::to_string(uid), "0", "0", "100000", root));
             trelm::Vector<trelm::Map<trelm::String, trelm::String>> rows;
             unsigned total = 0;
             EXPECT_TRUE(trelm::FStreamParseObj().parse(emu::renderDocument(root), rows, total).ok());
@@ -87,28 +69,24 @@ protected:
             }
             return ids;
         }
+        // A service id is the row's fields joined, as the source makes it.
         std::string const me = std::to_string(uid);
-        std::map<std::string, std::pair<std::string, std::string>> const statements{
-            {"contacts", {"select uid from user where uid in (select uid2 from friend where uid1 = " + me + ")", ""}},
-            {"photos",
-             {"select pid from photo where aid in (select aid from album where owner in (select uid2 from friend "
-              "where uid1 = " + me + "))", ""}},
-            {"media", {"select pid from photo where owner = " + me, ""}},
-            {"albums", {"select aid from album where owner = " + me, ""}},
-            {"friend-requests", {"select uid_from from friend_request where uid_to = " + me, "FriendRequest: "}},
-            {"photo-tags", {"select pid, subject from photo_tag where subject = " + me, ""}},
-            {"messages",
-             {"select thread_id, message_id from message where thread_id in (select thread_id from thread where "
-              "folder_id = 0)", ""}},
+        std::string const friends = "(select uid2 from friend where uid1 = " + me + ")";
+        std::map<std::string, std::string> const statements{
+            {"contacts", "select uid from user where uid in " + friends},
+            {"photos", "select pid from photo where aid in (select aid from album where owner in " + friends + ")"},
+            {"media", "select pid from photo where owner = " + me},
+            {"albums", "select aid from album where owner = " + me},
+            {"friend-requests", "select uid_from from friend_request where uid_to = " + me},
+            {"photo-tags", "select pid, subject from photo_tag where subject = " + me},
+            {"messages", "select thread_id, message_id from message where thread_id in (select thread_id from thread "
+                         "where folder_id = 0)"},
         };
-        auto const& [statement, prefix] = statements.at(kind);
         emu::XmlNode root("fql_query_response");
-        EXPECT_FALSE(emulator_->store().fqlQuery(uid, statement, root).has_value()) << statement;
+        EXPECT_FALSE(h.emulator->store().fqlQuery(uid, statements.at(kind), root).has_value()) << kind;
         for (emu::XmlNode const& row : root.children) {
-            std::string id = prefix;
-            for (emu::XmlNode const& field : row.children) {
-                id += (id.size() > prefix.size() ? (kind == "messages" ? "-" : " ") : "") + field.text;
-            }
+            std::string id = kind == "friend-requests" ? "FriendRequest: " + row.children[0].text : row.children[0].text;
+            if (row.children.size() == 2) id += (kind == "messages" ? "-" : " ") + row.children[1].text;
             ids.insert(id);
         }
         return ids;
@@ -123,12 +101,11 @@ protected:
         EXPECT_EQ(sqlite3_changes(db), 2);
         sqlite3_close(db);
     }
-    std::string serviceDatabase() const { return runner_.folder() + "/service.db"; }
+    std::string serviceDatabase() const { return h.runner.folder() + "/service.db"; }
 
-    void fault(std::string const& method, emu::FaultRule const& rule) { emulator_->faults().set(method, rule); }
+    void fault(std::string const& method, emu::FaultRule const& rule) { h.emulator->faults().set(method, rule); }
 
-    ProgramRunner runner_;
-    std::unique_ptr<emu::Emulator> emulator_;
+    EmulatedHost h{std::nullopt};
 };
 
 std::set<std::string> keys(std::map<std::string, json> const& items) {
@@ -158,8 +135,8 @@ TEST_F(SyncCommandTest, FirstSyncStoresEveryItemOnceAndTheSecondChangesNothingAn
     // Two syncs of one store at once: the second waits for the first, and neither spoils the
     // other's passes.
     ProgramRunner otherRunner;
-    auto other = std::async(std::launch::async,
-                            [&] { return host({"sync"}, TRELM_DEMO_CONFIG, 0, 0, &otherRunner); });
+    std::vector<std::string> args = h.arguments({"--format", "json", "sync"});
+    auto other = std::async(std::launch::async, [&] { return otherRunner.run(TRELM_HOST_PROGRAM, args); });
     ProgramRunner::Result second = host({"sync"});
     ProgramRunner::Result const third = other.get();
     ASSERT_EQ(second.exitCode, 0) << second.err;
@@ -204,7 +181,7 @@ TEST_F(SyncCommandTest, RemovedFriendIsMarkedOnlyAfterACompletePass) {
     EXPECT_EQ(summary["removed"], 0);
     EXPECT_TRUE(stored("contacts").count(gone));
 
-    emulator_->faults().clearAll();
+    h.emulator->faults().clearAll();
     ProgramRunner::Result rest = host({"sync", "contacts"});
     ASSERT_EQ(rest.exitCode, 0) << rest.err;
     json const begun = linesOfType(rest, "sync").at(0);
@@ -220,96 +197,82 @@ TEST_F(SyncCommandTest, RemovedFriendIsMarkedOnlyAfterACompletePass) {
     EXPECT_EQ(stored("contacts").size(), 399u);
 }
 
-// How a sync of 5,000 contacts is stopped: a service error on the third window, or SIGKILL while
-// the windows come slowly.
+// How a sync is stopped: a service error on the third use of `method`, or SIGKILL while the
+// windows come slowly. Contacts (5,000 of them) continue after the last id committed; the kinds
+// that come newest first at the time of the last row committed.
 struct Interruption {
     char const* name;
+    char const* kind;
+    char const* method;
     bool kill;
+    int postsPerSecond = 0;  // not 0: posts share seconds at window boundaries
 };
 
 class InterruptedSyncTest : public SyncCommandTest, public ::testing::WithParamInterface<Interruption> {};
 
-TEST_P(InterruptedSyncTest, NextSyncAsksOnlyForTheWindowsNotCommittedAndStoresEachContactOnce) {
+TEST_P(InterruptedSyncTest, NextSyncAsksOnlyForTheWindowsNotCommittedAndStoresEachItemOnce) {
+    Interruption const& c = GetParam();
+    bool const contacts = std::string(c.kind) == "contacts";
     emu::GeneratorOptions generator;
-    generator.demoFriends = 5000;
-    generator.users = 10100;
+    if (contacts) {
+        generator.demoFriends = 5000;
+        generator.users = 10100;
+    }
+    if (c.postsPerSecond != 0) {
+        generator.postsPerSecond = c.postsPerSecond;
+        generator.postsPerUser = 8;
+    }
     start(generator);
     emu::FaultRule rule;
-    if (GetParam().kill) {
+    if (c.kill) {
         rule.delayMs = 150;
     } else {
         rule.every = 3;
         rule.errorCode = 1;
     }
-    fault("fql.query", rule);
-    ProgramRunner::Result stopped = host({"sync", "contacts"}, TRELM_DEMO_CONFIG, GetParam().kill ? SIGKILL : 0, 1500);
-    EXPECT_NE(stopped.exitCode, 0);
-    std::map<std::string, json> const committed = stored("contacts");
-    if (!GetParam().kill) {
+    fault(c.method, rule);
+    ProgramRunner::Result stopped = host({"sync", c.kind}, c.kill ? SIGKILL : 0, 1500);
+    EXPECT_EQ(stopped.exitCode, c.kill ? -1 : 3);
+    std::map<std::string, json> const committed = stored(c.kind);
+    std::set<std::string> const expected = serviceIds(c.kind);
+    ASSERT_GT(committed.size(), 0u);
+    ASSERT_LT(committed.size(), expected.size());
+
+    h.emulator->faults().clearAll();
+    h.emulator->log().clear();
+    ProgramRunner::Result rest = host({"sync", c.kind});
+    ASSERT_EQ(rest.exitCode, 0) << rest.err;
+    json const begun = linesOfType(rest, "sync").at(0);
+    EXPECT_TRUE(begun["continued"]);
+    EXPECT_EQ(synced(rest)[c.kind]["added"], expected.size() - committed.size());
+    EXPECT_EQ(keys(stored(c.kind)), expected);
+    if (!contacts) {
+        EXPECT_EQ(begun["from"].get<std::string>().rfind("core_object_time<=", 0), 0u) << begun;
+        return;
+    }
+    if (!c.kill) {
         EXPECT_EQ(committed.size(), 300u) << "the two windows before the failed one";
     }
-    ASSERT_GT(committed.size(), 0u);
-    ASSERT_LT(committed.size(), 5000u);
     std::string const last = *keys(committed).rbegin();  // the windows come in the text order of the ids
-
-    emulator_->faults().clearAll();
-    emulator_->log().clear();
-    ProgramRunner::Result rest = host({"sync", "contacts"});
-    ASSERT_EQ(rest.exitCode, 0) << rest.err;
-    EXPECT_EQ(linesOfType(rest, "sync").at(0)["from"], "core_contact_service_id>" + last);
-
+    EXPECT_EQ(begun["from"], "core_contact_service_id>" + last);
     std::vector<std::string> windows;
-    for (emu::LoggedRequest const& request : emulator_->log().entriesFor("fql.query")) {
+    for (emu::LoggedRequest const& request : h.emulator->log().entriesFor("fql.query")) {
         if (request.fql.find(kContactWindow) != std::string::npos) windows.push_back(request.fql);
     }
-    std::size_t const remaining = 5000 - committed.size();
-    EXPECT_EQ(windows.size(), remaining / 150 + 1);
+    EXPECT_EQ(windows.size(), (5000 - committed.size()) / 150 + 1);
     ASSERT_FALSE(windows.empty());
     EXPECT_NE(windows.front().find("concat(uid,' ') > '" + last + " '"), std::string::npos) << windows.front();
     for (std::string const& statement : windows) {
         EXPECT_NE(statement.find("> '" + last + " '"), std::string::npos) << "a committed window asked again: " << statement;
     }
-    EXPECT_EQ(synced(rest)["contacts"]["added"], remaining);
-    EXPECT_EQ(keys(stored("contacts")), serviceIds("contacts"));
 }
 
 INSTANTIATE_TEST_SUITE_P(Stops, InterruptedSyncTest,
-                         ::testing::Values(Interruption{"ServiceError", false}, Interruption{"Killed", true}),
+                         ::testing::Values(Interruption{"ServiceError", "contacts", "fql.query", false},
+                                           Interruption{"Killed", "contacts", "fql.query", true},
+                                           Interruption{"StatusServiceError", "status", "stream.get", false, 6},
+                                           Interruption{"PhotosServiceError", "photos", "fql.query", false}),
                          [](auto const& info) { return std::string(info.param.name); });
-
-// The kinds that come newest first continue at the time of the last row committed.
-struct TimedKind {
-    char const* kind;
-    char const* method;  // the call that fails on its third use
-};
-
-class StoppedTimedSyncTest : public SyncCommandTest, public ::testing::WithParamInterface<TimedKind> {};
-
-TEST_P(StoppedTimedSyncTest, ContinuesFromTheLastCommittedTimeAndEndsWithEveryItemOnce) {
-    start();
-    emu::FaultRule third;
-    third.every = 3;
-    third.errorCode = 1;
-    fault(GetParam().method, third);
-    ProgramRunner::Result stopped = host({"sync", GetParam().kind});
-    EXPECT_EQ(stopped.exitCode, 3);
-    std::size_t const committed = stored(GetParam().kind).size();
-    ASSERT_GT(committed, 0u);
-
-    emulator_->faults().clearAll();
-    ProgramRunner::Result rest = host({"sync", GetParam().kind});
-    ASSERT_EQ(rest.exitCode, 0) << rest.err;
-    json const begun = linesOfType(rest, "sync").at(0);
-    EXPECT_TRUE(begun["continued"]);
-    EXPECT_EQ(begun["from"].get<std::string>().rfind("core_object_time<=", 0), 0u) << begun;
-    std::set<std::string> const expected = serviceIds(GetParam().kind);
-    EXPECT_EQ(synced(rest)[GetParam().kind]["added"], expected.size() - committed);
-    EXPECT_EQ(keys(stored(GetParam().kind)), expected);
-}
-
-INSTANTIATE_TEST_SUITE_P(Kinds, StoppedTimedSyncTest,
-                         ::testing::Values(TimedKind{"status", "stream.get"}, TimedKind{"photos", "fql.query"}),
-                         [](auto const& info) { return std::string(info.param.kind); });
 
 TEST_F(SyncCommandTest, PostsSharingASecondWithAWindowsLastPostAreStoredOnce) {
     emu::GeneratorOptions generator;
@@ -335,10 +298,10 @@ TEST_F(SyncCommandTest, AnotherPersonsSignInWipesTheStoreAndTheSameOneAgainDoesN
     json config = json::parse(in);
     config["components"][0]["config"]["facebook_source_login"] = emu::SecondAccount::email;
     config["components"][0]["config"]["facebook_source_password"] = emu::SecondAccount::password;
-    std::string const second = runner_.writeFile("second.json", config.dump());
-    std::int64_t const secondUid = *emulator_->store().checkLogin(emu::SecondAccount::email, emu::SecondAccount::password);
+    h.useConfig(config.dump());
+    std::int64_t const secondUid = *h.emulator->store().checkLogin(emu::SecondAccount::email, emu::SecondAccount::password);
 
-    ProgramRunner::Result switched = host({"sync", "contacts"}, second);
+    ProgramRunner::Result switched = host({"sync", "contacts"});
     ASSERT_EQ(switched.exitCode, 0) << switched.err;
     std::vector<json> wiped = linesOfType(switched, "wiped");
     ASSERT_EQ(wiped.size(), 1u);
@@ -349,8 +312,8 @@ TEST_F(SyncCommandTest, AnotherPersonsSignInWipesTheStoreAndTheSameOneAgainDoesN
     EXPECT_EQ(synced(switched)["contacts"]["added"], theirs.size());
 
     // The same person signing in again (the stored session dropped) keeps every item.
-    ASSERT_EQ(host({"state", "reset", "facebook", "facebook_source_session_id"}, second).exitCode, 0);
-    ProgramRunner::Result again = host({"sync", "contacts"}, second);
+    ASSERT_EQ(host({"state", "reset", "facebook", "facebook_source_session_id"}).exitCode, 0);
+    ProgramRunner::Result again = host({"sync", "contacts"});
     ASSERT_EQ(again.exitCode, 0) << again.err;
     EXPECT_EQ(linesOfType(again, "login").at(0)["session"], "new");
     EXPECT_TRUE(linesOfType(again, "wiped").empty());

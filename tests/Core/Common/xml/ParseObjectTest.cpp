@@ -53,11 +53,6 @@ TEST(HashParseObjTest, AnswerDocumentsGiveTheirFieldsWithEntitiesDecodedAndNilFi
         {"auth_login_response", "auth_login_response.xml",
          {{"session_key", "2.b1c2d3e4f5a6b7c8d9e0f1a2.3600.1262307600-1001"}, {"uid", "1001"},
           {"secret", "9f8e7d6c5b4a39281706f5e4d3c2b1a0"}, {"expires", "0"}}},
-        {"photos_upload_response", "photos_upload_response.xml",
-         {{"pid", "1001_90210"}, {"aid", "1001_7"}, {"owner", "1001"}, {"src", "http://photos.example/s1001_90210.jpg"},
-          {"src_big", "http://photos.example/n1001_90210.jpg"}, {"src_small", "http://photos.example/t1001_90210.jpg"},
-          {"link", "http://www.facebook.com/photo.php?pid=90210&id=1001"}, {"caption", "Harbour at dusk"},
-          {"created", "1262390400"}}},
         {"r", R"(<r xmlns:xsi="x"><a xsi:nil="true"/><b/><c></c><d> </d></r>)", {{"b", ""}, {"c", ""}, {"d", " "}}},
     };
     for (auto const& c : cases) {
@@ -65,12 +60,6 @@ TEST(HashParseObjTest, AnswerDocumentsGiveTheirFieldsWithEntitiesDecodedAndNilFi
         ASSERT_OK(HashParseObj(c.root).parse(document(c.source), out)) << c.source;
         EXPECT_EQ(out.map(), c.expected) << c.source;
     }
-}
-
-TEST(FlatParseObjTest, StatusAnswerGivesItsValue) {
-    String out = "old";
-    ASSERT_OK(FlatParseObj("users_setStatus_response").parse(loadXml("users_setStatus_response.xml"), out));
-    EXPECT_EQ(out, "1");
 }
 
 TEST(ListParseObjTest, ValuesFollowExistingEntriesInOrderWithoutNilEntries) {
@@ -89,26 +78,14 @@ TEST(ListParseObjTest, ValuesFollowExistingEntriesInOrderWithoutNilEntries) {
     }
 }
 
-TEST(ListHashParseObjTest, MailboxAnswersGiveOneRecordPerEntry) {
-    struct Case {
-        char const* root;
-        std::vector<Row> expected;
-    } const cases[] = {
-        {"mailbox_getInbox_response",
-         {{{"tid", "3001"}, {"subject", "Dinner on Friday?"}, {"last_update", "1262400000"}, {"unread", "1"},
-           {"message_count", "4"}},
-          {{"tid", "3000"}, {"subject", ""}, {"last_update", "1262300000"}, {"unread", "0"}, {"message_count", "1"}}}},
-        {"mailbox_getThreadMessages_response",
-         {{{"mid", "3001_4"}, {"tid", "3001"}, {"author", "1002"}, {"body", "Sounds good \xE2\x80\x94 8pm?"},
-           {"time_sent", "1262400000"}, {"has_attachment", "false"}},
-          {{"mid", "3001_3"}, {"tid", "3001"}, {"author", "1001"}, {"body", "See the photo"},
-           {"time_sent", "1262390000"}, {"has_attachment", "true"}}}},
-    };
-    for (auto const& c : cases) {
-        Rows rows;
-        ASSERT_OK(ListHashParseObj(c.root).parse(loadXml(std::string(c.root) + ".xml"), rows));
-        EXPECT_EQ(plain(rows), c.expected) << c.root;
-    }
+TEST(ListHashParseObjTest, MailboxAnswerGivesOneRecordPerEntry) {
+    Rows rows;
+    ASSERT_OK(ListHashParseObj("mailbox_getInbox_response").parse(loadXml("mailbox_getInbox_response.xml"), rows));
+    EXPECT_EQ(plain(rows),
+              (std::vector<Row>{{{"tid", "3001"}, {"subject", "Dinner on Friday?"}, {"last_update", "1262400000"},
+                                 {"unread", "1"}, {"message_count", "4"}},
+                                {{"tid", "3000"}, {"subject", ""}, {"last_update", "1262300000"}, {"unread", "0"},
+                                 {"message_count", "1"}}}));
 }
 
 // --- FqlParseObj ----------------------------------------------------------------------------
@@ -145,7 +122,6 @@ TEST(FqlParseObjTest, SkippedRowsAreCountedButNotReturned) {
         {"fql_query_response_users.xml", "user", 0, 3, {"1001", "1002", "1003"}},
         {"fql_query_response_users.xml", "user", 1, 3, {"1002", "1003"}},
         {"fql_query_response_users.xml", "user", 3, 3, {}},
-        {"fql_query_response_users.xml", "user", 7, 3, {}},
         {"fql_query_response_users.xml", "photo", 0, 0, {}},
         {"fql_query_response_empty.xml", "user", 0, 0, {}},
     };
@@ -204,8 +180,7 @@ TEST(FqlParseObjTest, RepeatedNestedFieldKeepsFirstValue) {
 TEST(FStreamParseObjTest, StreamAnswerGivesOneRowPerPostByKind) {
     Rows rows;
     unsigned count = 0;
-    FStreamParseObj p;
-    ASSERT_OK(p.parse(loadXml("stream_get_response.xml"), rows, count));
+    ASSERT_OK(FStreamParseObj().parse(loadXml("stream_get_response.xml"), rows, count));
     EXPECT_EQ(count, 5u);
     EXPECT_EQ(plain(rows),
               (std::vector<Row>{
@@ -225,16 +200,13 @@ TEST(FStreamParseObjTest, StreamAnswerGivesOneRowPerPostByKind) {
                   {{"is_photo", "1"}, {"src", "http://photos.example/s1005_90.jpg"}, {"alt", ""},
                    {"created_time", "1262388000"}},
               }));
-}
 
-TEST(FStreamParseObjTest, StatusPostWithNilMessageHasNoMessageField) {
-    Rows rows;
-    unsigned count = 0;
-    FStreamParseObj p;
-    ASSERT_OK(p.parse(String(R"(<stream_get_response><posts list="true"><stream_post>)"
-                             R"(<post_id>1_2</post_id><type>46</type><message xsi:nil="true"/>)"
-                             R"(<created_time>5</created_time></stream_post></posts></stream_get_response>)"),
-                      rows, count));
+    // A status post with a nil message has no message field.
+    rows.clear();
+    ASSERT_OK(FStreamParseObj().parse(String(R"(<stream_get_response><posts list="true"><stream_post>)"
+                                             R"(<post_id>1_2</post_id><type>46</type><message xsi:nil="true"/>)"
+                                             R"(<created_time>5</created_time></stream_post></posts></stream_get_response>)"),
+                                      rows, count));
     EXPECT_EQ(plain(rows), (std::vector<Row>{{{"is_status", "1"}, {"post_id", "1_2"}, {"created_time", "5"}}}));
 }
 
@@ -294,39 +266,30 @@ std::vector<ParseObject> allParseObjects() {
     };
 }
 
-// An error document (or any other root) is a failure and must not leave half a result behind.
-TEST(ParseObjectTest, ErrorDocumentFailsAndLeavesTheOutputForEveryParseObject) {
-    for (ParseObject const& obj : allParseObjects()) {
-        for (char const* source : {"error_response.xml", "auth_login_response.xml"}) {
-            bool kept = false;
-            EXPECT_CODE(obj.run(loadXml(source), kept), kFailure) << obj.name << " on " << source;
-            EXPECT_TRUE(kept) << obj.name << " on " << source;
-        }
-    }
-}
-
-TEST(ParseObjectTest, MalformedOrTruncatedDocumentsFailCleanly) {
+// An error document (or any other root), a malformed or a truncated one is a failure; the first
+// two must not leave half a result behind.
+TEST(ParseObjectTest, ErrorOrMalformedDocumentFailsCleanlyForEveryParseObject) {
     std::string const stream = loadXml("stream_get_response.xml").str();
-    std::vector<std::pair<char const*, std::string>> documents = {
+    std::vector<std::pair<char const*, std::string>> const documents = {
+        {"error_response.xml", loadXml("error_response.xml").str()},
+        {"auth_login_response.xml", loadXml("auth_login_response.xml").str()},
+        // Expat's own refusals (mismatched tags, entities, encodings) are expat's to test.
         {"empty", ""},
-        {"whitespace only", "  \n"},
         {"not xml", "Service Unavailable"},
         {"html error page", "<html><body><h1>502 Bad Gateway</h1></body>"},
         {"unclosed root", "<r><row><a>1</a></row>"},
-        {"mismatched tags", "<r><row></r></row>"},
-        {"two roots", "<r/><r/>"},
-        {"undefined entity", "<r><row><a>&nbsp;</a></row></r>"},
-        {"bad attribute", "<r list=true/>"},
-        {"invalid utf-8", "<r><row><a>\xC3\x28</a></row></r>"},
         {"nul byte", std::string("<r><row><a>x") + '\0' + "y</a></row></r>"},
         {"truncated stream", stream.substr(0, stream.size() / 2)},
         {"stream cut before root end", stream.substr(0, stream.rfind("</stream_get_response>"))},
     };
     for (ParseObject const& obj : allParseObjects()) {
-        for (auto const& [what, xml] : documents) {
+        for (std::size_t i = 0; i < documents.size(); ++i) {
             bool kept = false;
-            uError e = obj.run(String(xml), kept);
-            EXPECT_CODE(e, kFailure) << obj.name << " on " << what << ": " << e;
+            uError e = obj.run(String(documents[i].second), kept);
+            EXPECT_CODE(e, kFailure) << obj.name << " on " << documents[i].first << ": " << e;
+            if (i < 2) {
+                EXPECT_TRUE(kept) << obj.name << " on " << documents[i].first;
+            }
         }
     }
 }
