@@ -4,6 +4,7 @@
 
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
 #include <map>
 #include <string>
 #include <vector>
@@ -132,6 +133,32 @@ TEST_F(ItemStoreTest, WipeMessageRemovesTheNamedSourcesItemsAndTheFileIsPrivate)
     struct stat st {};
     ASSERT_EQ(stat(path().c_str(), &st), 0);
     EXPECT_EQ(st.st_mode & 0777, 0600u);
+}
+
+// The store is opened by the first operation that needs it: a host command that never syncs
+// neither makes items.db nor fails on a damaged one, and list or wipe make nothing.
+TEST(ItemStoreOpeningTest, OnlyOperationsThatNeedTheFileMakeOrOpenIt) {
+    char pattern[] = "/tmp/item-store-open-XXXXXX";
+    ASSERT_NE(mkdtemp(pattern), nullptr);
+    std::string const folder = pattern, path = folder + "/items.db";
+    ItemStore store;
+    ASSERT_OK(store.sendConfig(trelm::Configuration::Group(store.name(), {{"path", Variant(String(path))}})));
+    ASSERT_OK(store.startup());
+    std::vector<ItemStore::Item> listed;
+    unsigned wiped = 7;
+    EXPECT_OK(store.list(String(), 2, true, listed));
+    EXPECT_OK(store.wipe(String("facebook"), wiped));
+    EXPECT_EQ(wiped, 0u);
+    EXPECT_FALSE(store.exists());
+    EXPECT_FALSE(std::filesystem::exists(path));
+
+    { std::ofstream(path) << "not a database"; }
+    ASSERT_TRUE(store.exists());
+    ItemStore::Pass pass;
+    trelm::uError const e = store.openPass(ItemStore::Scope{String("facebook"), String("1"), 2}, pass);
+    EXPECT_CODE(e, trelm::kFailure);
+    EXPECT_NE(e.message().find(String(path)), String::npos) << "the error names the file";
+    std::filesystem::remove_all(folder);
 }
 
 TEST(ItemsCommandTest, ConditionsCompareEachFieldByItsKind) {
