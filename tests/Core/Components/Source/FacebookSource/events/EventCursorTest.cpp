@@ -185,45 +185,6 @@ TEST_F(EventCursorTest, StreamRowsBecomeStatusAndPhotoRecordsWithNamesFromOneLoo
               std::vector<std::string>{"select uid,name from user where uid in (42,9,42)"});
 }
 
-TEST_F(EventCursorTest, StatusQueryPagesPastAWindowOfPhotosAndNeverGoesBackUp) {
-    http.queue(String(streamAnswer(photoPost("5_1", "5", 900) + photoPost("5_2", "5", 899))));
-    http.queue(String(streamAnswer(statusPost("6_1", "6", 898) + statusPost("6_2", "6", 897))));
-    http.queue(String(users({{"6", "Cy"}})));
-    http.queue(String(streamAnswer("")));
-    SmartPtr<FStreamCursor> cursor = stream({typeIs(Constraint::Equal, 4)}, 2);
-    ASSERT_OK(cursor->start());
-
-    ASSERT_OK(cursor->jumpBeginning());
-    RecordPtr row;
-    ASSERT_OK(cursor->getRow(row));
-    EXPECT_EQ(text(row, "core_event_serviceid"), "1");
-    int moved = 0;
-    ASSERT_OK(cursor->seek(1, moved));
-    EXPECT_EQ(moved, 1);
-    // The last row: the next window is empty, the cursor stays.
-    moved = 0;
-    ASSERT_OK(cursor->seek(1, moved));
-    EXPECT_EQ(moved, 0);
-    ASSERT_OK(cursor->getRow(row));
-    EXPECT_EQ(text(row, "core_event_serviceid"), "2");
-
-    for (int offset : {2, -1, 0}) {
-        SCOPED_TRACE(offset);
-        EXPECT_CODE(cursor->seek(offset, moved), kNotSupported);
-    }
-    EXPECT_CODE(cursor->jumpEnd(), kNotSupported);
-    unsigned count = 0;
-    EXPECT_CODE(cursor->numRows(count), kNotSupported) << "no statement to count with";
-    EXPECT_CODE(cursor->curRow(count), kNotSupported);
-
-    // The photo window ends at 899, the status window at 897; going back to the beginning
-    // keeps the lowered bound.
-    http.queue(String(streamAnswer("")));
-    ASSERT_OK(cursor->jumpBeginning());
-    EXPECT_EQ(sent("facebook.stream.get", "end_time"), (std::vector<std::string>{"0", "898", "896", "896"}));
-    EXPECT_EQ(sent("facebook.stream.get", "limit"), (std::vector<std::string>{"2", "2", "2", "2"}));
-}
-
 TEST_F(EventCursorTest, PhotoEventsOfOneSecondComeInTheQueryOrderNotTheServiceOrder) {
     // The service orders by time only: the three photos of second 500 arrive unsorted.
     http.queue(String(photos({{"1_2", 500}, {"1_3", 500}, {"1_1", 500}, {"123_456", 400}})));
@@ -246,23 +207,6 @@ TEST_F(EventCursorTest, PhotoEventsOfOneSecondComeInTheQueryOrderNotTheServiceOr
     }
     // Descending service ids within the second; the photo id keeps its prefix.
     EXPECT_EQ(seen, (std::vector<std::string>{"1_3", "1_2", "1_1", "123_456"}));
-    EXPECT_EQ(sent("facebook.fql.query", "query").at(0),
-              "select pid,aid,owner,src,caption,created from photo where aid in (select aid from album where owner in "
-              "(select uid2 from friend where uid1='42')) and (created >= 300) order by created desc limit 150");
-
-    unsigned n = 0;
-    Vector<RecordPtr> rows;
-    EXPECT_CODE(cursor->numRows(n), kNotSupported);
-    EXPECT_CODE(cursor->curRow(n), kNotSupported);
-    EXPECT_CODE(cursor->jump(1), kNotSupported);
-    EXPECT_CODE(cursor->jumpEnd(), kNotSupported);
-    EXPECT_CODE(cursor->getRows(2, rows), kNotSupported);
-    EXPECT_CODE(cursor->seek(-1, moved), kNotSupported);
-
-    auto unwrapped = makeSmart<PhotoEventWrappedCursor>(nullptr, lib, cache, ordering, constraints, "facebook", true);
-    EXPECT_CODE(unwrapped->start(), kOutOfWindow);
-    Vector<Column> const ascendingIds{kTime, kService, column("core_event_serviceid", TRELM_TYPES::STRING, true)};
-    EXPECT_CODE(makeSmart<PhotoEventCursor>(lib, cache, ascendingIds, constraints, "facebook", true, true)->start(), kInvalid);
 }
 
 }  // namespace

@@ -102,10 +102,6 @@ std::vector<std::string> EmulatorHost::fqlStatements() {
     return out;
 }
 
-}  // namespace trelm::test
-
-namespace trelm::test {
-
 EmulatorHost::Cursor EmulatorHost::open(FacebookSource& source, int type, Vector<IQueryItems::Column> const& columns,
                                         std::vector<IQueryItems::Constraint> const& extra, std::int64_t position,
                                         uError* refusal) {
@@ -137,6 +133,21 @@ std::vector<EmulatorHost::Record> EmulatorHost::walk(IQueryItems::ICursor& curso
     }
     if (step < 0) std::reverse(rows.begin(), rows.end());
     return rows;
+}
+
+std::string EmulatorHost::text(Record const& record, char const* key) {
+    Variant const* v = record.search(key);
+    return v ? v->asString().str() : "<none>";
+}
+
+Vector<IQueryItems::Column> EmulatorHost::eventOrdering() {
+    return Vector<IQueryItems::Column>{{Metadata::Key("core_object_time", TRELM_TYPES::INT32), false},
+                                       {Metadata::Key("core_event_service", TRELM_TYPES::STRING), false},
+                                       {Metadata::Key("core_event_serviceid", TRELM_TYPES::STRING), false}};
+}
+
+IQueryItems::Constraint EmulatorHost::timeIs(IQueryItems::Constraint::Function function, Variant value) {
+    return IQueryItems::Constraint{Metadata::Key("core_object_time", TRELM_TYPES::INT32), std::move(value), function};
 }
 
 }  // namespace trelm::test

@@ -70,6 +70,12 @@ public:
     // The records from the current row on, moving by `step` until the cursor stops; in the
     // cursor's order whichever way it went.
     static std::vector<Record> walk(IQueryItems::ICursor& cursor, int step = 1);
+    // The record's `key` as text; "<none>" when it lacks the key.
+    static std::string text(Record const& record, char const* key);
+    // The ordering the event cursors serve: time, service, service id, all descending.
+    static Vector<IQueryItems::Column> eventOrdering();
+    // A constraint on "core_object_time".
+    static IQueryItems::Constraint timeIs(IQueryItems::Constraint::Function function, Variant value);
 
 private:
     std::unique_ptr<emu::Emulator> emulator_;

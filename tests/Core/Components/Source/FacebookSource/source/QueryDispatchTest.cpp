@@ -151,33 +151,55 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
     }
 }
 
-// What the contact, album, media and photo-tag cursors make of a query's constraints when they
-// start, before anything is asked of the service.
+// What the cursors make of a query's ordering and constraints when they start, before anything
+// is asked of the service (no HTTP factory is registered: a request would fail with another code).
 TEST_F(QueryDispatchTest, CursorConstraintsAreReadOrRefusedWithExactCodes) {
     auto key = [](char const* name) { return Metadata::Key(name, TRELM_TYPES::STRING); };
+    Metadata::Key const timeKey("core_object_time", TRELM_TYPES::INT32);
+    auto column = [&](char const* name, bool flag) { return IQueryItems::Column{key(name), flag}; };
+    auto time = [&](Constraint::Function f, Variant v) { return Constraint{timeKey, v, f}; };
+    Constraint const contact{key("core_event_contactid"), Variant("4"), Constraint::Equal};
+    Vector<IQueryItems::Column> const events{{timeKey, false}, column("core_event_service", false),
+                                             column("core_event_serviceid", false)};
+    Vector<IQueryItems::Column> const requests{column("core_event_service", true), column("core_event_serviceid", true)};
     struct Case {
         int type;
-        Constraint constraint;
+        std::vector<Constraint> constraints;
         unsigned code;  // of the start; kNoData: started, and answers no rows without asking
+        Vector<IQueryItems::Column> columns = {};
     };
     Case const cases[] = {
-        {2, other(), kNotSupported},
-        {2, {key("core_contact_service_id"), Variant("1 or 1=1"), Constraint::Equal}, kInvalid},
-        {9, {key("facebook_media_album_service_id"), Variant("1_2"), Constraint::Equal}, kSuccess},
-        {9, {key("facebook_media_album_service_id"), Variant("1' or '1'='1"), Constraint::Equal}, kInvalid},
-        {11, {key("facebook_album_owner_service_id"), Variant(Vector<int>{5, 6}), Constraint::InList}, kSuccess},
-        {11, {key("facebook_album_owner_service_id"), Variant("5 or 1=1"), Constraint::Equal}, kInvalid},
-        {11, {key("facebook_album_owner_service_id"), Variant("5"), Constraint::GreaterThan}, kNotSupported},
-        {13, {key("facebook_photo_tag_text"), Variant("x"), Constraint::Equal}, kNotSupported},
-        {13, {key("core_object_time"), Variant(1262304000), Constraint::GreaterOrEqual}, kSuccess},
-        {13, {key("core_object_time"), Variant("soon"), Constraint::LessThan}, kInvalid},
-        {9, {key("core_service_id"), Variant(Vector<String>{}), Constraint::InList}, kNoData},
-        {11, {key("core_object_origin_servicename"), Variant("Other"), Constraint::Equal}, kNoData},
-        {13, {key("core_object_origin_importcomponent"), Variant("elsewhere"), Constraint::Equal}, kNoData},
+        {2, {other()}, kNotSupported},
+        {2, {{key("core_contact_service_id"), Variant("1 or 1=1"), Constraint::Equal}}, kInvalid},
+        {9, {{key("facebook_media_album_service_id"), Variant("1_2"), Constraint::Equal}}, kSuccess},
+        {9, {{key("facebook_media_album_service_id"), Variant("1' or '1'='1"), Constraint::Equal}}, kInvalid},
+        {11, {{key("facebook_album_owner_service_id"), Variant(Vector<int>{5, 6}), Constraint::InList}}, kSuccess},
+        {11, {{key("facebook_album_owner_service_id"), Variant("5 or 1=1"), Constraint::Equal}}, kInvalid},
+        {11, {{key("facebook_album_owner_service_id"), Variant("5"), Constraint::GreaterThan}}, kNotSupported},
+        {13, {{key("facebook_photo_tag_text"), Variant("x"), Constraint::Equal}}, kNotSupported},
+        {13, {time(Constraint::GreaterOrEqual, Variant(1262304000))}, kSuccess},
+        {13, {time(Constraint::LessThan, Variant("soon"))}, kInvalid},
+        {2, {{key("core_contact_service"), Variant("Other"), Constraint::Equal}}, kNoData},
+        {9, {{key("core_service_id"), Variant(Vector<String>{}), Constraint::InList}}, kNoData},
+        {11, {{key("core_object_origin_servicename"), Variant("Other"), Constraint::Equal}}, kNoData},
+        {13, {{key("core_object_origin_importcomponent"), Variant("elsewhere"), Constraint::Equal}}, kNoData},
+        // Messages: newest first only, one lower time bound only, no other key.
+        {10, {}, kInvalid, {{timeKey, true}, events[1], events[2]}},
+        {10, {time(Constraint::GreaterOrEqual, Variant(5)), time(Constraint::GreaterThan, Variant(6))}, kInvalid, events},
+        {10, {time(Constraint::LessThan, Variant(5))}, kInvalid, events},
+        {10, {contact}, kInvalid, events},
+        // Friend requests: by service and service id, both ascending, and no constraint.
+        {12, {}, kInvalid, {column("core_event_service", false), requests[1]}},
+        {12, {}, kInvalid, events},
+        {12, {contact}, kInvalid, requests},
+        // Photo events: the service ids descending like the times.
+        {5, {}, kInvalid, {events[0], events[1], column("core_event_serviceid", true)}},
     };
     for (Case const& c : cases) {
-        SCOPED_TRACE(std::to_string(c.type) + " " + c.constraint.key.name().str());
-        IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), Vector<Constraint>{typeIs(c.type), c.constraint});
+        SCOPED_TRACE(std::to_string(c.type) + " " + (c.constraints.empty() ? "" : c.constraints[0].key.name().str()));
+        std::vector<Constraint> constraints{typeIs(c.type)};
+        constraints.insert(constraints.end(), c.constraints.begin(), c.constraints.end());
+        IQueryItems::StartQueryMessage msg(c.columns, Vector<Constraint>{constraints});
         uError const started = source.onMessage(msg);
         if (c.code != kNoData) {
             EXPECT_CODE(started, c.code);
@@ -190,6 +212,10 @@ TEST_F(QueryDispatchTest, CursorConstraintsAreReadOrRefusedWithExactCodes) {
         unsigned count = 1;
         EXPECT_OK(msg.cursor->numRows(count));
         EXPECT_EQ(count, 0u);
+        EXPECT_CODE(msg.cursor->jumpEnd(), kNoData);
+        int moved = 5;
+        EXPECT_OK(msg.cursor->seek(3, moved));
+        EXPECT_EQ(moved, 0);
     }
 }
 
