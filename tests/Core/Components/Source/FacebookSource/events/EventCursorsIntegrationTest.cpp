@@ -6,6 +6,7 @@
 #include <map>
 #include <set>
 #include <string>
+#include <tuple>
 #include <utility>
 #include <vector>
 
@@ -26,19 +27,26 @@ std::string const kFriendPhotos =
     "select pid,aid,owner,src,caption,created from photo where aid in (select aid from album where owner in "
     "(select uid2 from friend where uid1='" + kDemoUid + "'))";
 
-std::string event(int type, std::string const& id, int time) {
-    return std::to_string(type) + " " + id + " " + std::to_string(time);
+// An event record's kind, service id, time, author, text, address and parent, '|'-joined.
+std::string event(std::vector<std::string> const& fields) {
+    std::string out;
+    for (std::string const& f : fields) out += (out.empty() ? "" : "|") + (f.empty() ? "<none>" : f);
+    return out;
 }
 
-// Each record as "type serviceid time"; every record has a GUID of its own per service id and an
+// Each record as event() gives it; every record has a GUID of its own per service id and an
 // author name.
 std::vector<std::string> events(std::vector<Record> const& rows) {
     std::vector<std::string> out;
     std::set<std::string> guids, ids;
     for (Record const& r : rows) {
         std::string const type = EmulatorHost::text(r, "core_object_type");
-        out.push_back(type + " " + EmulatorHost::text(r, "core_event_serviceid") + " " +
-                      EmulatorHost::text(r, "core_object_time"));
+        std::vector<std::string> fields;
+        for (char const* key : {"core_object_type", "core_event_serviceid", "core_object_time", "core_event_contactid",
+                                "core_event_text", "core_event_uri", "core_event_parent_serviceid"}) {
+            fields.push_back(EmulatorHost::text(r, key));
+        }
+        out.push_back(event(fields));
         guids.insert(type + EmulatorHost::text(r, "core_object_id"));
         ids.insert(type + EmulatorHost::text(r, "core_event_serviceid"));
         EXPECT_NE(EmulatorHost::text(r, "core_event_contactname"), "<none>") << out.back();
@@ -61,16 +69,23 @@ protected:
         ASSERT_OK(host->demoClient()->runFStreamQuery(String(kDemoUid), 0, 0, 100000, rows, count));
         for (auto const& row : rows) {
             auto field = [&](char const* name) { return row.search(name) ? row.search(name)->str() : ""; };
-            std::string const id = field(row.contains("is_status") ? "post_id" : "pid");
-            int const kind = row.contains("is_status") ? 4 : row.contains("is_photo") && !id.empty() ? 5 : 0;
-            posts.push_back({kind, event(kind, id.substr(id.find('_') + 1), std::stoi(field("created_time")))});
+            bool const status = row.contains("is_status");
+            std::string const id = field(status ? "post_id" : "pid");
+            int const kind = status ? 4 : row.contains("is_photo") && !id.empty() ? 5 : 0;
+            posts.push_back({kind, std::stoi(field("created_time")),
+                             event({std::to_string(kind), id.substr(id.find('_') + 1), field("created_time"),
+                                    field(status ? "source_id" : "owner"), field(status ? "message" : "alt"),
+                                    status ? "" : field("src"), status ? "" : field("aid")})});
         }
         ASSERT_GE(posts.size(), 700u);
     }
 
-    static int timeOf(std::size_t post) { return std::stoi(posts[post].second.substr(posts[post].second.rfind(' '))); }
-
-    static inline std::vector<std::pair<int, std::string>> posts;  // every post's kind (0: neither) and event
+    struct Post {
+        int kind;  // 0: neither a status nor a photo
+        int time;
+        std::string event;
+    };
+    static inline std::vector<Post> posts;
 };
 
 // Each window is asked for when the walk leaves the one before, up to one second below its last
@@ -107,13 +122,13 @@ TEST_F(EventCursorsTest, StreamWalksVisitEveryWantedPostOnceNewestFirstInBounded
             std::size_t last = std::min(n, at + c.window) - 1;
             bool any = false;
             for (std::size_t end = last + 1; at < end; ++at) {
-                if (std::count(c.kinds.begin(), c.kinds.end(), posts[at].first) == 0) continue;
-                wanted.push_back(posts[at].second);
+                if (std::count(c.kinds.begin(), c.kinds.end(), posts[at].kind) == 0) continue;
+                wanted.push_back(posts[at].event);
                 last = at;
                 any = true;
             }
             named += any;
-            ends.push_back(std::to_string(timeOf(last) - 1));
+            ends.push_back(std::to_string(posts[last].time - 1));
             at = last + 1;
         }
         if (c.window == 3) {
@@ -158,16 +173,17 @@ TEST_F(EventCursorsTest, StreamWalksVisitEveryWantedPostOnceNewestFirstInBounded
 // The service orders the photos by time only; the wrapper sorts each second's photos by the
 // query's whole ordering (service ids descending) across windows of 150.
 TEST_F(EventCursorsTest, PhotoEventsComeOnceInTheQueryOrderAcrossWindows) {
-    std::vector<std::string> const pids = host->fqlColumn(kFriendPhotos, "photo", "pid");
-    std::vector<std::string> const times = host->fqlColumn(kFriendPhotos, "photo", "created");
-    std::vector<std::pair<int, std::string>> order;
-    for (std::size_t i = 0; i < pids.size(); ++i) order.emplace_back(std::stoi(times[i]), pids[i]);
+    std::vector<std::tuple<int, std::string, std::string>> order;  // time, pid, event
+    for (auto& r : host->fqlRows(kFriendPhotos, "photo")) {
+        order.emplace_back(std::stoi(r["created"]), r["pid"],
+                           event({"5", r["pid"], r["created"], r["owner"], r["caption"], r["src"], r["aid"]}));
+    }
     std::sort(order.rbegin(), order.rend());
     std::vector<std::string> expected;
     std::size_t runsOfThree = 0;
     for (std::size_t i = 0; i < order.size(); ++i) {
-        expected.push_back(event(5, order[i].second, order[i].first));
-        runsOfThree += i >= 2 && order[i].first == order[i - 2].first;
+        expected.push_back(std::get<2>(order[i]));
+        runsOfThree += i >= 2 && std::get<0>(order[i]) == std::get<0>(order[i - 2]);
     }
     ASSERT_GT(expected.size(), 300u);
     ASSERT_GT(runsOfThree, 10u);
@@ -185,9 +201,10 @@ TEST_F(EventCursorsTest, PhotoEventsComeOnceInTheQueryOrderAcrossWindows) {
     ASSERT_EQ(pages.size(), expected.size() / 150 + 1);
     EXPECT_EQ(pages[0], kFriendPhotos + " order by created desc limit 150");
     for (std::size_t k = 1; k < pages.size(); ++k) {
-        std::string const T = std::to_string(order[k * 150 - 1].first);
-        EXPECT_EQ(pages[k], kFriendPhotos + " and (created < " + T + " or (created = " + T + " and pid < '" +
-                                order[k * 150 - 1].second + "')) order by created desc limit 150");
+        auto const& [time, pid, e] = order[k * 150 - 1];
+        std::string const T = std::to_string(time);
+        EXPECT_EQ(pages[k], kFriendPhotos + " and (created < " + T + " or (created = " + T + " and pid < '" + pid +
+                                "')) order by created desc limit 150");
     }
 
     // The wrapper moves one way, a row at a time.
