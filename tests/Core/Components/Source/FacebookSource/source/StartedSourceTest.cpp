@@ -1,66 +1,68 @@
+// A source configured with an application and a session (in memory only) and started, without a
+// network: how it chooses the cursor for a query, what the cursors make of a query when they start,
+// and the data operations it refuses before asking the service (no HTTP factory is registered, so
+// a request would fail with another code).
 #include <gtest/gtest.h>
-
-#include "ErrorAssertions.h"
 
 #include <cstdint>
 #include <string>
 #include <vector>
 
 #include "ContactCursor.h"
-#include "PhotoLibraryCursor.h"
+#include "ErrorAssertions.h"
 #include "FacebookSource.h"
+#include "GetUserSidMessage.h"
 #include "IQueryItems.h"
+#include "PhotoLibraryCursor.h"
+#include "RecordDump.h"
 #include "trelm/Configuration.h"
+#include "trelm/GUID.h"
 
 namespace trelm {
 namespace {
 
 using Constraint = IQueryItems::Constraint;
+using Record = Map<String, Variant>;
 
 constexpr char const* kSourceName = "facebook";
 constexpr int kNone = 0;  // no type chosen: the case fails
 
-Constraint typeIs(Variant value) {
-    return Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), std::move(value), Constraint::Equal};
+Constraint where(char const* key, Variant value, Constraint::Function function = Constraint::Equal,
+                 TRELM_TYPES::TYPES type = TRELM_TYPES::STRING) {
+    return Constraint{Metadata::Key(key, type), std::move(value), function};
 }
-Constraint typeIn(Vector<int> types) {
-    return Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(types), Constraint::InList};
+Constraint typeIs(Variant value, Constraint::Function function = Constraint::Equal) {
+    return where("core_object_type", std::move(value), function, TRELM_TYPES::INT32);
 }
-Constraint typeInValue(Variant value) {
-    return Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), std::move(value), Constraint::InList};
-}
-Constraint typeCompared(int type, Constraint::Function function) {
-    return Constraint{Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(type), function};
-}
-Constraint sourceIs(Variant value) {
-    return Constraint{Metadata::Key("core_object_source", TRELM_TYPES::STRING), std::move(value), Constraint::Equal};
-}
-Constraint other() {
-    return Constraint{Metadata::Key("core_contact_name", TRELM_TYPES::STRING), Variant("x"), Constraint::Equal};
+Constraint typeIn(Vector<int> types) { return typeIs(Variant(types), Constraint::InList); }
+Constraint other() { return where("core_contact_name", Variant("x")); }
+
+Record record(std::initializer_list<std::pair<char const*, Variant>> entries) {
+    Record r;
+    for (auto const& [key, value] : entries) EXPECT_OK(r.insert(key, value));
+    return r;
 }
 
-// A source configured with an application and a session (in memory only) and started: no
-// message is sent and no request made until a cursor reads.
 class QueryDispatchTest : public ::testing::Test {
 protected:
     void SetUp() override {
-        Configuration::Group const group(kSourceName,
-                                         {{"facebook_source_appkey", Variant("key")},
-                                          {"facebook_source_appsecret", Variant("secret")},
-                                          {"facebook_source_session_user", Variant("100000001")},
-                                          {"facebook_source_session_id", Variant("session")},
-                                          {"facebook_source_session_secret", Variant("session-secret")}});
-        ASSERT_CODE(source.sendConfig(group), kSuccess);
-        ASSERT_CODE(source.startup(), kSuccess);
+        ASSERT_OK(source.sendConfig(Configuration::Group(kSourceName,
+                                                         {{"facebook_source_appkey", Variant("key")},
+                                                          {"facebook_source_appsecret", Variant("secret")},
+                                                          {"facebook_source_session_user", Variant("100000001")},
+                                                          {"facebook_source_session_id", Variant("session")},
+                                                          {"facebook_source_session_secret", Variant("s")}})));
+        ASSERT_OK(source.startup());
     }
 
     FacebookSource source{kSourceName};
 };
+using DataOperationsTest = QueryDispatchTest;
 
 // Every rule of the dispatch in one table: what the query asks for, the position and the flag,
 // and the type chosen (or the code of the refusal). Each case is also run as a start-query
-// message through the started source: a chosen type yields its cursor, or kNotSupported while
-// that kind has no cursor yet; a refusal yields the same code and no cursor.
+// message through the started source: a chosen type yields its cursor; a refusal yields the same
+// code and no cursor.
 TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
     struct Case {
         char const* name;
@@ -84,15 +86,15 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
         {"empty list leaves none", {typeIn({})}, -1, true, kNone, kNotSupported},
         {"no type constraint", {other()}, -1, true, kNone, kNotSupported},
         {"no constraints at all", {}, -1, true, kNone, kNotSupported},
-        {"ordering comparison on the type", {typeCompared(2, Constraint::GreaterThan)}, -1, true, kNone,
+        {"ordering comparison on the type", {typeIs(2, Constraint::GreaterThan)}, -1, true, kNone,
          kNotSupported},
-        {"not-equal on the type", {typeCompared(2, Constraint::NotEqual)}, -1, true, kNone, kNotSupported},
+        {"not-equal on the type", {typeIs(2, Constraint::NotEqual)}, -1, true, kNone, kNotSupported},
         {"type value that is no number", {typeIs("two")}, -1, true, kNone, kInvalid},
-        {"type list that is no number list", {typeInValue(Variant(Vector<String>{"x"}))}, -1, true, kNone, kInvalid},
-        {"own source accepted", {sourceIs(kSourceName), typeIs(2)}, -1, true, 2, kSuccess},
-        {"other source refused", {typeIs(2), sourceIs("other")}, -1, true, kNone, kNotSupported},
-        {"other source refused for any type", {sourceIs("other"), typeIs(9)}, -1, false, kNone, kNotSupported},
-        {"source value that is no text", {sourceIs(Variant(Vector<int>{1, 2})), typeIs(2)}, -1, true, kNone,
+        {"type list that is no number list", {typeIs(Variant(Vector<String>{"x"}), Constraint::InList)}, -1, true, kNone, kInvalid},
+        {"own source accepted", {where("core_object_source", kSourceName), typeIs(2)}, -1, true, 2, kSuccess},
+        {"other source refused", {typeIs(2), where("core_object_source", "other")}, -1, true, kNone, kNotSupported},
+        {"other source refused for any type", {where("core_object_source", "other"), typeIs(9)}, -1, false, kNone, kNotSupported},
+        {"source value that is no text", {where("core_object_source", Variant(Vector<int>{1, 2})), typeIs(2)}, -1, true, kNone,
          kInvalid},
         {"background media query", {typeIs(9)}, -1, false, 9, kSuccess},
         {"background friend requests", {typeIs(12)}, -1, false, 12, kSuccess},
@@ -123,36 +125,22 @@ TEST_F(QueryDispatchTest, RulesChooseOneObjectTypeOrRefuseWithExactCode) {
         IQueryItems::StartQueryMessage msg(Vector<IQueryItems::Column>(), constraints, c.position);
         msg.interactive = c.flag;
         uError started = source.onMessage(msg);
-        if (c.type == kNone) {
-            EXPECT_CODE(started, c.code);
-            EXPECT_FALSE(msg.cursor);
-        } else if (c.type == FacebookSource::kContact) {
-            EXPECT_CODE(started, kSuccess);
+        // The friend-request, stream and photo cursors start only with their ordering, which these
+        // queries lack.
+        bool const ordered = c.type == 4 || c.type == 5 || c.type == 12;
+        EXPECT_CODE(started, c.type == kNone ? c.code : ordered ? kInvalid : kSuccess);
+        EXPECT_EQ(bool(msg.cursor), c.type != kNone && !ordered);
+        if (c.type == FacebookSource::kContact) {
             EXPECT_NE(dynamic_cast<ContactCursor*>(msg.cursor.get()), nullptr);
-        } else if (c.type == FacebookSource::kFriendRequest) {
-            // The message gives no columns, so the cursor refuses to start without its ordering.
-            EXPECT_EQ(started.code(), kInvalid) << started;
-            EXPECT_FALSE(msg.cursor);
-        } else if (c.type == FacebookSource::kAlbum || c.type == FacebookSource::kMedia ||
-                   c.type == FacebookSource::kPhotoTag) {
-            EXPECT_EQ(started.code(), kSuccess) << started;
-            auto* cursor = dynamic_cast<PhotoLibraryCursor*>(msg.cursor.get());
-            ASSERT_NE(cursor, nullptr);
+        } else if (auto* cursor = dynamic_cast<PhotoLibraryCursor*>(msg.cursor.get())) {
             EXPECT_EQ(cursor->paged(), c.position == -1);
             EXPECT_EQ(cursor->since(), c.position);
-        } else if (c.type == FacebookSource::kStatus || c.type == FacebookSource::kPhotoEvent) {
-            // The stream and photo cursors start only with their ordering, which these queries lack.
-            EXPECT_EQ(started.code(), kInvalid) << started;
-            EXPECT_FALSE(msg.cursor);
-        } else {
-            EXPECT_CODE(started, kNotSupported);
-            EXPECT_FALSE(msg.cursor);
         }
     }
 }
 
 // What the cursors make of a query's ordering and constraints when they start, before anything
-// is asked of the service (no HTTP factory is registered: a request would fail with another code).
+// is asked of the service.
 TEST_F(QueryDispatchTest, CursorConstraintsAreReadOrRefusedWithExactCodes) {
     auto key = [](char const* name) { return Metadata::Key(name, TRELM_TYPES::STRING); };
     Metadata::Key const timeKey("core_object_time", TRELM_TYPES::INT32);
@@ -216,6 +204,72 @@ TEST_F(QueryDispatchTest, CursorConstraintsAreReadOrRefusedWithExactCodes) {
         int moved = 5;
         EXPECT_OK(msg.cursor->seek(3, moved));
         EXPECT_EQ(moved, 0);
+    }
+}
+
+// Operations that are refused whatever the service would say.
+TEST_F(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
+    GUID const someGuid = GUID::generate();
+    Record scratch = record({{"core_object_type", 4}});
+    EXPECT_CODE(source.update(scratch), kDataOpNotSupported);
+    for (bool flag : {false, true}) EXPECT_CODE(source.remove(someGuid, flag), kDataOpNotSupported);
+    scratch = Record();
+    EXPECT_CODE(source.retrieve(someGuid, scratch, true), kDataOpNotSupported);
+    EXPECT_CODE(source.retrieve(someGuid, scratch, false), kNotFound);
+    EXPECT_TRUE(scratch.empty());
+    // A contact, no type, a status without a text, a photo without a file address.
+    for (Record r : {record({{"core_object_type", 2}}), record({{"core_event_text", "hi"}}), record({{"core_object_type", 4}}),
+                     record({{"core_object_type", 4}, {"core_event_text", ""}}),
+                     record({{"core_object_type", 9}, {"media_notes", "caption"}}),
+                     record({{"core_object_type", 9}, {"media_uri", "http://x/y.jpg"}})}) {
+        String dump;
+        sprintTags(dump, r);
+        SCOPED_TRACE(dump.str());
+        EXPECT_CODE(source.insert(r), kInvalid);
+    }
+}
+
+TEST(UnstartedSourceTest, OperationsBeforeStartupFailWithNotSet) {
+    FacebookSource source(kSourceName);
+    Record status = record({{"core_object_type", 4}, {"core_event_text", "hi"}});
+    EXPECT_CODE(source.insert(status), kNotSet);
+    Record out;
+    EXPECT_CODE(source.retrieve(GUID::generate(), out, false), kNotSet);
+    IServiceSource::GetUserSidMessage sid;
+    EXPECT_CODE(source.onMessage(sid), kNotSet);
+    // A query gets no cursor without a client, before and after a configuration.
+    IQueryItems::StartQueryMessage query(Vector<IQueryItems::Column>(), Vector<Constraint>{typeIs(2)});
+    EXPECT_CODE(source.onMessage(query), kNotSet);
+    // Starting without a configuration is refused too, rather than making a client without settings.
+    EXPECT_CODE(source.startup(), kNotSet);
+    ASSERT_OK(source.sendConfig(Configuration::Group(kSourceName)));
+    EXPECT_CODE(source.onMessage(query), kNotSet);
+    EXPECT_FALSE(query.cursor);
+}
+
+// The dump pads every key to 30 columns; a longer key gets (length - 30) spaces instead.
+TEST(RecordDumpTest, PadsKeysToThirtyColumnsAndRendersByRegisteredType) {
+    trelm_RegisterMetadataType("test_dump_unsigned", TRELM_TYPES::UINT32);
+    GUID const guid = GUID::generate();
+    std::string const key30(30, 'k');
+    std::string const key33(33, 'k');
+    struct Case {
+        Record input;
+        std::string text;
+    };
+    std::vector<Case> const cases = {
+        {record({{"core_object_type", 4}}), "core_object_type:" + std::string(14, ' ') + "4\n"},
+        {record({{key30.c_str(), "v"}}), key30 + ":v\n"},
+        {record({{key33.c_str(), "v"}}), key33 + ":   v\n"},
+        {record({{"core_object_id", guid}}), "core_object_id:" + std::string(16, ' ') + guid.toString().str() + "\n"},
+        {record({{"test_dump_unsigned", 7u}, {"core_contact_name", "Ann"}}),
+         "core_contact_name:" + std::string(13, ' ') + "Ann\n" + "test_dump_unsigned:" + std::string(12, ' ') + "7\n"},
+        {Record(), ""},
+    };
+    for (Case const& c : cases) {
+        String out("> ");
+        sprintTags(out, c.input);
+        EXPECT_EQ(out.str(), "> " + c.text);
     }
 }
 
