@@ -1,3 +1,4 @@
+// Inserts and retrieval by GUID against the in-process emulator.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -9,6 +10,7 @@
 
 #include "EmulatorHost.h"
 #include "ErrorAssertions.h"
+#include "trelm/GUID.h"
 
 namespace trelm::test {
 namespace {
@@ -17,18 +19,21 @@ using Record = Map<String, Variant>;
 
 std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
 
+// The default data set; the source "facebook" is signed in as the demo user.
+class DataOperationsIntegrationTest : public EmulatorSuite {
+protected:
+    static void SetUpTestSuite() { startSuite(); }
+};
+using RetrieveByGuidTest = DataOperationsIntegrationTest;
+
 // Inserted items reach the service with the arguments their record gives, each optional one sent
 // only when present; a new photo's id comes back into the record and the service holds the photo
 // with that caption in that album; a status writes nothing back; a failed upload leaves the record
 // without a service id.
-TEST(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWrittenBack) {
-    EmulatorHost host;
-    std::string error;
-    ASSERT_TRUE(host.start(error)) << error;
-    FacebookSource& source = host.addSource(host.demoGroup("facebook", true));
+TEST_F(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWrittenBack) {
     std::string const photo = ::testing::TempDir() + "trelm-source-photo.jpg";
     std::ofstream(photo, std::ios::binary) << std::string("\xff\xd8\xff\xe0 not really a picture", 26);
-    std::string const album = host.fqlColumn("select aid from album where owner='" + kDemoUid + "'", "album", "aid").at(0);
+    std::string const album = host->fqlColumn("select aid from album where owner='" + kDemoUid + "'", "album", "aid").at(0);
     std::string const status = "reading about keyset paging";
     Record const upload{{"core_object_type", Variant(9)}, {"media_uri", Variant(String("file://" + photo))}};
     struct Case {
@@ -49,14 +54,14 @@ TEST(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWritt
     ASSERT_OK(cases[2].record.insert("facebook_media_album_service_id", Variant(String(album))));
     for (Case& c : cases) {
         SCOPED_TRACE(c.name);
-        host.emulator().log().clear();
+        host->emulator().log().clear();
         if (c.code == kServiceUnavailable) {
             emu::FaultRule unavailable;
             unavailable.errorCode = 2;
-            host.emulator().faults().set(c.method, unavailable);
+            host->emulator().faults().set(c.method, unavailable);
         }
-        EXPECT_CODE(source.insert(c.record), c.code);
-        auto const calls = host.emulator().log().entriesFor(c.method);
+        EXPECT_CODE(source->insert(c.record), c.code);
+        auto const calls = host->emulator().log().entriesFor(c.method);
         ASSERT_EQ(calls.size(), 1u);
         for (auto const& [key, value] : c.args) {
             EXPECT_EQ(calls[0].args.count(key) ? calls[0].args.at(key) : "", value) << key;
@@ -69,7 +74,7 @@ TEST(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWritt
         EXPECT_TRUE(calls[0].hadFile);
         EXPECT_EQ(calls[0].fileSize, std::filesystem::file_size(photo));
         ASSERT_NE(id, nullptr);
-        auto const rows = host.fqlRows("select caption, aid from photo where pid='" + id->asString().str() + "'", "photo");
+        auto const rows = host->fqlRows("select caption, aid from photo where pid='" + id->asString().str() + "'", "photo");
         ASSERT_EQ(rows.size(), 1u);
         EXPECT_EQ(rows[0].at("caption"), c.args["caption"]);
         if (!c.args["aid"].empty()) {
@@ -77,8 +82,72 @@ TEST(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWritt
         }
     }
     std::filesystem::remove(photo);
-    auto const posts = host.fqlColumn("select message from stream where source_id='" + kDemoUid + "'", "stream", "message");
+    auto const posts = host->fqlColumn("select message from stream where source_id='" + kDemoUid + "'", "stream", "message");
     EXPECT_NE(std::find(posts.begin(), posts.end(), status), posts.end()) << "the status is in the stream";
+}
+
+// Records that listings of every kind produced come back by their GUID equal to the listed ones.
+// Every listing stays open while every record it listed is fetched again, so that a GUID shared
+// by two kinds (an album and a photo with the same service id, say) would show. The cursors then
+// go one by one: a record goes with the last cursor that listed it (media is listed twice), and
+// retrieval adds its keys to what the caller's record holds.
+// The message cursor gives its records GUIDs but keeps the records to itself: they are not found.
+TEST_F(RetrieveByGuidTest, EveryListedRecordOfEveryKindComesBackEqualWhileACursorHoldingItLives) {
+    struct Listing {
+        char const* name;
+        int type;
+        Vector<IQueryItems::Column> ordering;
+        bool retrievable = true;
+    };
+    Vector<IQueryItems::Column> const events = EmulatorHost::eventOrdering();
+    std::vector<Listing> const listings = {
+        {"contacts", 2, {}},
+        {"status posts", 4, events},
+        {"photo events", 5, events},
+        {"friend requests", 12, {{events[1].key, true}, {events[2].key, true}}},
+        {"media", 9, {}},
+        {"albums", 11, {}},
+        {"photo tags", 13, {}},
+        {"media again", 9, {}},
+        {"messages", 10, events, false},
+    };
+    std::vector<EmulatorHost::Cursor> cursors;
+    std::map<GUID, SmartPtr<Record>> listed;
+    std::map<GUID, std::size_t> holder;  // the last listing that listed it
+    for (std::size_t i = 0; i < listings.size(); ++i) {
+        SCOPED_TRACE(listings[i].name);
+        EmulatorHost::Cursor cursor = EmulatorHost::open(*source, listings[i].type, listings[i].ordering);
+        ASSERT_TRUE(cursor);
+        int rows = 0;
+        for (int moved = 1; rows < 20 && moved != 0; ++rows) {
+            SmartPtr<Record> row;
+            ASSERT_OK(cursor->getRow(row));
+            // The same object listed twice keeps its GUID and record.
+            auto const [at, fresh] = listed.emplace(row->search("core_object_id")->asGUID(), row);
+            holder[at->first] = i;
+            EXPECT_TRUE(fresh || *at->second == *row);
+            ASSERT_TRUE(cursor->seek(1, moved).ok());
+        }
+        EXPECT_GT(rows, 1);
+        cursors.push_back(cursor);
+    }
+
+    for (std::size_t gone = 0; gone <= cursors.size(); ++gone) {
+        for (auto const& [guid, row] : listed) {
+            Listing const& listing = listings[holder[guid]];
+            SCOPED_TRACE(std::string(listing.name) + " " + guid.toString().str() + ", cursors gone: " + std::to_string(gone));
+            Record out{{"caller_key", Variant("kept")}};
+            if (!listing.retrievable || holder[guid] < gone) {
+                EXPECT_CODE(source->retrieve(guid, out, false), kNotFound);
+                continue;
+            }
+            ASSERT_OK(source->retrieve(guid, out, false));
+            Record expected = *row;
+            ASSERT_OK(expected.insert("caller_key", Variant("kept")));
+            EXPECT_EQ(out, expected);
+        }
+        if (gone < cursors.size()) cursors[gone].reset();
+    }
 }
 
 }  // namespace
