@@ -47,9 +47,20 @@ String posts(std::string const& posts) {
     return String("<stream_get_response><posts list=\"true\">" + posts + "</posts></stream_get_response>");
 }
 
-std::string text(RecordPtr const& record, char const* key) {
-    Variant const* v = record ? record->search(key) : nullptr;
-    return v ? v->asString().str() : "<none>";
+// Each record's `keys`, blank-joined, with seek(1) until the cursor stops moving.
+std::vector<std::string> walk(IQueryItems::ICursor& cursor, std::vector<char const*> const& keys) {
+    std::vector<std::string> seen;
+    for (int moved = 1; moved == 1;) {
+        RecordPtr row;
+        EXPECT_OK(cursor.getRow(row));
+        std::string line;
+        for (char const* key : keys) line += (line.empty() ? "" : " ") + (row ? row->search(key)->asString().str() : "?");
+        seen.push_back(line);
+        uError const err = cursor.seek(1, moved);
+        EXPECT_OK(err);
+        if (err.failed()) break;
+    }
+    return seen;
 }
 
 // Cursors over a signed-in client (user 42) whose requests are answered from the queue.
@@ -61,11 +72,8 @@ protected:
         ASSERT_OK(cache->setup());
     }
 
-    SmartPtr<FStreamCursor> stream(Vector<Constraint> constraints, unsigned window = 75,
-                                   Vector<Column> ordering = {kTime, kService, kServiceId}) {
-        auto cursor = makeSmart<FStreamCursor>(lib, cache, ordering, constraints, "facebook", true, true);
-        cursor->setWindowSize(window);
-        return cursor;
+    SmartPtr<FStreamCursor> stream(Vector<Constraint> constraints, Vector<Column> ordering = {kTime, kService, kServiceId}) {
+        return makeSmart<FStreamCursor>(lib, cache, ordering, constraints, "facebook", true, true);
     }
 
     SmartPtr<FacebookSource::MappingCache> cache = makeSmart<FacebookSource::MappingCache>();
@@ -104,7 +112,7 @@ TEST_F(EventCursorTest, StreamStartReadsBoundsAndKindsOrRefusesWithExactCode) {
     };
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
-        SmartPtr<FStreamCursor> cursor = stream(c.constraints, 75, c.ordering);
+        SmartPtr<FStreamCursor> cursor = stream(c.constraints, c.ordering);
         EXPECT_CODE(cursor->start(), c.code);
         if (c.code != kSuccess) continue;
         EXPECT_EQ(cursor->startTime(), c.startTime);
@@ -125,14 +133,8 @@ TEST_F(EventCursorTest, StreamKeepsStatusAndPhotoPostsWithTheIdAfterTheFirstUnde
     http.queue(posts(""));
     SmartPtr<FStreamCursor> cursor = stream({typeIs(Constraint::InList, Vector<int>{4, 5})});
     ASSERT_OK(cursor->start());
-    std::vector<std::string> seen;
-    for (int moved = 1; moved == 1;) {
-        RecordPtr row;
-        ASSERT_OK(cursor->getRow(row));
-        seen.push_back(text(row, "core_event_serviceid") + " " + text(row, "core_object_type"));
-        ASSERT_OK(cursor->seek(1, moved));
-    }
-    EXPECT_EQ(seen, (std::vector<std::string>{"123 4", "1_5 5", "777 4"}));
+    EXPECT_EQ(walk(*cursor, {"core_event_serviceid", "core_object_type"}),
+              (std::vector<std::string>{"123 4", "1_5 5", "777 4"}));
 }
 
 TEST_F(EventCursorTest, PhotoEventsOfOneSecondComeInTheQueryOrderNotTheServiceOrder) {
@@ -149,15 +151,8 @@ TEST_F(EventCursorTest, PhotoEventsOfOneSecondComeInTheQueryOrderNotTheServiceOr
     auto inner = makeSmart<PhotoEventCursor>(lib, cache, ordering, constraints, "facebook", true, true);
     auto cursor = makeSmart<PhotoEventWrappedCursor>(inner, lib, cache, ordering, constraints, "facebook", true);
     ASSERT_OK(cursor->start());
-    std::vector<std::string> seen;
-    for (int moved = 1; moved == 1;) {
-        RecordPtr row;
-        ASSERT_OK(cursor->getRow(row));
-        seen.push_back(text(row, "core_event_serviceid"));
-        ASSERT_OK(cursor->seek(1, moved));
-    }
     // Descending service ids within the second; the photo id keeps its prefix.
-    EXPECT_EQ(seen, (std::vector<std::string>{"1_3", "1_2", "1_1", "123_456"}));
+    EXPECT_EQ(walk(*cursor, {"core_event_serviceid"}), (std::vector<std::string>{"1_3", "1_2", "1_1", "123_456"}));
 }
 
 }  // namespace

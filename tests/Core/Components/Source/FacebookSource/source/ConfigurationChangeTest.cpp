@@ -179,7 +179,7 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
 }
 
 TEST_F(ConfigurationChangeTest, ChangesBeforeStartupFailClearlyWhenTheyNeedTheClient) {
-    FacebookSource& source = host->addBareSource("unstarted");
+    FacebookSource& source = host->addSource(Configuration::Group("unstarted"), false);
     ConfigurationChangedMessage login(Set<String>{kLogin});
     EXPECT_CODE(source.onMessage(login), kNotSet) << "no settings yet";
 

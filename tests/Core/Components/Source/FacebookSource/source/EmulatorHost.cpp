@@ -47,16 +47,14 @@ Configuration::Group EmulatorHost::demoGroup(String const& name, bool session) {
     return Configuration::Group(name, values);
 }
 
-FacebookSource& EmulatorHost::addBareSource(String const& name) {
-    sources_.push_back(std::make_unique<FacebookSource>(name));
-    addComponent(name, *sources_.back());
-    return *sources_.back();
-}
-
-FacebookSource& EmulatorHost::addSource(Configuration::Group const& group) {
-    FacebookSource& source = addBareSource(group.name());
-    EXPECT_OK(source.sendConfig(group));
-    EXPECT_OK(source.startup());
+FacebookSource& EmulatorHost::addSource(Configuration::Group const& group, bool configure) {
+    sources_.push_back(std::make_unique<FacebookSource>(group.name()));
+    FacebookSource& source = *sources_.back();
+    addComponent(group.name(), source);
+    if (configure) {
+        EXPECT_OK(source.sendConfig(group));
+        EXPECT_OK(source.startup());
+    }
     return source;
 }
 

@@ -35,17 +35,15 @@ public:
     bool start(std::string& error);
 
     emu::Emulator& emulator() { return *emulator_; }
-    ComponentRegistry& registry() { return registry_; }
     RuntimeConfiguration& runtime() { return runtime_; }
 
     // The source's configuration group with the demo application, and when `session` is set a
     // fresh session of the demo user.
     Configuration::Group demoGroup(String const& name, bool session);
 
-    // Makes a source, registers it, configures it with `group` and starts it.
-    FacebookSource& addSource(Configuration::Group const& group);
-    // Makes a source and registers it, nothing more.
-    FacebookSource& addBareSource(String const& name);
+    // Makes a source named after `group` and registers it; with `configure`, configures it with
+    // `group` and starts it.
+    FacebookSource& addSource(Configuration::Group const& group, bool configure = true);
     // Registers a component the test owns; it is unregistered at destruction.
     void addComponent(String const& name, Component& component);
 
