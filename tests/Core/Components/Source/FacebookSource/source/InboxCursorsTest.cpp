@@ -185,7 +185,7 @@ TEST_F(InboxCursorsTest, MessagesComeOnceNewestFirstAndATimeBoundStopsReadingAtT
     EXPECT_NE(expectedMessages(middle, false).size(), expectedMessages(middle, true).size());
 }
 
-TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndMoveForwardOnlyWithoutAsking) {
+TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndTheSourceFieldsAndMoveForwardOnly) {
     Cursor cursor = EmulatorHost::open(*source, 10, kMessageOrder);
     host->emulator().log().clear();
     std::vector<std::string> const all = expectedMessages(0, false);
@@ -197,7 +197,12 @@ TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndMoveForwardOnlyWithoutA
         return row ? text(*row, key) : "";
     };
     EXPECT_EQ(at("core_event_subject"), "Subject " + idOf(0).substr(0, idOf(0).find('-')));
-    EXPECT_EQ(at("core_object_type"), "10");
+    for (auto const& [key, value] : std::map<std::string, std::string>{
+             {"core_object_type", "10"}, {"core_event_service", "Facebook"}, {"core_object_source", "facebook"},
+             {"core_object_origin_importcomponent", "facebook"}, {"core_object_origin_servicename", "Facebook"},
+             {"core_object_deleted", "false"}}) {
+        EXPECT_EQ(at(key.c_str()), value) << key;
+    }
 
     int moved = 0;
     unsigned index = 0;
