@@ -47,10 +47,11 @@ TEST_F(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWri
          {{"status", status}, {"status_includes_verb", "1"}}},
         {"photo without caption or album", upload, "photos.upload", {{"caption", ""}, {"aid", ""}}},
         {"photo with caption and album", upload, "photos.upload", {{"caption", "at the sea"}, {"aid", album}}},
+        {"photo into an album without caption", upload, "photos.upload", {{"caption", ""}, {"aid", album}}},
         {"photo whose upload fails", upload, "photos.upload", {}, kServiceUnavailable},
     };
     ASSERT_OK(cases[2].record.insert("media_notes", Variant("at the sea")));
-    ASSERT_OK(cases[2].record.insert("facebook_media_album_service_id", Variant(String(album))));
+    for (int i : {2, 3}) ASSERT_OK(cases[i].record.insert("facebook_media_album_service_id", Variant(String(album))));
     for (Case& c : cases) {
         SCOPED_TRACE(c.name);
         host->emulator().log().clear();
