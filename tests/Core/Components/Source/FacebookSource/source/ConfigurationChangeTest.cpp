@@ -34,13 +34,10 @@ class RecordingListener : public Component {
 public:
     RecordingListener() : Component("observer", "observer") {}
 
-    std::vector<std::string> events() const {
+    // The messages noted since the last call.
+    std::vector<std::string> take() {
         std::lock_guard<std::mutex> lock(mutex_);
-        return events_;
-    }
-    void clear() {
-        std::lock_guard<std::mutex> lock(mutex_);
-        events_.clear();
+        return std::exchange(events_, {});
     }
 
 protected:
@@ -58,7 +55,7 @@ protected:
     }
 
 private:
-    mutable std::mutex mutex_;  // guards events_
+    std::mutex mutex_;  // guards events_
     std::vector<std::string> events_;
 };
 
@@ -154,7 +151,7 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
             ASSERT_OK(values.insert(Configuration::Value(key, Variant(String(text)))));
         }
         ASSERT_OK(host->runtime().store(name, values));
-        observer->clear();
+        observer->take();
         host->emulator().log().clear();
 
         Set<String> changed;
@@ -163,7 +160,7 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
         uError err = source.onMessage(msg);
         EXPECT_OK(err);
 
-        EXPECT_EQ(observer->events(), c.events);
+        EXPECT_EQ(observer->take(), c.events);
         auto logins = host->emulator().log().entriesFor("auth.login");
         EXPECT_EQ(logins.size(), size_t(c.logins));
         for (auto const& login : logins) EXPECT_TRUE(login.https);
@@ -182,7 +179,7 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
 }
 
 TEST_F(ConfigurationChangeTest, ChangesBeforeStartupFailClearlyWhenTheyNeedTheClient) {
-    FacebookSource& source = host->addBareSource("unstarted");
+    FacebookSource& source = host->addSource(Configuration::Group("unstarted"), false);
     ConfigurationChangedMessage login(Set<String>{kLogin});
     EXPECT_CODE(source.onMessage(login), kNotSet) << "no settings yet";
 

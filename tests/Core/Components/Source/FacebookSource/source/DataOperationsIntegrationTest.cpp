@@ -1,16 +1,15 @@
+// Inserts and retrieval by GUID against the in-process emulator.
 #include <gtest/gtest.h>
 
-#include "ErrorAssertions.h"
-
-#include <algorithm>
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <map>
 #include <string>
 #include <vector>
 
 #include "EmulatorHost.h"
-#include "IQueryItems.h"
+#include "ErrorAssertions.h"
+#include "trelm/GUID.h"
 
 namespace trelm::test {
 namespace {
@@ -19,132 +18,132 @@ using Record = Map<String, Variant>;
 
 std::string const kDemoUid = std::to_string(emu::DemoAccount::uid);
 
+// The default data set; the source "facebook" is signed in as the demo user.
 class DataOperationsIntegrationTest : public EmulatorSuite {
 protected:
-    static void SetUpTestSuite() {
-        startSuite();
-        char pattern[] = "/tmp/trelm-source-test-XXXXXX";
-        ASSERT_NE(mkdtemp(pattern), nullptr);
-        directory = pattern;
-        photo = directory + "/holiday photo.jpg";
-        std::ofstream(photo, std::ios::binary) << std::string("\xff\xd8\xff\xe0 not really a picture", 26);
-    }
-    static void TearDownTestSuite() {
-        std::filesystem::remove_all(directory);
-        EmulatorSuite::TearDownTestSuite();
-    }
-    void SetUp() override {
-        EmulatorSuite::SetUp();
-        host->emulator().faults().clearAll();
-    }
-
-    static SmartPtr<IQueryItems::ICursor> openContacts() { return EmulatorHost::open(*source, 2); }
-
-    static inline std::string directory;
-    static inline std::string photo;
+    static void SetUpTestSuite() { startSuite(); }
 };
+using RetrieveByGuidTest = DataOperationsIntegrationTest;
 
-TEST_F(DataOperationsIntegrationTest, InsertedStatusIsPostedAndAppearsInTheStream) {
-    std::string const text = "reading about keyset paging";
-    Record status{{"core_object_type", Variant(4)}, {"core_event_text", Variant(text.c_str())}};
-    uError err = source->insert(status);
-    ASSERT_OK(err);
-
-    auto calls = host->emulator().log().entriesFor("users.setStatus");
-    ASSERT_EQ(calls.size(), 1u);
-    EXPECT_EQ(calls[0].args.at("status"), text);
-    EXPECT_EQ(calls[0].args.at("status_includes_verb"), "1");
-    EXPECT_EQ(status.search("core_service_id"), nullptr) << "nothing is written back for a status";
-
-    std::vector<std::string> messages =
-        host->fqlColumn("select message from stream where source_id='" + kDemoUid + "'", "stream", "message");
-    EXPECT_NE(std::find(messages.begin(), messages.end(), text), messages.end());
-}
-
-// Optional caption and album: each present or absent, sent only when present; the new photo's id
-// comes back into the record and the service holds the photo with that caption in that album.
-TEST_F(DataOperationsIntegrationTest, InsertedPhotoIsUploadedAndItsIdWrittenBack) {
-    std::vector<std::string> const albums =
-        host->fqlColumn("select aid from album where owner='" + kDemoUid + "'", "album", "aid");
-    ASSERT_FALSE(albums.empty());
+// Inserted items reach the service with the arguments their record gives, each optional one sent
+// only when present; a new photo's id comes back into the record and the service holds the photo
+// with that caption in that album; a status writes nothing back; a failed upload leaves the record
+// without a service id.
+TEST_F(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWrittenBack) {
+    std::string const photo = ::testing::TempDir() + "trelm-source-photo.jpg";
+    std::ofstream(photo, std::ios::binary) << std::string("\xff\xd8\xff\xe0 not really a picture", 26);
+    std::string const album = host->fqlColumn("select aid from album where owner='" + kDemoUid + "'", "album", "aid").at(0);
+    std::string const status = "reading about keyset paging";
+    Record const upload{{"core_object_type", Variant(9)}, {"media_uri", Variant(String("file://" + photo))}};
     struct Case {
         char const* name;
-        char const* caption;  // null: no "media_notes"
-        bool intoAlbum;       // "facebook_media_album_service_id" = an album of the user
+        Record record;
+        char const* method;
+        std::map<std::string, std::string> args;  // "": must be absent
+        unsigned code = kSuccess;
     };
-    Case const cases[] = {
-        {"neither caption nor album", nullptr, false},
-        {"caption only", "at the lake", false},
-        {"album only", nullptr, true},
-        {"caption and album", "at the sea", true},
+    std::vector<Case> cases = {
+        {"status", {{"core_object_type", Variant(4)}, {"core_event_text", Variant(status.c_str())}}, "users.setStatus",
+         {{"status", status}, {"status_includes_verb", "1"}}},
+        {"photo without caption or album", upload, "photos.upload", {{"caption", ""}, {"aid", ""}}},
+        {"photo with caption and album", upload, "photos.upload", {{"caption", "at the sea"}, {"aid", album}}},
+        {"photo into an album without caption", upload, "photos.upload", {{"caption", ""}, {"aid", album}}},
+        {"photo whose upload fails", upload, "photos.upload", {}, kServiceUnavailable},
     };
-    for (Case const& c : cases) {
+    ASSERT_OK(cases[2].record.insert("media_notes", Variant("at the sea")));
+    for (int i : {2, 3}) ASSERT_OK(cases[i].record.insert("facebook_media_album_service_id", Variant(String(album))));
+    for (Case& c : cases) {
         SCOPED_TRACE(c.name);
         host->emulator().log().clear();
-        Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String("file://" + photo))}};
-        if (c.caption != nullptr) {
-            ASSERT_OK(media.insert("media_notes", Variant(c.caption)));
+        if (c.code == kServiceUnavailable) {
+            emu::FaultRule unavailable;
+            unavailable.errorCode = 2;
+            host->emulator().faults().set(c.method, unavailable);
         }
-        if (c.intoAlbum) {
-            ASSERT_OK(media.insert("facebook_media_album_service_id", Variant(String(albums[0]))));
+        EXPECT_CODE(source->insert(c.record), c.code);
+        auto const calls = host->emulator().log().entriesFor(c.method);
+        ASSERT_EQ(calls.size(), 1u);
+        for (auto const& [key, value] : c.args) {
+            EXPECT_EQ(calls[0].args.count(key) ? calls[0].args.at(key) : "", value) << key;
         }
-        uError err = source->insert(media);
-        ASSERT_OK(err);
-
-        auto uploads = host->emulator().log().entriesFor("photos.upload");
-        ASSERT_EQ(uploads.size(), 1u);
-        EXPECT_TRUE(uploads[0].hadFile);
-        EXPECT_EQ(uploads[0].fileSize, std::filesystem::file_size(photo));
-        EXPECT_EQ(uploads[0].args.count("caption"), c.caption ? 1u : 0u);
-        EXPECT_EQ(uploads[0].args.count("aid"), c.intoAlbum ? 1u : 0u);
-
-        Variant const* id = media.search("core_service_id");
+        Variant const* id = c.record.search("core_service_id");
+        if (c.code != kSuccess || c.record.search("core_event_text") != nullptr) {
+            EXPECT_EQ(id, nullptr);
+            continue;
+        }
         ASSERT_NE(id, nullptr);
-        std::string const pid = id->asString().str();
-        ASSERT_FALSE(pid.empty());
-        std::string const where = " from photo where pid='" + pid + "'";
-        EXPECT_EQ(host->fqlColumn("select caption" + where, "photo", "caption"),
-                  std::vector<std::string>{c.caption ? c.caption : ""});
-        if (c.intoAlbum) {
-            EXPECT_EQ(host->fqlColumn("select aid" + where, "photo", "aid"), std::vector<std::string>{albums[0]});
+        auto const rows = host->fqlRows("select caption, aid from photo where pid='" + id->asString().str() + "'", "photo");
+        ASSERT_EQ(rows.size(), 1u);
+        EXPECT_EQ(rows[0].at("caption"), c.args["caption"]);
+        if (!c.args["aid"].empty()) {
+            EXPECT_EQ(rows[0].at("aid"), album);
         }
     }
+    std::filesystem::remove(photo);
 }
 
-TEST_F(DataOperationsIntegrationTest, FailedUploadLeavesTheRecordWithoutServiceId) {
-    emu::FaultRule unavailable;
-    unavailable.errorCode = 2;
-    host->emulator().faults().set("photos.upload", unavailable);
-    Record media{{"core_object_type", Variant(9)}, {"media_uri", Variant(String(photo))}};
-    EXPECT_CODE(source->insert(media), kServiceUnavailable);
-    EXPECT_EQ(media.search("core_service_id"), nullptr);
-}
+// Records that listings of every kind produced come back by their GUID equal to the listed ones.
+// Every listing stays open while every record it listed is fetched again, so that a GUID shared
+// by two kinds (an album and a photo with the same service id, say) would show. The cursors then
+// go one by one: a record goes with the last cursor that listed it (media is listed twice), and
+// retrieval adds its keys to what the caller's record holds.
+// The message cursor gives its records GUIDs but keeps the records to itself: they are not found.
+TEST_F(RetrieveByGuidTest, EveryListedRecordOfEveryKindComesBackEqualWhileACursorHoldingItLives) {
+    struct Listing {
+        char const* name;
+        int type;
+        Vector<IQueryItems::Column> ordering;
+        bool retrievable = true;
+    };
+    Vector<IQueryItems::Column> const events = EmulatorHost::eventOrdering();
+    std::vector<Listing> const listings = {
+        {"contacts", 2, {}},
+        {"status posts", 4, events},
+        {"photo events", 5, events},
+        {"friend requests", 12, {{events[1].key, true}, {events[2].key, true}}},
+        {"media", 9, {}},
+        {"albums", 11, {}},
+        {"photo tags", 13, {}},
+        {"media again", 9, {}},
+        {"messages", 10, events, false},
+    };
+    std::vector<EmulatorHost::Cursor> cursors;
+    std::map<GUID, SmartPtr<Record>> listed;
+    std::map<GUID, std::size_t> holder;  // the last listing that listed it
+    for (std::size_t i = 0; i < listings.size(); ++i) {
+        SCOPED_TRACE(listings[i].name);
+        EmulatorHost::Cursor cursor = EmulatorHost::open(*source, listings[i].type, listings[i].ordering);
+        ASSERT_TRUE(cursor);
+        int rows = 0;
+        for (int moved = 1; rows < 20 && moved != 0; ++rows) {
+            SmartPtr<Record> row;
+            ASSERT_OK(cursor->getRow(row));
+            // The same object listed twice keeps its GUID and record.
+            auto const [at, fresh] = listed.emplace(row->search("core_object_id")->asGUID(), row);
+            holder[at->first] = i;
+            EXPECT_TRUE(fresh || *at->second == *row);
+            ASSERT_TRUE(cursor->seek(1, moved).ok());
+        }
+        EXPECT_GT(rows, 1);
+        cursors.push_back(cursor);
+    }
 
-// A record stays retrievable by its GUID while some cursor that produced it is alive.
-TEST_F(DataOperationsIntegrationTest, RetrieveFindsListedRecordsUntilTheLastCursorHoldingThemIsGone) {
-    SmartPtr<IQueryItems::ICursor> first = openContacts();
-    SmartPtr<IQueryItems::ICursor> second = openContacts();
-    SmartPtr<Record> row;
-    ASSERT_OK(first->getRow(row));
-    SmartPtr<Record> same;
-    ASSERT_OK(second->getRow(same));
-    GUID const guid = row->search("core_object_id")->asGUID();
-    ASSERT_EQ(same->search("core_object_id")->asGUID(), guid) << "one GUID per friend while both cursors live";
-
-    Record out{{"caller_key", Variant("kept")}};
-    uError err = source->retrieve(guid, out, false);
-    ASSERT_OK(err);
-    for (auto const& [key, value] : *row) EXPECT_EQ(*out.search(key), value) << key;
-    EXPECT_EQ(out.search("caller_key")->asString(), "kept");
-    EXPECT_EQ(out.size(), row->size() + 1);
-
-    first.reset();
-    Record again;
-    EXPECT_OK(source->retrieve(guid, again, false)) << "the second cursor still holds it";
-    second.reset();
-    Record gone;
-    EXPECT_CODE(source->retrieve(guid, gone, false), kNotFound);
-    EXPECT_TRUE(gone.empty());
+    for (std::size_t gone = 0; gone <= cursors.size(); ++gone) {
+        for (auto const& [guid, row] : listed) {
+            Listing const& listing = listings[holder[guid]];
+            SCOPED_TRACE(std::string(listing.name) + " " + guid.toString().str() + ", cursors gone: " + std::to_string(gone));
+            Record out{{"caller_key", Variant("kept")}};
+            if (!listing.retrievable || holder[guid] < gone) {
+                EXPECT_CODE(source->retrieve(guid, out, false), kNotFound);
+                continue;
+            }
+            ASSERT_OK(source->retrieve(guid, out, false));
+            Record expected = *row;
+            ASSERT_OK(expected.insert("caller_key", Variant("kept")));
+            EXPECT_EQ(out, expected);
+        }
+        if (gone < cursors.size()) cursors[gone].reset();
+    }
 }
 
 }  // namespace

@@ -47,16 +47,14 @@ Configuration::Group EmulatorHost::demoGroup(String const& name, bool session) {
     return Configuration::Group(name, values);
 }
 
-FacebookSource& EmulatorHost::addBareSource(String const& name) {
-    sources_.push_back(std::make_unique<FacebookSource>(name));
-    addComponent(name, *sources_.back());
-    return *sources_.back();
-}
-
-FacebookSource& EmulatorHost::addSource(Configuration::Group const& group) {
-    FacebookSource& source = addBareSource(group.name());
-    EXPECT_OK(source.sendConfig(group));
-    EXPECT_OK(source.startup());
+FacebookSource& EmulatorHost::addSource(Configuration::Group const& group, bool configure) {
+    sources_.push_back(std::make_unique<FacebookSource>(group.name()));
+    FacebookSource& source = *sources_.back();
+    addComponent(group.name(), source);
+    if (configure) {
+        EXPECT_OK(source.sendConfig(group));
+        EXPECT_OK(source.startup());
+    }
     return source;
 }
 
@@ -102,10 +100,6 @@ std::vector<std::string> EmulatorHost::fqlStatements() {
     return out;
 }
 
-}  // namespace trelm::test
-
-namespace trelm::test {
-
 EmulatorHost::Cursor EmulatorHost::open(FacebookSource& source, int type, Vector<IQueryItems::Column> const& columns,
                                         std::vector<IQueryItems::Constraint> const& extra, std::int64_t position,
                                         uError* refusal) {
@@ -137,6 +131,21 @@ std::vector<EmulatorHost::Record> EmulatorHost::walk(IQueryItems::ICursor& curso
     }
     if (step < 0) std::reverse(rows.begin(), rows.end());
     return rows;
+}
+
+std::string EmulatorHost::text(Record const& record, char const* key) {
+    Variant const* v = record.search(key);
+    return v ? v->asString().str() : "<none>";
+}
+
+Vector<IQueryItems::Column> EmulatorHost::eventOrdering() {
+    return Vector<IQueryItems::Column>{{Metadata::Key("core_object_time", TRELM_TYPES::INT32), false},
+                                       {Metadata::Key("core_event_service", TRELM_TYPES::STRING), false},
+                                       {Metadata::Key("core_event_serviceid", TRELM_TYPES::STRING), false}};
+}
+
+IQueryItems::Constraint EmulatorHost::timeIs(IQueryItems::Constraint::Function function, Variant value) {
+    return IQueryItems::Constraint{Metadata::Key("core_object_time", TRELM_TYPES::INT32), std::move(value), function};
 }
 
 }  // namespace trelm::test

@@ -35,17 +35,15 @@ public:
     bool start(std::string& error);
 
     emu::Emulator& emulator() { return *emulator_; }
-    ComponentRegistry& registry() { return registry_; }
     RuntimeConfiguration& runtime() { return runtime_; }
 
     // The source's configuration group with the demo application, and when `session` is set a
     // fresh session of the demo user.
     Configuration::Group demoGroup(String const& name, bool session);
 
-    // Makes a source, registers it, configures it with `group` and starts it.
-    FacebookSource& addSource(Configuration::Group const& group);
-    // Makes a source and registers it, nothing more.
-    FacebookSource& addBareSource(String const& name);
+    // Makes a source named after `group` and registers it; with `configure`, configures it with
+    // `group` and starts it.
+    FacebookSource& addSource(Configuration::Group const& group, bool configure = true);
     // Registers a component the test owns; it is unregistered at destruction.
     void addComponent(String const& name, Component& component);
 
@@ -70,6 +68,12 @@ public:
     // The records from the current row on, moving by `step` until the cursor stops; in the
     // cursor's order whichever way it went.
     static std::vector<Record> walk(IQueryItems::ICursor& cursor, int step = 1);
+    // The record's `key` as text; "<none>" when it lacks the key.
+    static std::string text(Record const& record, char const* key);
+    // The ordering the event cursors serve: time, service, service id, all descending.
+    static Vector<IQueryItems::Column> eventOrdering();
+    // A constraint on "core_object_time".
+    static IQueryItems::Constraint timeIs(IQueryItems::Constraint::Function function, Variant value);
 
 private:
     std::unique_ptr<emu::Emulator> emulator_;
