@@ -7,6 +7,7 @@
 
 #include <filesystem>
 #include <fstream>
+#include <thread>
 #include <vector>
 
 #include "ComponentRegistry.h"
@@ -127,6 +128,28 @@ TEST_F(RuntimeConfigurationTest, FailedOpenLeavesNoStoreInsteadOfAFreshOne) {
     EXPECT_CODE(store_.open(""), kInvalid);
     EXPECT_OK(store_.open(":memory:"));
     EXPECT_OK(put("src", {{"a", Variant("1")}}));
+}
+
+// Without the store's lock, one thread's transaction runs into another's.
+TEST_F(RuntimeConfigurationTest, ConcurrentWritersAndReadersSeeWholeValues) {
+    std::vector<std::thread> threads;
+    std::atomic<int> failures{0};
+    for (int t = 0; t < 4; ++t) {
+        threads.emplace_back([&, t] {
+            for (int i = 0; i < 50; ++i) {
+                String const tag = String::from(t), value = String::from(i);
+                Set<Configuration::Value> const set{Configuration::Value("a", Variant(value)),
+                                                    Configuration::Value("b", Variant(value))};
+                Map<String, Variant> values{{"a", Variant()}, {"b", Variant()}};
+                if (store_.store(tag, set).failed() || store_.get(tag, values).failed() ||
+                    values.search("a")->asString() != value || values.search("b")->asString() != value) {
+                    ++failures;
+                }
+            }
+        });
+    }
+    for (auto& th : threads) th.join();
+    EXPECT_EQ(failures.load(), 0);
 }
 
 }  // namespace
