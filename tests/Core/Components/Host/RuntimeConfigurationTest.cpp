@@ -43,10 +43,6 @@ protected:
         RuntimeConfigurationMessage msg(tag, set);
         return msg.send("RuntimeConfiguration");
     }
-    uError reset(String const& tag, Set<String> keys) {
-        ResetRuntimeConfigurationMessage msg(tag, std::move(keys));
-        return msg.send("RuntimeConfiguration");
-    }
     // The values under tag for keys; "-" marks a key that stayed empty.
     std::vector<std::string> get(String const& tag, std::vector<char const*> const& keys) {
         Map<String, Variant> values;
@@ -70,8 +66,11 @@ protected:
 using Texts = std::vector<std::string>;
 
 TEST_F(RuntimeConfigurationTest, StoredValuesComeBackAsTextAndUnknownKeysStayEmpty) {
-    ASSERT_OK(put("src", {{"session", Variant("s1")}, {"empty", Variant("")}, {"count", Variant(42)},
-                          {"big", Variant(-5000000000LL)}, {"flag", Variant(true)},
+    ASSERT_OK(put("src", {{"session", Variant("s1")},
+                          {"empty", Variant("")},
+                          {"count", Variant(42)},
+                          {"big", Variant(-5000000000LL)},
+                          {"flag", Variant(true)},
                           {"bytes", Variant(String(std::string("a\0b", 3)))}}));
     EXPECT_EQ(get("src", {"session", "empty", "count", "big", "flag", "bytes", "unknown"}),
               (Texts{"s1", "", "42", "-5000000000", "true", std::string("a\0b", 3), "-"}));
@@ -85,7 +84,8 @@ TEST_F(RuntimeConfigurationTest, StoringAgainReplacesAndResetForgetsOnlyNamedKey
     ASSERT_OK(put("src", {{"a", Variant("1")}, {"b", Variant("2")}, {"c", Variant("3")}}));
     ASSERT_OK(put("other", {{"a", Variant("100")}, {"b", Variant("200")}}));
     ASSERT_OK(put("src", {{"a", Variant("one")}}));
-    ASSERT_OK(reset("src", {"b", "never-stored"}));
+    ResetRuntimeConfigurationMessage reset("src", Set<String>{"b", "never-stored"});
+    ASSERT_OK(reset.send("RuntimeConfiguration"));
     ASSERT_OK(store_.sendConfig(group));
     EXPECT_EQ(get("src", {"a", "b", "c"}), (Texts{"one", "-", "3"}));
     EXPECT_EQ(get("other", {"a", "b"}), (Texts{"100", "200"}));
@@ -130,21 +130,19 @@ TEST_F(RuntimeConfigurationTest, FailedOpenLeavesNoStoreInsteadOfAFreshOne) {
     EXPECT_OK(put("src", {{"a", Variant("1")}}));
 }
 
+// Without the store's lock, one thread's transaction runs into another's.
 TEST_F(RuntimeConfigurationTest, ConcurrentWritersAndReadersSeeWholeValues) {
-    constexpr int kThreads = 4;
-    constexpr int kRounds = 50;
     std::vector<std::thread> threads;
     std::atomic<int> failures{0};
-    for (int t = 0; t < kThreads; ++t) {
+    for (int t = 0; t < 4; ++t) {
         threads.emplace_back([&, t] {
-            String tag = String::from(t);
-            for (int i = 0; i < kRounds; ++i) {
-                Set<Configuration::Value> const set{Configuration::Value("a", Variant(String::from(i))),
-                                                    Configuration::Value("b", Variant(String::from(i)))};
-                if (store_.store(tag, set).failed()) ++failures;
+            for (int i = 0; i < 50; ++i) {
+                String const tag = String::from(t), value = String::from(i);
+                Set<Configuration::Value> const set{Configuration::Value("a", Variant(value)),
+                                                    Configuration::Value("b", Variant(value))};
                 Map<String, Variant> values{{"a", Variant()}, {"b", Variant()}};
-                if (store_.get(tag, values).failed() || values.search("a")->asString() != String::from(i) ||
-                    values.search("b")->asString() != String::from(i)) {
+                if (store_.store(tag, set).failed() || store_.get(tag, values).failed() ||
+                    values.search("a")->asString() != value || values.search("b")->asString() != value) {
                     ++failures;
                 }
             }

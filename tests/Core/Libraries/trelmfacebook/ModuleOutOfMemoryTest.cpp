@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <cstdlib>
 #include <new>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -38,9 +39,7 @@ void* operator new(std::size_t size, std::nothrow_t const&) noexcept {
         return nullptr;
     }
 }
-void* operator new[](std::size_t size, std::nothrow_t const& tag) noexcept {
-    return operator new(size, tag);
-}
+void* operator new[](std::size_t size, std::nothrow_t const& tag) noexcept { return operator new(size, tag); }
 void operator delete(void* p) noexcept { std::free(p); }
 void operator delete[](void* p) noexcept { std::free(p); }
 void operator delete(void* p, std::size_t) noexcept { std::free(p); }
@@ -57,41 +56,30 @@ namespace {
 TEST(ModuleOutOfMemoryTest, FailedInsertIsWrappedAndKeepsTheEntriesInsertedBefore) {
     ModuleHandle module(TRELMFACEBOOK_MODULE);
     ASSERT_EQ(module.error(), "");
-
-    bool sawSourceOnly = false;
-    bool succeeded = false;
-    for (long failAt = 0; failAt < 64 && !succeeded; ++failAt) {
+    // "ok" or "failed", then the table's identifiers; once for each outcome seen.
+    std::set<std::vector<std::string>> outcomes;
+    for (long failAt = 0; failAt < 64 && !outcomes.count({"ok", kConnectorId, kSourceId}); ++failAt) {
         SCOPED_TRACE("failing allocation " + std::to_string(failAt));
         ModuleHandle::Table table;
-        trelm::uError result;
-        bool threw = false;
         allocationsLeft = failAt;
         try {
-            result = module.getComponents(table);
+            trelm::uError const result = module.getComponents(table);
+            allocationsLeft = -1;
+            std::vector<std::string> outcome{result.ok() ? "ok" : "failed"};
+            for (std::string const& id : idsOf(table)) outcome.push_back(id);
+            outcomes.insert(outcome);
+            if (result.failed()) {
+                EXPECT_CODE(result, trelm::kFailure);
+                EXPECT_STREQ(result.file(), "Core/Libraries/trelmfacebook/loader");
+                ASSERT_NE(result.cause(), nullptr);
+                EXPECT_CODE(*result.cause(), trelm::kOutOfMemory);
+            }
         } catch (std::bad_alloc const&) {
-            threw = true;
-        }
-        allocationsLeft = -1;
-
-        std::vector<std::string> const ids = idsOf(table);
-        if (threw) continue;
-        if (result.ok()) {
-            succeeded = true;
-            EXPECT_EQ(ids, (std::vector<std::string>{kConnectorId, kSourceId}));
-            continue;
-        }
-        EXPECT_CODE(result, trelm::kFailure);
-        EXPECT_STREQ(result.file(), "Core/Libraries/trelmfacebook/loader");
-        ASSERT_NE(result.cause(), nullptr);
-        EXPECT_EQ(result.cause()->code(), trelm::kOutOfMemory);
-        if (ids == std::vector<std::string>{kSourceId}) {
-            sawSourceOnly = true;
-        } else {
-            EXPECT_TRUE(ids.empty()) << "the connector went in before the source";
+            allocationsLeft = -1;
         }
     }
-    EXPECT_TRUE(succeeded);
-    EXPECT_TRUE(sawSourceOnly);
+    EXPECT_EQ(outcomes,
+              (std::set<std::vector<std::string>>{{"failed"}, {"failed", kSourceId}, {"ok", kConnectorId, kSourceId}}));
 }
 
 }  // namespace

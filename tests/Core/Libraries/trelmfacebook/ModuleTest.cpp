@@ -1,5 +1,4 @@
 #include <cstdio>
-#include <memory>
 #include <set>
 #include <string>
 #include <vector>
@@ -19,46 +18,25 @@ namespace {
 
 Component* foreignFactory(String) { return nullptr; }
 
-class ModuleTest : public ::testing::Test {
-protected:
-    void SetUp() override {
-        module_ = std::make_unique<ModuleHandle>(TRELMFACEBOOK_MODULE);
-        ASSERT_EQ(module_->error(), "");
-    }
-
-    std::unique_ptr<ModuleHandle> module_;
-};
-
 // Into a table that already holds the module's identifiers (with other factories) and a foreign
 // entry, and however often it is called: the module's two factories under their identifiers, the
 // foreign entry left as it was. Into an empty table: ModuleOutOfMemoryTest's round without failure.
-TEST_F(ModuleTest, TableGetsTheSourceAndTheConnectorAndOtherEntriesStay) {
+TEST(ModuleTest, TableGetsTheSourceAndTheConnectorAndOtherEntriesStay) {
+    ModuleHandle module(TRELMFACEBOOK_MODULE);
+    ASSERT_EQ(module.error(), "");
     char const* const kOther = "@other.example:/thing";
     ModuleHandle::Table table;
     for (char const* id : {kSourceId, kConnectorId, kOther}) ASSERT_OK(table.insert(id, &foreignFactory));
-    for (int call = 0; call < 3; ++call) ASSERT_OK(module_->getComponents(table)) << "call " << call;
+    for (int call = 0; call < 3; ++call) ASSERT_OK(module.getComponents(table)) << "call " << call;
     EXPECT_EQ(idsOf(table), (std::vector<std::string>{kOther, kConnectorId, kSourceId}));
-    EXPECT_EQ(*table.search(kSourceId), module_->sourceFactory);
-    EXPECT_EQ(*table.search(kConnectorId), module_->connectorFactory);
+    EXPECT_EQ(*table.search(kSourceId), module.sourceFactory);
+    EXPECT_EQ(*table.search(kConnectorId), module.connectorFactory);
     EXPECT_EQ(*table.search(kOther), &foreignFactory);
 }
 
-// A factory filed under the wrong identifier, or an identifier that differs from the one the
-// component reports, would make the host configure one component as the other.
-TEST_F(ModuleTest, EveryFactoryMakesIndependentComponentsOfItsOwnIdentifier) {
-    ModuleHandle::Table table;
-    ASSERT_OK(module_->getComponents(table));
-    for (auto const& [id, factory] : table) {
-        std::unique_ptr<Component> first(factory("first")), second(factory("second"));
-        ASSERT_TRUE(first && second) << id;
-        EXPECT_NE(first.get(), second.get());
-        EXPECT_EQ(first->componentId() + "|" + second->componentId(), id + "|" + id);
-        EXPECT_EQ(first->name() + "|" + second->name(), "first|second");
-        EXPECT_EQ(first->state(), Component::State::Created);
-    }
-}
-
-TEST_F(ModuleTest, LoadingRegistersTheSixteenKeysWithTheirTypes) {
+TEST(ModuleTest, LoadingRegistersTheSixteenKeysWithTheirTypes) {
+    ModuleHandle module(TRELMFACEBOOK_MODULE);
+    ASSERT_EQ(module.error(), "");
     struct Expected {
         char const* name;
         TYPES type;
@@ -66,16 +44,22 @@ TEST_F(ModuleTest, LoadingRegistersTheSixteenKeysWithTheirTypes) {
     // Coordinates and the modification time are text keys on purpose; only the photo count is a
     // number.
     TYPES const text = trelm::TRELM_TYPES::STRING;
-    Expected const keys[] = {
-        {"facebook_media_owner_service_id", text},      {"facebook_media_album_service_id", text},
-        {"facebook_media_thumb_uri", text},             {"facebook_photo_tag_photo_service_id", text},
-        {"facebook_photo_tag_tagged_service_id", text}, {"facebook_photo_tag_x", text},
-        {"facebook_photo_tag_y", text},                 {"facebook_photo_tag_text", text},
-        {"facebook_album_owner_service_id", text},      {"facebook_album_modified", text},
-        {"facebook_album_location", text},              {"facebook_album_link", text},
-        {"facebook_album_notes", text},                 {"facebook_album_photocount", trelm::TRELM_TYPES::INT32},
-        {"facebook_album_cover_service_id", text},      {"facebook_album_type", text},
-    };
+    Expected const keys[] = {{"facebook_media_owner_service_id", text},
+                             {"facebook_media_album_service_id", text},
+                             {"facebook_media_thumb_uri", text},
+                             {"facebook_photo_tag_photo_service_id", text},
+                             {"facebook_photo_tag_tagged_service_id", text},
+                             {"facebook_photo_tag_x", text},
+                             {"facebook_photo_tag_y", text},
+                             {"facebook_photo_tag_text", text},
+                             {"facebook_album_owner_service_id", text},
+                             {"facebook_album_modified", text},
+                             {"facebook_album_location", text},
+                             {"facebook_album_link", text},
+                             {"facebook_album_notes", text},
+                             {"facebook_album_photocount", trelm::TRELM_TYPES::INT32},
+                             {"facebook_album_cover_service_id", text},
+                             {"facebook_album_type", text}};
     for (Expected const& key : keys) {
         TYPES type = trelm::TRELM_TYPES::NONE;
         EXPECT_OK(trelm::Metadata::getType(key.name, type)) << key.name;
@@ -98,8 +82,8 @@ TEST(ModuleExportsTest, OnlyTheThreeEntryPointsAreExported) {
         exported.insert(space == std::string::npos ? text : text.substr(space + 1));
     }
     ASSERT_EQ(pclose(pipe), 0) << command;
-    EXPECT_EQ(exported, (std::set<std::string>{"getComponents", "FacebookSource_component",
-                                               "FacebookConnector_component"}));
+    EXPECT_EQ(exported,
+              (std::set<std::string>{"getComponents", "FacebookSource_component", "FacebookConnector_component"}));
 }
 
 }  // namespace

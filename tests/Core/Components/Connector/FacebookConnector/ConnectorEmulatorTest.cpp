@@ -41,12 +41,6 @@ protected:
         ASSERT_OK(connector.makeConnection(params, false));
     }
 
-    emu::test::Row user(String const& uid, std::string const& fields) {
-        return emu::test::fqlRows(emulator->store(), emu::DemoAccount::uid,
-                                  "SELECT " + fields + " FROM user WHERE uid = " + uid.str())
-            .at(0);
-    }
-
     // In ascending order.
     Vector<String> friendIds() {
         Vector<String> ids;
@@ -80,7 +74,8 @@ TEST_F(ConnectorEmulatorTest, MakeConnectionLogsInOnceOverHttpsAndPeersAreTheDem
     EXPECT_EQ(peers, friendIds());
 }
 
-// The profile fields themselves: PeerCommandsTest.PeersListsEveryFriendWithProfileFromTwoRequests.
+// The profile fields (mapped alike for one id and for many):
+// PeerCommandsTest.PeersListsEveryFriendWithProfileFromTwoRequests.
 TEST_F(ConnectorEmulatorTest, PeerInfoComesInTheOrderOfTheIdsFromOneRequestPerCall) {
     connect();
     Vector<String> const friends = friendIds();
@@ -90,8 +85,6 @@ TEST_F(ConnectorEmulatorTest, PeerInfoComesInTheOrderOfTheIdsFromOneRequestPerCa
     Peer one;
     ASSERT_OK(connector.getPeerInfo(friends[5], one));
     ASSERT_OK(peers.pushBack(one));
-    auto row = user(friends[5], "name, profile_url");
-    EXPECT_EQ((one.fullName + "|" + one.profileUrl).str(), row["name"] + "|" + row["profile_url"]);
     ASSERT_EQ(peers.size(), 4u);
     EXPECT_EQ(peers[0].serviceId + peers[1].serviceId + peers[2].serviceId + peers[3].serviceId,
               ids[0] + ids[1] + ids[2] + ids[2]);
@@ -112,7 +105,9 @@ TEST_F(ConnectorEmulatorTest, StatusesOfFiftyFriendsComeInOneRequestWithTextAndT
     ASSERT_EQ(events.size(), 50u);
     unsigned never = 0;
     for (unsigned i = 0; i < 50; ++i) {
-        auto row = user(ids[i], "status");
+        auto row = emu::test::fqlRows(emulator->store(), emu::DemoAccount::uid,
+                                      "SELECT status FROM user WHERE uid = " + ids[i].str())
+                       .at(0);
         std::string const time = row.count("status.time") ? row["status.time"] : "0";
         EXPECT_EQ(events[i].statusText.str() + "@" + std::to_string(events[i].statusTime),
                   row["status.message"] + "@" + time)
@@ -181,8 +176,11 @@ TEST(ConnectorConfigTest, BothTimesMustReadAsIntegers) {
     struct Case {
         Variant pollTime, maxTime;
         unsigned code;
-    } const cases[] = {{300, 3600, kSuccess},      {"300", "3600", kSuccess}, {"soon", 3600, kFailure},
-                       {300, Variant(), kFailure}, {true, 3600, kFailure}};
+    } const cases[] = {{300, 3600, kSuccess},
+                       {"300", "3600", kSuccess},
+                       {"soon", 3600, kFailure},
+                       {300, Variant(), kFailure},
+                       {true, 3600, kFailure}};
     for (Case const& c : cases) {
         FacebookConnector connector("facebook-connector");
         Map<String, Variant> values{{"facebook_polltime", c.pollTime}, {"facebook_maxtime", c.maxTime}};

@@ -39,9 +39,9 @@ TEST_F(CallIdConcurrencyTest, ConcurrentCallsGetDistinctCallIdsAndMatchingSignat
     std::set<unsigned> ids;
     for (auto const& exchange : http.exchanges()) {
         unsigned id = 0;
-        ASSERT_OK(exchange.fields.search("call_id")->to(id));
+        ASSERT_OK(exchange.search("call_id")->to(id));
         ids.insert(id);
-        EXPECT_TRUE(signedWith(exchange.fields, "SS"));
+        EXPECT_TRUE(signedWith(exchange, "SS"));
     }
     ASSERT_EQ(ids.size(), static_cast<size_t>(kThreads * kCalls));
     EXPECT_EQ(*ids.begin(), 1u);

@@ -15,11 +15,26 @@ class FakeRuntimeConfiguration : public RuntimeConfiguration {
 public:
     String failing;
 
-    std::vector<String> received() const;
-    void clearReceived();
+    std::vector<String> received() const {
+        std::lock_guard<std::mutex> lock(mutex_);
+        return received_;
+    }
+    void clearReceived() {
+        std::lock_guard<std::mutex> lock(mutex_);
+        received_.clear();
+    }
 
 protected:
-    uError handleMessage(IMessage& msg) override;
+    uError handleMessage(IMessage& msg) override {
+        // The three message types of the store end alike; anything else is a broadcast for others.
+        if (msg.type().find("RuntimeConfigurationMessage") == String::npos) return TRELM_OK();
+        {
+            std::lock_guard<std::mutex> lock(mutex_);
+            received_.push_back(msg.type());
+        }
+        if (msg.type() == failing) return TRELM_ERROR(kFailure);
+        return RuntimeConfiguration::handleMessage(msg);
+    }
 
 private:
     mutable std::mutex mutex_;  // guards received_

@@ -4,15 +4,10 @@
 
 #include "ErrorAssertions.h"
 
-#include <memory>
-#include <string>
-#include <vector>
-
 #include "ComponentRegistry.h"
 #include "ConnectionInfo.h"
 #include "FakeHttpRequestFactory.h"
 #include "FakeRuntimeConfiguration.h"
-#include "RecordingComponent.h"
 #include "ServiceTransport.h"
 
 namespace trelm::test {
@@ -44,12 +39,6 @@ protected:
         ASSERT_OK(info->setSessionConfig(session, secret, user, false, false));
     }
 
-    // A component that records wipe, wake-up and status messages into `events`.
-    void addRecorder(String const& name, bool fail = false) {
-        recorders.push_back(std::make_unique<RecordingComponent>(name, events, fail));
-        ASSERT_OK(registry.add(name, recorders.back().get()));
-    }
-
     // The store's value of `key` under kTag, or "-".
     String stored(char const* key) {
         Map<String, Variant> values{{key, Variant()}};
@@ -63,15 +52,13 @@ protected:
 
     Map<String, String> lastFields() const {
         auto all = http.exchanges();
-        return all.empty() ? Map<String, String>() : all.back().fields;
+        return all.empty() ? Map<String, String>() : all.back();
     }
 
     // Declared first, so destroyed last. The destructor deactivates it.
     ComponentRegistry registry;
     FakeHttpRequestFactory http;
     FakeRuntimeConfiguration store;
-    std::shared_ptr<RecordingComponent::Log> events = std::make_shared<RecordingComponent::Log>();
-    std::vector<std::unique_ptr<RecordingComponent>> recorders;
     SmartPtr<FacebookLibrary::ConnectionInfo> info;
     SmartPtr<FacebookLibrary> lib = makeSmart<FacebookLibrary>();
 };
