@@ -174,7 +174,7 @@ TEST_F(EventCursorsTest, StreamWalksVisitEveryWantedPostOnceNewestFirstInBounded
 // query's whole ordering (service ids descending) across windows of 150.
 TEST_F(EventCursorsTest, PhotoEventsComeOnceInTheQueryOrderAcrossWindows) {
     std::vector<std::tuple<int, std::string, std::string>> order;  // time, pid, event
-    for (auto& r : host->fqlRows(kFriendPhotos, "photo")) {
+    for (auto& r : host->fql(kFriendPhotos)) {
         order.emplace_back(std::stoi(r["created"]), r["pid"],
                            event({"5", r["pid"], r["created"], r["owner"], r["caption"], r["src"], r["aid"]}));
     }

@@ -32,7 +32,7 @@ using RetrieveByGuidTest = DataOperationsIntegrationTest;
 TEST_F(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWrittenBack) {
     std::string const photo = ::testing::TempDir() + "trelm-source-photo.jpg";
     std::ofstream(photo, std::ios::binary) << std::string("\xff\xd8\xff\xe0 not really a picture", 26);
-    std::string const album = host->fqlColumn("select aid from album where owner='" + kDemoUid + "'", "album", "aid").at(0);
+    std::string const album = host->fql("select aid from album where owner='" + kDemoUid + "'").at(0)["aid"];
     std::string const status = "reading about keyset paging";
     Record const upload{{"core_object_type", Variant(9)}, {"media_uri", Variant(String("file://" + photo))}};
     struct Case {
@@ -72,7 +72,7 @@ TEST_F(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWri
             continue;
         }
         ASSERT_NE(id, nullptr);
-        auto const rows = host->fqlRows("select caption, aid from photo where pid='" + id->asString().str() + "'", "photo");
+        auto const rows = host->fql("select caption, aid from photo where pid='" + id->asString().str() + "'");
         ASSERT_EQ(rows.size(), 1u);
         EXPECT_EQ(rows[0].at("caption"), c.args["caption"]);
         if (!c.args["aid"].empty()) {
