@@ -54,16 +54,11 @@ KindCase library(char const* name, int type, PhotoLibraryCursor::Kind const& kin
 }
 
 std::vector<KindCase> kindCases() {
-    KindCase const contact{
-        "ContactsByIdText",
-        2,
-        "select uid,name,pic_big from user where " + kFriendsOfDemo,
-        {"uid"},
-        {"uid"},
-        "",
-        {{"core_contact_service_id", "uid"}, {"core_contact_name", "name"}, {"core_contact_display_name", "name"}},
-        nullptr,
-        true};
+    KindCase contact{
+        "ContactsByIdText", 2, "select uid,name,pic_big from user where " + kFriendsOfDemo, {"uid"}, {"uid"}, "", {}};
+    contact.fields = {
+        {"core_contact_service_id", "uid"}, {"core_contact_name", "name"}, {"core_contact_display_name", "name"}};
+    contact.ascending = true;
     KindCase const album = library("AlbumsNewestFirst", 11, AlbumCursor::kKind, "owner = " + kDemoUid, {"aid"},
                                    {"created", "aid"}, "modified");
     KindCase const media = library("MediaNewestFirst", 9, MediaCursor::kKind, "owner = " + kDemoUid, {"pid"},
