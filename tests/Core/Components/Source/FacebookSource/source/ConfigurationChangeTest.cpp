@@ -159,19 +159,5 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
     }
 }
 
-TEST_F(ConfigurationChangeTest, ChangesBeforeStartupFailClearlyWhenTheyNeedTheClient) {
-    FacebookSource& source = host->addSource(Configuration::Group("unstarted"), false);
-    ConfigurationChangedMessage login(Set<String>{kLogin});
-    EXPECT_CODE(source.onMessage(login), kNotSet) << "no settings yet";
-
-    Configuration::Group group = host->demoGroup("unstarted", false);
-    ASSERT_OK(group.set("haveExtendedApi", Variant(false)));
-    ASSERT_OK(source.sendConfig(group));
-    ConfigurationChangedMessage session(Set<String>{kSessionId});
-    EXPECT_CODE(source.onMessage(session), kNotSet) << "no client yet";
-    ConfigurationChangedMessage unrelated(Set<String>{"wipeComponents"});
-    EXPECT_OK(source.onMessage(unrelated));
-}
-
 }  // namespace
 }  // namespace trelm::test

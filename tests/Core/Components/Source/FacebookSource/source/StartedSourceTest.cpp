@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include "ConfigurationChangedMessage.h"
 #include "ErrorAssertions.h"
 #include "FacebookSource.h"
 #include "GetUserSidMessage.h"
@@ -226,7 +227,7 @@ TEST_F(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
     }
 }
 
-TEST(UnstartedSourceTest, OperationsBeforeStartupFailWithNotSet) {
+TEST(UnstartedSourceTest, OperationsAndChangesBeforeStartupFailWithNotSet) {
     FacebookSource source(kSourceName);
     Record status = record({{"core_object_type", 4}, {"core_event_text", "hi"}});
     EXPECT_CODE(source.insert(status), kNotSet);
@@ -234,14 +235,22 @@ TEST(UnstartedSourceTest, OperationsBeforeStartupFailWithNotSet) {
     EXPECT_CODE(source.retrieve(GUID::generate(), out, false), kNotSet);
     IServiceSource::GetUserSidMessage sid;
     EXPECT_CODE(source.onMessage(sid), kNotSet);
+    ConfigurationChangedMessage login(Set<String>{"facebook_source_login"});
+    EXPECT_CODE(source.onMessage(login), kNotSet) << "no settings yet";
     // A query gets no cursor without a client, before and after a configuration.
     IQueryItems::StartQueryMessage query(Vector<IQueryItems::Column>(), Vector<Constraint>{typeIs(2)});
     EXPECT_CODE(source.onMessage(query), kNotSet);
     // Starting without a configuration is refused too, rather than making a client without settings.
     EXPECT_CODE(source.startup(), kNotSet);
-    ASSERT_OK(source.sendConfig(Configuration::Group(kSourceName)));
+    ASSERT_OK(source.sendConfig(Configuration::Group(kSourceName, {{"facebook_source_appkey", Variant("key")},
+                                                                   {"facebook_source_appsecret", Variant("secret")},
+                                                                   {"haveExtendedApi", Variant(false)}})));
     EXPECT_CODE(source.onMessage(query), kNotSet);
     EXPECT_FALSE(query.cursor);
+    ConfigurationChangedMessage session(Set<String>{"facebook_source_session_id"});
+    EXPECT_CODE(source.onMessage(session), kNotSet) << "no client yet";
+    ConfigurationChangedMessage unrelated(Set<String>{"wipeComponents"});
+    EXPECT_OK(source.onMessage(unrelated));
 }
 
 // The dump pads every key to 30 columns; a longer key gets (length - 30) spaces instead.
