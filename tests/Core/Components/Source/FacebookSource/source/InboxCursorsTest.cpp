@@ -235,11 +235,7 @@ TEST_F(InboxCursorsTest, FriendRequestsComeOnceAcrossPagesWithKeysetStatements) 
     std::time_t const before = std::time(nullptr);
     std::vector<Record> const rows = EmulatorHost::walk(*cursor);
     std::vector<std::string> seen;
-    for (Record const& r : rows) {
-        std::string const uid = text(r, "core_event_contactid");
-        seen.push_back(uid);
-        EXPECT_EQ(text(r, "core_event_serviceid"), "FriendRequest: " + uid);
-    }
+    for (Record const& r : rows) seen.push_back(text(r, "core_event_contactid"));
     EXPECT_EQ(seen, requesters);
     unsigned count = 0;
     ASSERT_OK(cursor->numRows(count));
