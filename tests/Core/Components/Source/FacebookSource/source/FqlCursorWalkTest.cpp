@@ -246,7 +246,6 @@ TEST_P(FqlCursorWalkTest, JumpsSeeksAndCountsLandOnTheRightRowAndKnowItsIndex) {
     EXPECT_EQ(rowAt(cursor)->search("core_object_id")->asGUID(), first);
 }
 
-// A position asks once, without a row limit, for the rows changed since that time.
 TEST_P(FqlCursorWalkTest, PositionFetchesEverythingSinceThatTimeInOneStatement) {
     if (GetParam().sinceField.empty()) return;  // no unpaged mode: the dispatch refuses a position
     std::vector<std::string> times;

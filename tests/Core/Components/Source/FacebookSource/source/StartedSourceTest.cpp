@@ -205,7 +205,6 @@ TEST_F(QueryDispatchTest, CursorConstraintsAreReadOrRefusedWithExactCodes) {
     }
 }
 
-// Operations that are refused whatever the service would say.
 TEST_F(DataOperationsTest, RefusedOperationsAnswerTheirExactCodes) {
     GUID const someGuid = GUID::generate();
     Record scratch = record({{"core_object_type", 4}});
