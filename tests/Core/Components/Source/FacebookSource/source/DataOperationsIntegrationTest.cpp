@@ -114,10 +114,18 @@ TEST_F(RetrieveByGuidTest, EveryListedRecordOfEveryKindComesBackEqualWhileACurso
         SCOPED_TRACE(listings[i].name);
         EmulatorHost::Cursor cursor = EmulatorHost::open(*source, listings[i].type, listings[i].ordering);
         ASSERT_TRUE(cursor);
+        // What every record of this source carries whatever its kind.
+        Record const common{{"core_object_type", Variant(listings[i].type)},
+                            {"core_object_source", Variant("facebook")},
+                            {"core_object_origin_importcomponent", Variant("facebook")},
+                            {"core_object_origin_servicename", Variant("Facebook")},
+                            {"core_object_deleted", Variant(false)}};
         int rows = 0;
         for (int moved = 1; rows < 20 && moved != 0; ++rows) {
             SmartPtr<Record> row;
             ASSERT_OK(cursor->getRow(row));
+            for (auto const& [key, value] : common)
+                EXPECT_EQ(row->search(key) ? *row->search(key) : Variant(), value) << key;
             // The same object listed twice keeps its GUID and record.
             auto const [at, fresh] = listed.emplace(row->search("core_object_id")->asGUID(), row);
             holder[at->first] = i;
