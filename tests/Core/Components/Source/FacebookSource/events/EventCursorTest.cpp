@@ -85,31 +85,31 @@ TEST_F(EventCursorTest, StreamStartReadsBoundsAndKindsOrRefusesWithExactCode) {
         Vector<Column> ordering;
         Vector<Constraint> constraints;
         unsigned code;
-        int startTime, endTime;
-        bool status, photo;
+        int startTime = 0, endTime = 0;
+        bool status = false, photo = false;
     };
     Vector<Column> const fixed{kTime, kService, kServiceId};
+    // clang-format off
     std::vector<Case> const cases = {
-        {"no constraints asks for nothing", fixed, {}, kSuccess, 0, 0, false, false},
-        {"ordering of two entries", {kTime, kService}, {}, kInvalid, 0, 0, false, false},
-        {"time ascending", {column("core_object_time", TRELM_TYPES::INT32, true), kService, kServiceId}, {}, kInvalid,
-         0, 0, false, false},
-        {"entries after the third are free", {kTime, kService, kServiceId, column("core_event_text", TRELM_TYPES::STRING, true)},
-         {}, kSuccess, 0, 0, false, false},
-        {"greater than", fixed, {timeIs(Constraint::GreaterThan, 1000)}, kSuccess, 1001, 0, false, false},
-        {"less than", fixed, {timeIs(Constraint::LessThan, 1000)}, kSuccess, 0, 999, false, false},
-        {"equal", fixed, {timeIs(Constraint::Equal, 1000)}, kSuccess, 1000, 1000, false, false},
-        {"not equal", fixed, {timeIs(Constraint::NotEqual, 1000)}, kInvalid, 0, 0, false, false},
-        {"time that is no number", fixed, {timeIs(Constraint::LessThan, "soon")}, kInvalid, 0, 0, false, false},
+        {"no constraints asks for nothing", fixed, {}, kSuccess},
+        {"ordering of two entries", {kTime, kService}, {}, kInvalid},
+        {"time ascending", {column("core_object_time", TRELM_TYPES::INT32, true), kService, kServiceId}, {}, kInvalid},
+        {"entries after the third are free",
+         {kTime, kService, kServiceId, column("core_event_text", TRELM_TYPES::STRING, true)}, {}, kSuccess},
+        {"greater than", fixed, {timeIs(Constraint::GreaterThan, 1000)}, kSuccess, 1001, 0},
+        {"less than", fixed, {timeIs(Constraint::LessThan, 1000)}, kSuccess, 0, 999},
+        {"equal", fixed, {timeIs(Constraint::Equal, 1000)}, kSuccess, 1000, 1000},
+        {"not equal", fixed, {timeIs(Constraint::NotEqual, 1000)}, kInvalid},
+        {"time that is no number", fixed, {timeIs(Constraint::LessThan, "soon")}, kInvalid},
         {"status", fixed, {typeIs(Constraint::Equal, 4)}, kSuccess, 0, 0, true, false},
         {"photos", fixed, {typeIs(Constraint::Equal, 5)}, kSuccess, 0, 0, false, true},
-        {"both and an unknown kind", fixed, {typeIs(Constraint::InList, Vector<int>{9, 5, 4})}, kSuccess, 0, 0, true, true},
-        {"a kind the stream lacks", fixed, {typeIs(Constraint::Equal, 2)}, kNotSupported, 0, 0, false, false},
-        {"other comparison on the kind is passed over", fixed, {typeIs(Constraint::GreaterThan, 4)}, kSuccess, 0, 0,
-         false, false},
-        {"another key", fixed, {where("core_event_text", TRELM_TYPES::STRING, "x", Constraint::Equal)}, kInvalid, 0, 0,
-         false, false},
+        {"both and an unknown kind", fixed, {typeIs(Constraint::InList, Vector<int>{9, 5, 4})}, kSuccess, 0, 0, true,
+         true},
+        {"a kind the stream lacks", fixed, {typeIs(Constraint::Equal, 2)}, kNotSupported},
+        {"other comparison on the kind is passed over", fixed, {typeIs(Constraint::GreaterThan, 4)}, kSuccess},
+        {"another key", fixed, {where("core_event_text", TRELM_TYPES::STRING, "x", Constraint::Equal)}, kInvalid},
     };
+    // clang-format on
     for (Case const& c : cases) {
         SCOPED_TRACE(c.name);
         SmartPtr<FStreamCursor> cursor = stream(c.constraints, c.ordering);

@@ -4,7 +4,6 @@
 
 #include <cstdio>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <utility>
 #include <vector>
@@ -29,34 +28,24 @@ constexpr char const* kSessionUser = "facebook_source_session_user";
 constexpr char const* kLastUser = "facebook_source_lastuser";
 
 // Notes the account messages it receives, in arrival order: "status:<code in hex>:<user>",
-// "wipe" and "wakeup".
+// "wipe" and "wakeup". They are delivered on the sender's thread: the test's.
 class RecordingListener : public Component {
 public:
     RecordingListener() : Component("observer", "observer") {}
-
-    // The messages noted since the last call.
-    std::vector<std::string> take() {
-        std::lock_guard<std::mutex> lock(mutex_);
-        return std::exchange(events_, {});
-    }
+    std::vector<std::string> events;
 
 protected:
     uError handleMessage(IMessage& msg) override {
-        std::string event = msg.type() == WipeMessage::kType ? "wipe" : msg.type() == WakeupMessage::kType ? "wakeup" : "";
+        if (msg.type() == WipeMessage::kType) events.push_back("wipe");
+        if (msg.type() == WakeupMessage::kType) events.push_back("wakeup");
         if (msg.type() == ILoginStatus::LoginStatusMessage::kType) {
             auto& status = static_cast<ILoginStatus::LoginStatusMessage&>(msg);
             char code[16];
             std::snprintf(code, sizeof code, "%x", status.status);
-            event = std::string("status:") + code + ":" + status.userId.str();
+            events.push_back(std::string("status:") + code + ":" + status.userId.str());
         }
-        std::lock_guard<std::mutex> lock(mutex_);
-        if (!event.empty()) events_.push_back(event);
         return TRELM_OK();
     }
-
-private:
-    std::mutex mutex_;  // guards events_
-    std::vector<std::string> events_;
 };
 
 using Cursor = EmulatorHost::Cursor;
@@ -89,46 +78,39 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
         std::vector<char const*> changed;
         std::vector<std::string> events;
         int logins;              // auth.login requests
-        unsigned userCode;       // of "IServiceSource::GetUserSidMessage"
-        unsigned queryCode;      // of the first getRow of a contact query
+        unsigned code;           // of "IServiceSource::GetUserSidMessage" and a contact query's first row
     };
     std::string const email = emu::DemoAccount::email;
     std::string const password = emu::DemoAccount::password;
+    // clang-format off
     std::vector<Case> const cases = {
         {"login and password given sign in", true, false, false,
-         {{kLogin, email}, {kPassword, password}}, {kLogin, kPassword},
-         {kSignedIn}, 1, kSuccess, kSuccess},
+         {{kLogin, email}, {kPassword, password}}, {kLogin, kPassword}, {kSignedIn}, 1, kSuccess},
         {"another user than the last one wipes and wakes", true, false, false,
          {{kLogin, email}, {kPassword, password}, {kLastUser, "42"}}, {kPassword},
-         {"wipe", "wakeup", kSignedIn}, 1, kSuccess, kSuccess},
+         {"wipe", "wakeup", kSignedIn}, 1, kSuccess},
         {"login and password both emptied reset the account", true, true, true,
-         {{kLogin, ""}, {kPassword, ""}}, {kLogin, kPassword},
-         {"wipe", kSignedOut}, 0, kNotSignedIn, kNotSignedIn},
+         {{kLogin, ""}, {kPassword, ""}}, {kLogin, kPassword}, {"wipe", kSignedOut}, 0, kNotSignedIn},
         {"only the password emptied signs in again", true, true, false,
-         {{kPassword, ""}}, {kPassword},
-         {kSignedOut}, 1, kNotSignedIn, kNotSignedIn},
+         {{kPassword, ""}}, {kPassword}, {kSignedOut}, 1, kNotSignedIn},
         {"a new application key drops the session without signing in", true, true, true,
-         {{kAppKey, "another-key"}}, {kAppKey},
-         {}, 0, kNotSignedIn, kNotSignedIn},
+         {{kAppKey, "another-key"}}, {kAppKey}, {}, 0, kNotSignedIn},
         {"login keys are ignored without the extended api", false, false, true,
-         {{kLogin, email}, {kPassword, password}}, {kLogin, kPassword},
-         {}, 0, kSuccess, kSuccess},
+         {{kLogin, email}, {kPassword, password}}, {kLogin, kPassword}, {}, 0, kSuccess},
         {"session keys apply a session without the extended api", false, false, false,
          {{kSessionId, "$session"}, {kSessionSecret, "$secret"}, {kSessionUser, kDemoUid}}, {kSessionId},
-         {kSignedIn}, 0, kSuccess, kSuccess},
+         {kSignedIn}, 0, kSuccess},
         {"one empty session key resets the account", false, false, true,
          {{kSessionId, ""}, {kSessionSecret, "x"}, {kSessionUser, kDemoUid}}, {kSessionSecret},
-         {"wipe", kSignedOut}, 0, kNotSignedIn, kNotSignedIn},
+         {"wipe", kSignedOut}, 0, kNotSignedIn},
         {"a session key missing from the store changes nothing", false, false, true,
-         {{kSessionId, "$session"}, {kSessionSecret, "$secret"}}, {kSessionId, kSessionUser},
-         {}, 0, kSuccess, kSuccess},
+         {{kSessionId, "$session"}, {kSessionSecret, "$secret"}}, {kSessionId, kSessionUser}, {}, 0, kSuccess},
         {"session keys are ignored with the extended api", true, false, true,
-         {{kSessionId, ""}, {kSessionSecret, ""}, {kSessionUser, ""}}, {kSessionId},
-         {}, 0, kSuccess, kSuccess},
+         {{kSessionId, ""}, {kSessionSecret, ""}, {kSessionUser, ""}}, {kSessionId}, {}, 0, kSuccess},
         {"a change of other keys does nothing", true, true, true,
-         {{kLogin, ""}, {kPassword, ""}}, {"wipeComponents"},
-         {}, 0, kSuccess, kSuccess},
+         {{kLogin, ""}, {kPassword, ""}}, {"wipeComponents"}, {}, 0, kSuccess},
     };
+    // clang-format on
 
     int n = 0;
     for (Case const& c : cases) {
@@ -151,45 +133,30 @@ TEST_F(ConfigurationChangeTest, ChangedKeysSignInApplySessionsOrResetAsConfigure
             ASSERT_OK(values.insert(Configuration::Value(key, Variant(String(text)))));
         }
         ASSERT_OK(host->runtime().store(name, values));
-        observer->take();
+        observer->events.clear();
         host->emulator().log().clear();
 
         Set<String> changed;
         for (char const* key : c.changed) ASSERT_OK(changed.insert(key));
         ConfigurationChangedMessage msg(changed);
-        uError err = source.onMessage(msg);
-        EXPECT_OK(err);
+        EXPECT_OK(source.onMessage(msg));
 
-        EXPECT_EQ(observer->take(), c.events);
+        EXPECT_EQ(observer->events, c.events);
         auto logins = host->emulator().log().entriesFor("auth.login");
         EXPECT_EQ(logins.size(), size_t(c.logins));
         for (auto const& login : logins) EXPECT_TRUE(login.https);
 
         IServiceSource::GetUserSidMessage sid;
-        EXPECT_CODE(source.onMessage(sid), c.userCode);
-        if (c.userCode == kSuccess) {
+        EXPECT_CODE(source.onMessage(sid), c.code);
+        if (c.code == kSuccess) {
             EXPECT_EQ(sid.result.str(), kDemoUid);
         }
 
         Cursor cursor = EmulatorHost::open(source, 2);
         ASSERT_TRUE(cursor);
         SmartPtr<Map<String, Variant>> row;
-        EXPECT_CODE(cursor->getRow(row), c.queryCode);
+        EXPECT_CODE(cursor->getRow(row), c.code);
     }
-}
-
-TEST_F(ConfigurationChangeTest, ChangesBeforeStartupFailClearlyWhenTheyNeedTheClient) {
-    FacebookSource& source = host->addSource(Configuration::Group("unstarted"), false);
-    ConfigurationChangedMessage login(Set<String>{kLogin});
-    EXPECT_CODE(source.onMessage(login), kNotSet) << "no settings yet";
-
-    Configuration::Group group = host->demoGroup("unstarted", false);
-    ASSERT_OK(group.set("haveExtendedApi", Variant(false)));
-    ASSERT_OK(source.sendConfig(group));
-    ConfigurationChangedMessage session(Set<String>{kSessionId});
-    EXPECT_CODE(source.onMessage(session), kNotSet) << "no client yet";
-    ConfigurationChangedMessage unrelated(Set<String>{"wipeComponents"});
-    EXPECT_OK(source.onMessage(unrelated));
 }
 
 }  // namespace

@@ -32,7 +32,7 @@ using RetrieveByGuidTest = DataOperationsIntegrationTest;
 TEST_F(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWrittenBack) {
     std::string const photo = ::testing::TempDir() + "trelm-source-photo.jpg";
     std::ofstream(photo, std::ios::binary) << std::string("\xff\xd8\xff\xe0 not really a picture", 26);
-    std::string const album = host->fqlColumn("select aid from album where owner='" + kDemoUid + "'", "album", "aid").at(0);
+    std::string const album = host->fql("select aid from album where owner='" + kDemoUid + "'").at(0)["aid"];
     std::string const status = "reading about keyset paging";
     Record const upload{{"core_object_type", Variant(9)}, {"media_uri", Variant(String("file://" + photo))}};
     struct Case {
@@ -72,7 +72,7 @@ TEST_F(DataOperationsIntegrationTest, InsertedItemsArePublishedAndNewPhotoIdsWri
             continue;
         }
         ASSERT_NE(id, nullptr);
-        auto const rows = host->fqlRows("select caption, aid from photo where pid='" + id->asString().str() + "'", "photo");
+        auto const rows = host->fql("select caption, aid from photo where pid='" + id->asString().str() + "'");
         ASSERT_EQ(rows.size(), 1u);
         EXPECT_EQ(rows[0].at("caption"), c.args["caption"]);
         if (!c.args["aid"].empty()) {
@@ -114,10 +114,18 @@ TEST_F(RetrieveByGuidTest, EveryListedRecordOfEveryKindComesBackEqualWhileACurso
         SCOPED_TRACE(listings[i].name);
         EmulatorHost::Cursor cursor = EmulatorHost::open(*source, listings[i].type, listings[i].ordering);
         ASSERT_TRUE(cursor);
+        // What every record of this source carries whatever its kind.
+        Record const common{{"core_object_type", Variant(listings[i].type)},
+                            {"core_object_source", Variant("facebook")},
+                            {"core_object_origin_importcomponent", Variant("facebook")},
+                            {"core_object_origin_servicename", Variant("Facebook")},
+                            {"core_object_deleted", Variant(false)}};
         int rows = 0;
         for (int moved = 1; rows < 20 && moved != 0; ++rows) {
             SmartPtr<Record> row;
             ASSERT_OK(cursor->getRow(row));
+            for (auto const& [key, value] : common)
+                EXPECT_EQ(row->search(key) ? *row->search(key) : Variant(), value) << key;
             // The same object listed twice keeps its GUID and record.
             auto const [at, fresh] = listed.emplace(row->search("core_object_id")->asGUID(), row);
             holder[at->first] = i;

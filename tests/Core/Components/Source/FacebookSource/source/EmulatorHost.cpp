@@ -74,26 +74,6 @@ SmartPtr<FacebookLibrary> EmulatorHost::demoClient() {
     return lib;
 }
 
-std::vector<std::map<std::string, std::string>> EmulatorHost::fqlRows(std::string const& query,
-                                                                      std::string const& table) {
-    Vector<Map<String, String>> rows;
-    unsigned count = 0;
-    EXPECT_OK(demoClient()->runFqlQuery(String(query), String(table), rows, 0, count)) << query;
-    std::vector<std::map<std::string, std::string>> out;
-    for (auto const& row : rows) {
-        auto& r = out.emplace_back();
-        for (auto const& [k, v] : row) r[k.str()] = v.str();
-    }
-    return out;
-}
-
-std::vector<std::string> EmulatorHost::fqlColumn(std::string const& query, std::string const& table,
-                                                 std::string const& field) {
-    std::vector<std::string> out;
-    for (auto& row : fqlRows(query, table)) out.push_back(row[field]);
-    return out;
-}
-
 std::vector<std::string> EmulatorHost::fqlStatements() {
     std::vector<std::string> out;
     for (emu::LoggedRequest const& r : emulator_->log().entriesFor("fql.query")) out.push_back(r.fql);
@@ -101,19 +81,13 @@ std::vector<std::string> EmulatorHost::fqlStatements() {
 }
 
 EmulatorHost::Cursor EmulatorHost::open(FacebookSource& source, int type, Vector<IQueryItems::Column> const& columns,
-                                        std::vector<IQueryItems::Constraint> const& extra, std::int64_t position,
-                                        uError* refusal) {
+                                        std::vector<IQueryItems::Constraint> const& extra, std::int64_t position) {
     Vector<IQueryItems::Constraint> constraints{IQueryItems::Constraint{
         Metadata::Key("core_object_type", TRELM_TYPES::INT32), Variant(type), IQueryItems::Constraint::Equal}};
     for (auto const& c : extra) EXPECT_OK(constraints.pushBack(c));
     IQueryItems::StartQueryMessage msg(columns, constraints, position);
     msg.interactive = position == -1;
-    uError err = source.onMessage(msg);
-    if (refusal != nullptr) {
-        *refusal = err;
-    } else {
-        EXPECT_OK(err);
-    }
+    EXPECT_OK(source.onMessage(msg));
     return msg.cursor;
 }
 
@@ -142,10 +116,6 @@ Vector<IQueryItems::Column> EmulatorHost::eventOrdering() {
     return Vector<IQueryItems::Column>{{Metadata::Key("core_object_time", TRELM_TYPES::INT32), false},
                                        {Metadata::Key("core_event_service", TRELM_TYPES::STRING), false},
                                        {Metadata::Key("core_event_serviceid", TRELM_TYPES::STRING), false}};
-}
-
-IQueryItems::Constraint EmulatorHost::timeIs(IQueryItems::Constraint::Function function, Variant value) {
-    return IQueryItems::Constraint{Metadata::Key("core_object_time", TRELM_TYPES::INT32), std::move(value), function};
 }
 
 }  // namespace trelm::test

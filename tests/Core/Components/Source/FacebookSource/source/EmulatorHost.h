@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstdint>
-#include <map>
 #include <memory>
 #include <string>
 #include <vector>
@@ -9,8 +8,9 @@
 #include <gtest/gtest.h>
 
 #include "ComponentRegistry.h"
-#include "FacebookLibrary.h"
 #include "Emulator.h"
+#include "EmulatorRows.h"
+#include "FacebookLibrary.h"
 #include "FacebookSource.h"
 #include "HttpRequestFactory.h"
 #include "IQueryItems.h"
@@ -47,24 +47,21 @@ public:
     // Registers a component the test owns; it is unregistered at destruction.
     void addComponent(String const& name, Component& component);
 
-    // A client of its own, signed in with a fresh session of the demo user, for reading what the
-    // service holds independently of the source.
+    // A client of its own, signed in with a fresh session of the demo user.
     SmartPtr<FacebookLibrary> demoClient();
-    // Runs one statement with demoClient(); every row's fields as text, in answer order.
-    std::vector<std::map<std::string, std::string>> fqlRows(std::string const& query, std::string const& table);
-    // The rows' `field` values in answer order.
-    std::vector<std::string> fqlColumn(std::string const& query, std::string const& table, std::string const& field);
+    // What the service holds: one statement run as the demo user on the emulator's store.
+    std::vector<emu::test::Row> fql(std::string const& query) {
+        return emu::test::fqlRows(emulator_->store(), emu::DemoAccount::uid, query);
+    }
 
     // The FQL statements the emulator answered since the log was last cleared, in order.
     std::vector<std::string> fqlStatements();
 
     using Cursor = SmartPtr<IQueryItems::ICursor>;
     using Record = Map<String, Variant>;
-    // Starts a query for object `type` (plus `extra` constraints) on `source` as a host would; the
-    // cursor, or null when the query was refused with `*refusal` (which must then be given).
+    // Starts a query for object `type` (plus `extra` constraints) on `source` as a host would.
     static Cursor open(FacebookSource& source, int type, Vector<IQueryItems::Column> const& columns = {},
-                       std::vector<IQueryItems::Constraint> const& extra = {}, std::int64_t position = -1,
-                       uError* refusal = nullptr);
+                       std::vector<IQueryItems::Constraint> const& extra = {}, std::int64_t position = -1);
     // The records from the current row on, moving by `step` until the cursor stops; in the
     // cursor's order whichever way it went.
     static std::vector<Record> walk(IQueryItems::ICursor& cursor, int step = 1);
@@ -72,8 +69,6 @@ public:
     static std::string text(Record const& record, char const* key);
     // The ordering the event cursors serve: time, service, service id, all descending.
     static Vector<IQueryItems::Column> eventOrdering();
-    // A constraint on "core_object_time".
-    static IQueryItems::Constraint timeIs(IQueryItems::Constraint::Function function, Variant value);
 
 private:
     std::unique_ptr<emu::Emulator> emulator_;

@@ -34,8 +34,7 @@ std::string const kFriendsOfDemo = "uid in (select uid2 from friend where uid1='
 struct KindCase {
     char const* name;
     int type;
-    std::string select;                    // the kind's default rows with every field, from `table`
-    std::string table;
+    std::string select;                    // the kind's default rows with every field
     std::vector<std::string> identity;     // row fields that identify a row
     std::vector<std::string> orderFields;  // row fields whose blank-joined text is the order
     std::string sinceField;                // the row field a position compares; empty: no unpaged mode
@@ -48,16 +47,18 @@ void PrintTo(KindCase const& c, std::ostream* os) { *os << c.name; }
 
 KindCase library(char const* name, int type, PhotoLibraryCursor::Kind const& kind, std::string const& where,
                  std::vector<std::string> identity, std::vector<std::string> order, char const* since) {
-    KindCase c{name, type, "select " + std::string(kind.fields) + " from " + kind.table + " where " + where,
-               kind.table, identity, order, since, {}};
+    std::string const select = "select " + std::string(kind.fields) + " from " + kind.table + " where " + where;
+    KindCase c{name, type, select, identity, order, since, {}};
     for (PhotoLibraryCursor::FieldMapping const& m : kind.fieldMap) c.fields.emplace_back(m.recordKey, m.rowField);
     return c;
 }
 
 std::vector<KindCase> kindCases() {
-    KindCase const contact{"ContactsByIdText", 2, "select uid,name,pic_big from user where " + kFriendsOfDemo, "user",
-                           {"uid"}, {"uid"}, "", {{"core_contact_service_id", "uid"}, {"core_contact_name", "name"},
-                           {"core_contact_display_name", "name"}}, nullptr, true};
+    KindCase contact{
+        "ContactsByIdText", 2, "select uid,name,pic_big from user where " + kFriendsOfDemo, {"uid"}, {"uid"}, "", {}};
+    contact.fields = {
+        {"core_contact_service_id", "uid"}, {"core_contact_name", "name"}, {"core_contact_display_name", "name"}};
+    contact.ascending = true;
     KindCase const album = library("AlbumsNewestFirst", 11, AlbumCursor::kKind, "owner = " + kDemoUid, {"aid"},
                                    {"created", "aid"}, "modified");
     KindCase const media = library("MediaNewestFirst", 9, MediaCursor::kKind, "owner = " + kDemoUid, {"pid"},
@@ -111,7 +112,7 @@ protected:
             ASSERT_TRUE(host->start(error)) << error;
             source = &host->addSource(host->demoGroup("facebook", true));
         }
-        rows_ = host->fqlRows(c.select, c.table);
+        rows_ = host->fql(c.select);
         std::sort(rows_.begin(), rows_.end(), [&](Row const& a, Row const& b) {
             return c.ascending ? joined(a, c.orderFields) < joined(b, c.orderFields)
                                : joined(a, c.orderFields) > joined(b, c.orderFields);
@@ -245,7 +246,6 @@ TEST_P(FqlCursorWalkTest, JumpsSeeksAndCountsLandOnTheRightRowAndKnowItsIndex) {
     EXPECT_EQ(rowAt(cursor)->search("core_object_id")->asGUID(), first);
 }
 
-// A position asks once, without a row limit, for the rows changed since that time.
 TEST_P(FqlCursorWalkTest, PositionFetchesEverythingSinceThatTimeInOneStatement) {
     if (GetParam().sinceField.empty()) return;  // no unpaged mode: the dispatch refuses a position
     std::vector<std::string> times;
@@ -268,12 +268,13 @@ TEST_P(FqlCursorWalkTest, PositionFetchesEverythingSinceThatTimeInOneStatement) 
 
     std::vector<std::string> const statements = host->fqlStatements();
     ASSERT_EQ(statements.size(), 1u);
-    EXPECT_EQ(statements[0].find("limit"), std::string::npos) << statements[0];
+    EXPECT_EQ(lower(statements[0]).find("limit"), std::string::npos) << statements[0];
     EXPECT_NE(statements[0].find(" and " + GetParam().sinceField + " >= " + since + " ORDER BY "), std::string::npos)
         << statements[0];
 }
 
-// Every answer field under its key by the key's type, the source's identity, and a copy each time.
+// Every answer field under its key by the key's type, and a copy each time (the fields every
+// record of the source carries are checked for every kind by the retrieval test).
 TEST_P(FqlCursorWalkTest, RecordsCarryEveryAnswerFieldUnderItsKeyByItsType) {
     Cursor cursor = open();
     SmartPtr<Map<String, Variant>> record = rowAt(cursor);
@@ -288,37 +289,18 @@ TEST_P(FqlCursorWalkTest, RecordsCarryEveryAnswerFieldUnderItsKeyByItsType) {
         bool const counted = key == "facebook_album_photocount" || key == "core_object_time";
         EXPECT_EQ(got->type(), counted ? Variant::Int32 : Variant::String) << key;
     }
-    for (auto const& [key, value] :
-         std::vector<std::pair<char const*, Variant>>{{"core_object_type", Variant(GetParam().type)},
-                                                      {"core_object_source", Variant("facebook")},
-                                                      {"core_object_origin_importcomponent", Variant("facebook")},
-                                                      {"core_object_origin_servicename", Variant("Facebook")},
-                                                      {"core_object_deleted", Variant(false)}}) {
-        ASSERT_NE(record->search(key), nullptr) << key;
-        EXPECT_EQ(*record->search(key), value) << key;
-    }
     ASSERT_OK(record->insert("core_object_type", Variant(77)));
     EXPECT_EQ(*rowAt(cursor)->search("core_object_type"), Variant(GetParam().type)) << "each getRow hands out a copy";
 }
 
-INSTANTIATE_TEST_SUITE_P(Kinds, FqlCursorWalkTest, ::testing::ValuesIn(kindCases()),
-                         [](auto const& info) { return std::string(info.param.name); });
-
-// Friends named by id: the first page is short, so it tells the count and holds the whole result.
-class ContactCursorTest : public EmulatorSuite {
-protected:
-    static void SetUpTestSuite() { startSuite(); }
-};
-
-TEST_F(ContactCursorTest, ShortFirstPageGivesTheCountAndRepeatedJumpsAskNothing) {
-    std::vector<std::string> e =
-        host->fqlColumn("select uid2 from friend where uid1='" + kDemoUid + "'", "friend", "uid2");
-    std::sort(e.begin(), e.end());
-    host->emulator().log().clear();
-    Cursor cursor = EmulatorHost::open(
-        *source, 2, {},
-        {Constraint{Metadata::Key("core_contact_service_id", TRELM_TYPES::STRING),
-                    Variant(Vector<String>{String(e[20]), String(e[5]), String(e[10])}), Constraint::InList}});
+// Contacts named by id: the first page is short, so it tells the count and holds the whole result.
+TEST_P(FqlCursorWalkTest, ContactsByIdAreOneShortPageThatGivesTheCountWithoutAsking) {
+    if (GetParam().type != 2) return;  // only contacts are asked for by a list of ids
+    std::string const a = rows_[20].at("uid"), b = rows_[5].at("uid"), c = rows_[10].at("uid");
+    Cursor cursor =
+        EmulatorHost::open(*source, 2, {},
+                           {Constraint{Metadata::Key("core_contact_service_id", TRELM_TYPES::STRING),
+                                       Variant(Vector<String>{String(a), String(b), String(c)}), Constraint::InList}});
     ASSERT_OK(cursor->jumpBeginning());
     ASSERT_OK(cursor->jumpBeginning());
     unsigned count = 0;
@@ -327,13 +309,14 @@ TEST_F(ContactCursorTest, ShortFirstPageGivesTheCountAndRepeatedJumpsAskNothing)
     int moved = 0;
     EXPECT_CODE(cursor->seek(10, moved), kSuccess);  // the window holds the whole result
     EXPECT_EQ(moved, 2);
-    SmartPtr<Map<String, Variant>> row;
-    ASSERT_OK(cursor->getRow(row));
-    EXPECT_EQ(row->search("core_contact_service_id")->asString().str(), e[20]);
+    EXPECT_EQ(identity(*rowAt(cursor)), a);
     EXPECT_EQ(host->fqlStatements(),
-              std::vector<std::string>{"select uid,name,pic_big from user where uid in (" + e[20] + "," + e[5] + "," +
-                                       e[10] + ") order by concat(uid,' ') asc limit 150"});
+              std::vector<std::string>{"select uid,name,pic_big from user where uid in (" + a + "," + b + "," + c +
+                                       ") order by concat(uid,' ') asc limit 150"});
 }
+
+INSTANTIATE_TEST_SUITE_P(Kinds, FqlCursorWalkTest, ::testing::ValuesIn(kindCases()),
+                         [](auto const& info) { return std::string(info.param.name); });
 
 }  // namespace
 }  // namespace trelm::test

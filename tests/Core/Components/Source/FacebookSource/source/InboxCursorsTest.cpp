@@ -54,17 +54,16 @@ protected:
         startSuite({.users = 600, .demoFriends = 50, .friendsPerUser = 2, .albumsPerUser = 0, .postsPerUser = 0,
                     .threadsPerUser = 45, .messagesPerThread = 60, .friendRequests = 200});
 
+        std::string const inbox = "thread_id in (select thread_id from thread where folder_id = 0)";
         std::map<std::string, Thread> byId;
-        for (Row& r : host->fqlRows("select thread_id, updated_time from thread where folder_id = 0", "thread"))
+        for (Row& r : host->fql("select thread_id, updated_time from thread where folder_id = 0"))
             byId[r["thread_id"]] = Thread{r["thread_id"], std::stoi(r["updated_time"]), {}};
-        for (Row& r : host->fqlRows("select message_id, thread_id, author_id, body, created_time from message where "
-                          "thread_id in (select thread_id from thread where folder_id = 0)",
-                          "message")) {
+        for (Row& r :
+             host->fql("select message_id, thread_id, author_id, body, created_time from message where " + inbox)) {
             std::string const& mid = r["message_id"];
-            byId.at(r["thread_id"]).messages.push_back(Message{std::stoi(r["created_time"]),
-                                                               std::stoi(mid.substr(mid.find('_') + 1)), mid,
-                                                               r["thread_id"], r["author_id"], r["body"]});
-            names[r["author_id"]];
+            byId.at(r["thread_id"])
+                .messages.push_back(Message{std::stoi(r["created_time"]), std::stoi(mid.substr(mid.find('_') + 1)), mid,
+                                            r["thread_id"], r["author_id"], r["body"]});
         }
         for (auto& [id, t] : byId) {
             std::sort(t.messages.rbegin(), t.messages.rend(),
@@ -74,11 +73,10 @@ protected:
         std::sort(threads.begin(), threads.end(), [](Thread const& a, Thread const& b) {
             return std::make_tuple(b.updated, std::stoll(b.tid)) < std::make_tuple(a.updated, std::stoll(a.tid));
         });
-        std::string uids;
-        for (auto const& [uid, name] : names) uids += (uids.empty() ? "" : ",") + uid;
-        for (Row& r : host->fqlRows("select uid, name from user where uid in (" + uids + ")", "user")) names[r["uid"]] = r["name"];
-
-        requesters = host->fqlColumn(kRequestBase, "friend_info", "uid_from");
+        for (Row& r :
+             host->fql("select uid, name from user where uid in (select author_id from message where " + inbox + ")"))
+            names[r["uid"]] = r["name"];
+        for (Row& r : host->fql(kRequestBase)) requesters.push_back(r["uid_from"]);
         std::sort(requesters.begin(), requesters.end(), [](auto const& a, auto const& b) { return a + " " < b + " "; });
     }
 
@@ -160,7 +158,8 @@ TEST_F(InboxCursorsTest, MessagesComeOnceNewestFirstAndATimeBoundStopsReadingAtT
         host->emulator().log().clear();
         std::vector<Constraint> bound;
         if (c.time != 0) {
-            bound.push_back(EmulatorHost::timeIs(c.exclusive ? Constraint::GreaterThan : Constraint::GreaterOrEqual, c.time));
+            bound.push_back({Metadata::Key("core_object_time", TRELM_TYPES::INT32), Variant(c.time),
+                             c.exclusive ? Constraint::GreaterThan : Constraint::GreaterOrEqual});
         }
         Cursor cursor = EmulatorHost::open(*source, 10, kMessageOrder, bound);
         std::vector<Record> const rows = EmulatorHost::walk(*cursor);
@@ -185,7 +184,7 @@ TEST_F(InboxCursorsTest, MessagesComeOnceNewestFirstAndATimeBoundStopsReadingAtT
     EXPECT_NE(expectedMessages(middle, false).size(), expectedMessages(middle, true).size());
 }
 
-TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndTheSourceFieldsAndMoveForwardOnly) {
+TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndMoveForwardOnly) {
     Cursor cursor = EmulatorHost::open(*source, 10, kMessageOrder);
     host->emulator().log().clear();
     std::vector<std::string> const all = expectedMessages(0, false);
@@ -197,12 +196,7 @@ TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndTheSourceFieldsAndMoveF
         return row ? text(*row, key) : "";
     };
     EXPECT_EQ(at("core_event_subject"), "Subject " + idOf(0).substr(0, idOf(0).find('-')));
-    for (auto const& [key, value] : std::map<std::string, std::string>{
-             {"core_object_type", "10"}, {"core_event_service", "Facebook"}, {"core_object_source", "facebook"},
-             {"core_object_origin_importcomponent", "facebook"}, {"core_object_origin_servicename", "Facebook"},
-             {"core_object_deleted", "false"}}) {
-        EXPECT_EQ(at(key.c_str()), value) << key;
-    }
+    EXPECT_EQ(at("core_event_service"), "Facebook");
 
     int moved = 0;
     unsigned index = 0;
@@ -236,11 +230,7 @@ TEST_F(InboxCursorsTest, FriendRequestsComeOnceAcrossPagesWithKeysetStatements) 
     std::time_t const before = std::time(nullptr);
     std::vector<Record> const rows = EmulatorHost::walk(*cursor);
     std::vector<std::string> seen;
-    for (Record const& r : rows) {
-        std::string const uid = text(r, "core_event_contactid");
-        seen.push_back(uid);
-        EXPECT_EQ(text(r, "core_event_serviceid"), "FriendRequest: " + uid);
-    }
+    for (Record const& r : rows) seen.push_back(text(r, "core_event_contactid"));
     EXPECT_EQ(seen, requesters);
     unsigned count = 0;
     ASSERT_OK(cursor->numRows(count));

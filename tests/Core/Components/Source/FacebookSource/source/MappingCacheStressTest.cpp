@@ -43,32 +43,32 @@ TEST(MappingCacheStressTest, CursorsOnSeveralThreadsKeepCountsAndGuidsConsistent
 
     std::atomic<int> failures{0};
     std::atomic<bool> done{false};
-    auto fail = [&](char const* what, uError const& err) {
-        ADD_FAILURE() << what << ": " << err;
-        ++failures;
+    // Fails the test and stops every cursor on a failed operation.
+    auto ok = [&](char const* what, uError const& err) {
+        EXPECT_OK(err) << what;
+        if (err.failed()) ++failures;
+        return err.ok();
     };
 
     auto cursor = [&](unsigned seed) {
         std::mt19937 rng(seed);
         for (int c = 0; c < kCursorsPerThread && failures == 0; ++c) {
             String tag;
-            if (uError e = cache.getTag(tag); e.failed()) return fail("getTag", e);
+            if (!ok("getTag", cache.getTag(tag))) return;
             for (int page = 0; page < kPagesPerCursor; ++page) {
                 // A refill releases the previous page's records, as the FQL cursors do.
-                if (uError e = cache.clearItems(tag); e.failed()) return fail("clearItems", e);
+                if (!ok("clearItems", cache.clearItems(tag))) return;
                 for (int row = 0; row < kRowsPerPage; ++row) {
                     int const id = static_cast<int>(rng() % kIdSpace);
                     GUID g;
-                    if (uError e = cache.getGuid(tag, Cache::SidMapKey(kKey, String::from(id)), true, g); e.failed()) {
-                        return fail("getGuid", e);
-                    }
+                    if (!ok("getGuid", cache.getGuid(tag, Cache::SidMapKey(kKey, String::from(id)), true, g))) return;
                     if (id < kPinned && g != pinned[id]) {
                         ++failures;
                         ADD_FAILURE() << "pinned id " << id << " got another GUID";
                     }
                     auto record = makeSmart<Record>(
                         Record{{"core_object_id", Variant(g)}, {"sid", Variant(String::from(id))}});
-                    if (uError e = cache.setItem(tag, kKey, record); e.failed()) return fail("setItem", e);
+                    if (!ok("setItem", cache.setItem(tag, kKey, record))) return;
 
                     // Whatever record another cursor stored under a GUID must carry that GUID.
                     SmartPtr<Record> other;
@@ -78,19 +78,14 @@ TEST(MappingCacheStressTest, CursorsOnSeveralThreadsKeepCountsAndGuidsConsistent
                     }
                 }
             }
-            if (uError e = cache.clearMapping(tag); e.failed()) return fail("clearMapping", e);
-            if (uError e = cache.clearItems(tag); e.failed()) return fail("clearItems", e);
+            if (!ok("clearMapping", cache.clearMapping(tag)) || !ok("clearItems", cache.clearItems(tag))) return;
         }
     };
 
     // The checker pauses between checks: the cache's mutex is not fair, and a checker that takes it
     // again at once starves the cursors (under TSan on two cores, for minutes).
     std::thread checker([&] {
-        while (!done) {
-            if (uError e = cache.checkInvariants(); e.failed()) {
-                fail("invariants while running", e);
-                return;
-            }
+        while (!done && ok("invariants while running", cache.checkInvariants())) {
             std::this_thread::sleep_for(std::chrono::microseconds(200));
         }
     });
@@ -102,8 +97,7 @@ TEST(MappingCacheStressTest, CursorsOnSeveralThreadsKeepCountsAndGuidsConsistent
     ASSERT_EQ(failures.load(), 0);
 
     Cache::Snapshot snapshot;
-    uError inv = cache.checkInvariants(&snapshot);
-    ASSERT_OK(inv);
+    ASSERT_OK(cache.checkInvariants(&snapshot));
     // Only the pinned tag still holds anything: its mappings, and no records.
     EXPECT_EQ(snapshot.sidEntries, unsigned(kPinned));
     EXPECT_EQ(snapshot.sidTags, 1u);

@@ -120,35 +120,5 @@ INSTANTIATE_TEST_SUITE_P(
         Scenario{"RecordWithoutGuidIsRefused", {store("0", nullptr, 1, kInvalid), clearItems("0")}}),
     [](auto const& info) { return std::string(info.param.name); });
 
-// Clearing walks a tag's keys in this order, so it must be the key name first, then the id, each
-// byte-wise, blind to the type code.
-TEST(MappingCacheTest, ServiceIdKeysOrderByNameThenIdIgnoringTheTypeCode) {
-    struct Case {
-        char const* leftName;
-        char const* leftSid;
-        char const* rightName;
-        char const* rightSid;
-        bool less;
-        bool equal;
-    };
-    Case const cases[] = {
-        {"core_contact_service_id", "2", "core_contact_service_id", "10", false, false},  // text, not number
-        {"core_contact_service_id", "10", "core_contact_service_id", "2", true, false},
-        {"core_contact_service_id", "9", "facebook_album_service_id", "1", true, false},  // name decides
-        {"facebook_album_service_id", "1", "core_contact_service_id", "9", false, false},
-        {"core_contact_service_id", "1", "core_contact_service_id_x", "1", true, false},  // prefix first
-        {"core_contact_service_id", "\xff", "core_contact_service_id", "a", false, false}, // unsigned bytes
-        {"core_contact_service_id", "7", "core_contact_service_id", "7", false, true},
-    };
-    for (Case const& c : cases) {
-        SCOPED_TRACE(std::string(c.leftName) + "/" + c.leftSid + " vs " + c.rightName + "/" + c.rightSid);
-        Cache::SidMapKey const a(Metadata::Key(c.leftName, TRELM_TYPES::STRING), c.leftSid);
-        Cache::SidMapKey const b(Metadata::Key(c.rightName, TRELM_TYPES::INT32), c.rightSid);
-        EXPECT_EQ(a < b, c.less);
-        EXPECT_EQ(a == b, c.equal);
-        EXPECT_EQ(!(a < b) && !(b < a), c.equal);
-    }
-}
-
 }  // namespace
 }  // namespace trelm
