@@ -43,7 +43,7 @@ TEST(ConditionTest, BecomesAConstraintOfTheKeysType) {
     } const cases[] = {
         {"core_contact_name=Anna Moreau", "core_contact_name", Types::STRING, F::Equal, Variant("Anna Moreau")},
         {"core_object_time>=1000", "core_object_time", Types::INT32, F::GreaterOrEqual, Variant(1000)},
-        {"core_object_time<-5", "core_object_time", Types::INT32, F::LessThan, Variant(-5)},
+        {"core_object_time<5", "core_object_time", Types::INT32, F::LessThan, Variant(5)},
         {"core_contact_service!=Facebook", "core_contact_service", Types::STRING, F::NotEqual, Variant("Facebook")},
         {"core_contact_service_id=12,34", "core_contact_service_id", Types::STRING, F::InList,
          Variant(Vector<String>{"12", "34"})},
@@ -79,6 +79,7 @@ TEST(ConditionRejectTest, MalformedConditionsAreInvalidAndAddNothing) {
         {"core_contact_name", "needs an operator"},
         {"=5", "needs a key"},
         {"core_object_time>soon", "does not fit the key"},
+        {"core_object_time<-5", "cannot be negative"},
         {"core_object_type=2,x", "\"x\" does not fit the key"},
         {"core_object_id=not-a-guid", "does not fit the key"},
     };
