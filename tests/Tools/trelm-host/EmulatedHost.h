@@ -55,11 +55,10 @@ public:
 
     // Runs the host with `command`; no password may show in what it prints.
     ProgramRunner::Result run(std::vector<std::string> const& command, std::string const& format = "json",
-                              std::string const& input = {}, int signal = 0, int afterMs = 0,
-                              bool* signalled = nullptr) {
+                              std::string const& input = {}, int signal = 0, int afterMs = 0) {
         std::vector<std::string> args{"--format", format};
         for (std::string& arg : arguments(command)) args.push_back(std::move(arg));
-        ProgramRunner::Result result = runner.run(TRELM_HOST_PROGRAM, args, input, signal, afterMs, signalled);
+        ProgramRunner::Result result = runner.run(TRELM_HOST_PROGRAM, args, input, signal, afterMs);
         for (std::string const& text : {result.out, result.err}) {
             EXPECT_EQ(text.find(emu::DemoAccount::password), std::string::npos) << text;
         }

@@ -37,9 +37,8 @@ class HostCommandsTest : public ::testing::Test {
 protected:
     void SetUp() override { h.useConfig(sourceOnly()); }
 
-    ProgramRunner::Result host(std::vector<std::string> const& command, int signal = 0, int afterMs = 0,
-                               bool* signalled = nullptr) {
-        ProgramRunner::Result result = h.run(command, "json", {}, signal, afterMs, signalled);
+    ProgramRunner::Result host(std::vector<std::string> const& command, int signal = 0, int afterMs = 0) {
+        ProgramRunner::Result result = h.run(command, "json", {}, signal, afterMs);
         EXPECT_EQ(result.err.find("rows/s"), std::string::npos) << "no progress line off a terminal";
         return result;
     }
@@ -205,9 +204,8 @@ class StoppedSignInTest : public HostCommandsTest, public ::testing::WithParamIn
 
 TEST_P(StoppedSignInTest, LeavesNeitherPasswordNorApplicationSecretInTheStateFolder) {
     h.emulator->faults().set("auth.login", emu::FaultRule{.delayMs = 3000});
-    bool signalled = false;
-    host({"query", "contacts"}, GetParam(), 1500, &signalled);
-    ASSERT_TRUE(signalled) << "the host ended before it could be stopped during its sign-in";
+    ASSERT_TRUE(host({"query", "contacts"}, GetParam(), 1500).signalled)
+        << "the host ended before it could be stopped during its sign-in";
     int files = 0;
     for (auto const& entry : std::filesystem::recursive_directory_iterator(h.stateDir())) {
         if (!entry.is_regular_file()) continue;

@@ -136,22 +136,7 @@ TEST(SqliteStoreTest, ClearingTheStatusEmptiesItWithoutAPost) {
     EXPECT_EQ(data.sqlInt("SELECT count(*) FROM stream"), posts);
 }
 
-// An upload without an album makes the application's default album once and then reuses it (the
-// host's insert test reads an upload back).
-TEST(SqliteStoreTest, UploadWithoutAnAlbumUsesOneDefaultAlbum) {
-    GeneratedStore data(smallOptions());
-    const std::string aid = data.sql("SELECT aid FROM album WHERE owner = ? LIMIT 1", {DemoAccount::uid})[0][0];
-    XmlNode first("photos_upload_response"), second("photos_upload_response");
-    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, first));
-    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, second));
-    const std::string defaultAid = child(first, "aid")->text;
-    EXPECT_EQ(child(second, "aid")->text, defaultAid);
-    EXPECT_NE(defaultAid, aid);
-    EXPECT_EQ(data.fql("select type, size, cover_pid from album where aid = '" + defaultAid + "'"),
-              (std::vector<Row>{{{"type", "app"}, {"size", "2"}, {"cover_pid", child(first, "pid")->text}}}));
-}
-
-TEST(SqliteStoreTest, UploadRefusalsAnswerTheirCodesAndChangeNothing) {
+TEST(SqliteStoreTest, UploadRefusalsChangeNothingAndAnUploadWithoutAlbumUsesOneDefaultAlbum) {
     GeneratedStore data(smallOptions());
     const std::string own =
         data.sql("SELECT aid FROM album WHERE owner = ? AND type = 'normal' LIMIT 1", {DemoAccount::uid})[0][0];
@@ -186,12 +171,17 @@ TEST(SqliteStoreTest, UploadRefusalsAnswerTheirCodesAndChangeNothing) {
     }
     EXPECT_EQ(data.dump(), before);
 
-    // The default album holds 1000.
-    XmlNode made("photos_upload_response");
-    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, made));
-    data.sql("UPDATE album SET size = 999 WHERE aid = '" + child(made, "aid")->text + "'");
-    XmlNode last("photos_upload_response"), over("photos_upload_response");
-    EXPECT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, last));
+    // An upload without an album makes the application's default album once and then reuses it
+    // (the host's insert test reads an upload back); that album holds 1000.
+    XmlNode first("photos_upload_response"), second("photos_upload_response"), over("photos_upload_response");
+    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, first));
+    std::string const defaultAid = child(first, "aid")->text;
+    EXPECT_NE(defaultAid, own);
+    EXPECT_EQ(data.fql("select type, size, cover_pid from album where aid = '" + defaultAid + "'"),
+              (std::vector<Row>{{{"type", "app"}, {"size", "1"}, {"cover_pid", child(first, "pid")->text}}}));
+    data.sql("UPDATE album SET size = 999 WHERE aid = '" + defaultAid + "'");
+    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, second));
+    EXPECT_EQ(child(second, "aid")->text, defaultAid);
     expectError(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, over), 321, "Album is full");
 }
 
