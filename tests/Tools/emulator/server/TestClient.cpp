@@ -70,7 +70,6 @@ Reply TestClient::perform(std::string const& url) {
     reply.code = curl_easy_perform(curl_);
     curl_easy_getinfo(curl_, CURLINFO_RESPONSE_CODE, &reply.status);
     curl_easy_getinfo(curl_, CURLINFO_NUM_CONNECTS, &reply.newConnections);
-    curl_easy_getinfo(curl_, CURLINFO_LOCAL_PORT, &reply.localPort);
     char* type = nullptr;
     if (curl_easy_getinfo(curl_, CURLINFO_CONTENT_TYPE, &type) == CURLE_OK && type != nullptr) reply.contentType = type;
     curl_easy_setopt(curl_, CURLOPT_CONNECT_TO, nullptr);

@@ -24,7 +24,6 @@ struct Reply {
     std::string body;
     std::string contentType;
     long newConnections = 0;  // connections the transfer had to open (0 = reused)
-    long localPort = 0;
 
     // The "error_code" of an error document; 0 when the body is not one.
     int errorCode() const;
