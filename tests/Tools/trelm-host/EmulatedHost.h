@@ -36,19 +36,11 @@ public:
 
     // The host's arguments for `command` against this emulator, in this scratch folder.
     std::vector<std::string> arguments(std::vector<std::string> const& command) const {
-        std::vector<std::string> args{"--state-dir",
-                                      stateDir(),
-                                      "--no-emulator",
-                                      "--connect-to",
-                                      "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator->httpPort()),
-                                      "--connect-to",
-                                      "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator->httpsPort()),
-                                      "--ca-file",
-                                      emulator->caFile(),
-                                      "--config",
-                                      config,
-                                      "--plugin",
-                                      TRELMFACEBOOK_MODULE};
+        std::string const http = "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator->httpPort());
+        std::string const https = "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator->httpsPort());
+        std::vector<std::string> args{"--state-dir",  stateDir(), "--no-emulator",     "--connect-to",     http,
+                                      "--connect-to", https,      "--ca-file",         emulator->caFile(), "--config",
+                                      config,         "--plugin", TRELMFACEBOOK_MODULE};
         args.insert(args.end(), command.begin(), command.end());
         return args;
     }
