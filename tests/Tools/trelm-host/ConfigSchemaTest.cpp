@@ -1,5 +1,6 @@
-// What a user reads when the configuration file is malformed or holds a misspelt key, a value of
-// the wrong type or a number out of range: the file, the place, the key and what to do.
+// The configuration file as the host reads it, and what a user reads when it is malformed or holds
+// a misspelt key, a value of the wrong type or a number out of range: the file, the place, the key
+// and what to do.
 #include <string>
 #include <vector>
 
@@ -10,6 +11,9 @@
 
 namespace {
 
+using trelm::String;
+using trelm::Variant;
+using trelm::Vector;
 using trelm::host::HostConfig;
 
 std::string source(std::string const& config) {
@@ -64,6 +68,35 @@ TEST(ConfigSchemaTest, BadFilesAreRefusedByPlaceWithWhatToDo) {
         ASSERT_EQ(config.components().size(), 1u) << "a refused file changes nothing";
         EXPECT_EQ(config.components()[0].name, "keep");
     }
+}
+
+TEST(HostConfigTest, ValuesKeepTheirKindAndComponentsTheirOrder) {
+    HostConfig config;
+    trelm::uError e = HostConfig::parse(R"({
+        "http": {"connect_to": ["a:80:127.0.0.1:1"], "timeout_ms": 5000},
+        "runtime": {"path": ":memory:"},
+        "components": [
+          {"name": "b", "id": "@x:/b", "config": {
+             "text": "t", "flag": false, "small": -7, "big": 5000000000,
+             "list": ["p", "q"], "none": []}},
+          {"name": "a", "id": "@x:/a", "runtime_keys": ["k"]}]})",
+                                        "test", config);
+    ASSERT_OK(e);
+
+    ASSERT_EQ(config.components().size(), 2u);
+    auto const& b = config.components()[0];
+    EXPECT_EQ(b.name, "b");
+    EXPECT_EQ(b.id, "@x:/b");
+    EXPECT_EQ(b.config, (trelm::Map<String, Variant>{{"text", Variant("t")},
+                                                     {"flag", Variant(false)},
+                                                     {"small", Variant(-7)},
+                                                     {"big", Variant(5000000000LL)},
+                                                     {"list", Variant(Vector<String>{"p", "q"})},
+                                                     {"none", Variant(Vector<String>{})}}));
+    EXPECT_EQ(b.runtimeKeys, HostConfig::defaultRuntimeKeys());
+    EXPECT_EQ(config.components()[1].runtimeKeys, (Vector<String>{"k"}));
+    EXPECT_TRUE(config.namesEndpoint());
+    EXPECT_EQ(*config.runtime().search("path"), Variant(":memory:"));
 }
 
 }  // namespace

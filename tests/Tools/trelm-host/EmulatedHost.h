@@ -14,6 +14,7 @@
 #include "Emulator.h"
 #include "EmulatorRows.h"
 #include "ProgramRunner.h"
+#include "trelm/FStreamParseObj.h"
 
 class EmulatedHost {
 public:
@@ -35,22 +36,21 @@ public:
 
     // The host's arguments for `command` against this emulator, in this scratch folder.
     std::vector<std::string> arguments(std::vector<std::string> const& command) const {
-        std::vector<std::string> args{
-            "--state-dir", stateDir(), "--no-emulator",
-            "--connect-to", "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator->httpPort()),
-            "--connect-to", "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator->httpsPort()),
-            "--ca-file", emulator->caFile(), "--config", config, "--plugin", TRELMFACEBOOK_MODULE};
+        std::string const http = "api.facebook.com:80:127.0.0.1:" + std::to_string(emulator->httpPort());
+        std::string const https = "api.facebook.com:443:127.0.0.1:" + std::to_string(emulator->httpsPort());
+        std::vector<std::string> args{"--state-dir",  stateDir(), "--no-emulator",     "--connect-to",     http,
+                                      "--connect-to", https,      "--ca-file",         emulator->caFile(), "--config",
+                                      config,         "--plugin", TRELMFACEBOOK_MODULE};
         args.insert(args.end(), command.begin(), command.end());
         return args;
     }
 
     // Runs the host with `command`; no password may show in what it prints.
     ProgramRunner::Result run(std::vector<std::string> const& command, std::string const& format = "json",
-                              std::string const& input = {}, int signal = 0, int afterMs = 0,
-                              bool* signalled = nullptr) {
+                              std::string const& input = {}, int signal = 0, int afterMs = 0) {
         std::vector<std::string> args{"--format", format};
         for (std::string& arg : arguments(command)) args.push_back(std::move(arg));
-        ProgramRunner::Result result = runner.run(TRELM_HOST_PROGRAM, args, input, signal, afterMs, signalled);
+        ProgramRunner::Result result = runner.run(TRELM_HOST_PROGRAM, args, input, signal, afterMs);
         for (std::string const& text : {result.out, result.err}) {
             EXPECT_EQ(text.find(emu::DemoAccount::password), std::string::npos) << text;
         }
@@ -72,6 +72,23 @@ public:
     }
     std::string nameOf(std::string const& uid) { return fql("select name from user where uid = " + uid).at(0)["name"]; }
     std::vector<emu::LoggedRequest> requests(std::string const& method) { return emulator->log().entriesFor(method); }
+
+    // The status posts of `uid`'s stream from `endTime` down (0: the newest), newest first, each
+    // parsed as the source parses the service's answer.
+    std::vector<trelm::Map<trelm::String, trelm::String>> statusPosts(std::int64_t uid = emu::DemoAccount::uid,
+                                                                      int endTime = 0) {
+        emu::XmlNode root("stream_get_response");
+        EXPECT_FALSE(
+            emulator->store().streamGet(uid, std::to_string(uid), "0", std::to_string(endTime), "100000", root));
+        trelm::Vector<trelm::Map<trelm::String, trelm::String>> rows;
+        unsigned total = 0;
+        EXPECT_TRUE(trelm::FStreamParseObj().parse(emu::renderDocument(root), rows, total).ok());
+        std::vector<trelm::Map<trelm::String, trelm::String>> statuses;
+        for (auto const& row : rows) {
+            if (row.contains("is_status")) statuses.push_back(row);
+        }
+        return statuses;
+    }
 
     ProgramRunner runner;
     std::unique_ptr<emu::Emulator> emulator;

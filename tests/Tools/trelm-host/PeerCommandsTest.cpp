@@ -16,9 +16,6 @@ using Row = emu::test::Row;
 
 constexpr char const* kDemoUser = "100000001";
 
-// The demo configuration, as scripts/demo.sh runs it.
-json demoConfig() { return json::parse(std::ifstream(TRELM_DEMO_CONFIG)); }
-
 class PeerCommandsTest : public ::testing::Test {
 protected:
     EmulatedHost h;
@@ -34,9 +31,9 @@ TEST_F(PeerCommandsTest, PeersListsEveryFriendWithProfileFromTwoRequests) {
         peer.erase("index");
         listed.push_back(peer.get<Row>());
     }
-    std::vector<Row> expected =
-        h.fql("SELECT uid, first_name, last_name, name, profile_url FROM user "
-            "WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
+    std::vector<Row> expected = h.fql(
+        "SELECT uid, first_name, last_name, name, profile_url FROM user "
+        "WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
     std::sort(listed.begin(), listed.end());
     std::sort(expected.begin(), expected.end());
     EXPECT_EQ(listed, expected);
@@ -48,7 +45,8 @@ TEST_F(PeerCommandsTest, PeersListsEveryFriendWithProfileFromTwoRequests) {
 // One friend with a status, one who never set one, asked for in one request; the table shows the
 // time in UTC, or "-" for none.
 TEST_F(PeerCommandsTest, PeerStatusAsksOnceForAllIdsInBothFormats) {
-    std::vector<Row> all = h.fql("SELECT uid, status FROM user WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
+    std::vector<Row> all =
+        h.fql("SELECT uid, status FROM user WHERE uid IN (SELECT uid2 FROM friend WHERE uid1 = me())");
     auto with = std::find_if(all.begin(), all.end(), [](Row& r) { return r.count("status.time") != 0; });
     auto without = std::find_if(all.begin(), all.end(), [](Row& r) { return r.count("status.time") == 0; });
     ASSERT_TRUE(with != all.end() && without != all.end());
@@ -100,7 +98,7 @@ TEST_F(PeerCommandsTest, ConnectionFailuresEndTheCommandWithTheReason) {
     } const cases[] = {{"FacebookPassword", "not the password", {"peers"}, "service error 100"},
                        {"FacebookLogin", nullptr, {"set-status", "hi"}, "has no FacebookLogin"}};
     for (Case const& c : cases) {
-        json config = demoConfig();
+        json config = json::parse(std::ifstream(TRELM_DEMO_CONFIG));
         json& connector = config.at("components").at(1).at("config");
         c.value ? void(connector[c.key] = c.value) : void(connector.erase(c.key));
         h.useConfig(config.dump());

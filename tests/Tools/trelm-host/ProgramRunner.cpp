@@ -46,10 +46,8 @@ std::string ProgramRunner::writeFile(std::string const& name, std::string const&
     return path;
 }
 
-ProgramRunner::Result ProgramRunner::run(std::string const& program,
-                                         std::vector<std::string> const& args,
-                                         std::string const& input, int signal, int afterMs,
-                                         bool* signalled) const {
+ProgramRunner::Result ProgramRunner::run(std::string const& program, std::vector<std::string> const& args,
+                                         std::string const& input, int signal, int afterMs) const {
     // A program never waits for a terminal: its input is a file, empty unless given.
     std::string inPath = writeFile("stdin", input);
     std::string outPath = folder_ + "/stdout";
@@ -82,23 +80,22 @@ ProgramRunner::Result ProgramRunner::run(std::string const& program,
         execve(program.c_str(), argv.data(), envp.data());
         _exit(127);
     }
+    Result result;
     int status = 0;
     bool reaped = false;
-    if (signalled != nullptr) *signalled = false;
     // Polls, so that a program that ends early is not waited for in full.
     for (int waited = 0; pid > 0 && signal > 0 && !reaped; waited += 10) {
         if (waitpid(pid, &status, WNOHANG) == pid) {
             reaped = true;
         } else if (waited >= afterMs) {
             kill(pid, signal);
-            if (signalled != nullptr) *signalled = true;
+            result.signalled = true;
             break;
         } else {
             usleep(10000);
         }
     }
     if (pid > 0 && !reaped) reaped = waitpid(pid, &status, 0) == pid;
-    Result result;
     if (reaped && WIFEXITED(status)) result.exitCode = WEXITSTATUS(status);
     result.out = readAll(outPath);
     result.err = readAll(errPath);

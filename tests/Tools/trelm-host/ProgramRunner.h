@@ -10,7 +10,8 @@
 class ProgramRunner {
 public:
     struct Result {
-        int exitCode = -1;  // -1 when the program did not exit normally
+        int exitCode = -1;       // -1 when the program did not exit normally
+        bool signalled = false;  // whether it was still running when the signal was due, and got it
         std::string out;
         std::string err;
         std::vector<std::string> outLines() const;
@@ -27,9 +28,9 @@ public:
 
     // Runs `program` with `args`, `input` as its standard input, and waits for it to end.
     // With `signal` > 0, the program is sent that signal `afterMs` milliseconds after it started
-    // (if it is still running then); `signalled` (optional) tells whether it was.
-    Result run(std::string const& program, std::vector<std::string> const& args,
-               std::string const& input = {}, int signal = 0, int afterMs = 0, bool* signalled = nullptr) const;
+    // (if it is still running then).
+    Result run(std::string const& program, std::vector<std::string> const& args, std::string const& input = {},
+               int signal = 0, int afterMs = 0) const;
 
 private:
     std::string folder_;

@@ -1,6 +1,5 @@
 // The REST methods' documents and what writes change for later reads.
 #include <algorithm>
-#include <set>
 
 #include <gtest/gtest.h>
 
@@ -18,65 +17,54 @@ GeneratorOptions smallOptions() {
     return o;
 }
 
-void expectError(const Status& s, int code, const std::string& message, const std::string& context = {}) {
+void expectError(Status const& s, int code, std::string const& message, std::string const& context = {}) {
     ASSERT_TRUE(s.has_value()) << context;
     EXPECT_EQ(s->code, code) << context;
     EXPECT_EQ(s->message, message) << context;
 }
 
-struct Post {
-    std::string id;
-    std::int64_t created;
-};
-
-// The demo user's stream computed from the tables: posts by the user and its friends.
-std::vector<Post> expectedStream(GeneratedStore& data, std::int64_t start, std::int64_t end) {
-    std::set<std::string> sources{kMe};
-    for (const auto& r : data.sql("SELECT uid2 FROM friend WHERE uid1 = ?", {DemoAccount::uid})) sources.insert(r[0]);
-    std::vector<Post> posts;
-    for (const auto& r : data.sql("SELECT post_id, source_id, created_time FROM stream")) {
-        const std::int64_t t = std::stoll(r[2]);
-        if (sources.count(r[1]) && t >= start && t <= end) posts.push_back(Post{r[0], t});
-    }
-    std::sort(posts.begin(), posts.end(),
-              [](const Post& a, const Post& b) { return a.created != b.created ? a.created > b.created : a.id > b.id; });
-    return posts;
+// The demo user's stream computed from the tables: [post id, time] of the posts by the user and
+// its friends within [start, end], newest first (ties: the larger id first).
+std::vector<std::vector<std::string>> expectedStream(GeneratedStore& data, std::int64_t start, std::int64_t end) {
+    return data.sql(
+        "SELECT post_id, created_time FROM stream WHERE (source_id = ?1 OR source_id IN (SELECT uid2 FROM friend "
+        "WHERE uid1 = ?1)) AND created_time BETWEEN ?2 AND ?3 ORDER BY created_time DESC, post_id DESC",
+        {DemoAccount::uid, start, end});
 }
 
 TEST(SqliteStoreTest, StreamGetAnswersTheViewersStreamNewestFirstWithinBounds) {
     GeneratedStore data(smallOptions());
-    const auto all = expectedStream(data, 0, INT64_MAX);
+    auto const all = expectedStream(data, 0, INT64_MAX);
     ASSERT_GT(all.size(), 100u);
-    bool ties = false;
-    for (std::size_t i = 1; i < all.size(); ++i) ties = ties || all[i].created == all[i - 1].created;
-    ASSERT_TRUE(ties) << "the stream must hold posts that share a creation time";
+    ASSERT_NE(std::adjacent_find(all.begin(), all.end(), [](auto const& a, auto const& b) { return a[1] == b[1]; }),
+              all.end())
+        << "the stream must hold posts that share a creation time";
 
-    const std::int64_t upper = all[10].created, lower = all[60].created;
+    std::string const upper = all[10][1], lower = all[60][1];
     struct Case {
         std::string start, end, limit;
-        std::vector<Post> expected;
+        std::vector<std::vector<std::string>> expected;
     };
     const std::vector<Case> cases = {
-        {"", "", "", std::vector<Post>(all.begin(), all.begin() + 30)},
+        {"", "", "", {all.begin(), all.begin() + 30}},
         {"0", "0", "100000", all},
-        {std::to_string(lower), std::to_string(upper), "1000", expectedStream(data, lower, upper)},
-        {"0", std::to_string(upper), "5", std::vector<Post>(all.begin() + 10, all.begin() + 15)},
+        {lower, upper, "1000", expectedStream(data, std::stoll(lower), std::stoll(upper))},
+        {"0", upper, "5", {all.begin() + 10, all.begin() + 15}},
     };
-    for (const Case& c : cases) {
+    for (Case const& c : cases) {
         XmlNode root("stream_get_response");
         ASSERT_FALSE(data.store().streamGet(DemoAccount::uid, kMe, c.start, c.end, c.limit, root));
         ASSERT_EQ(childNames(root), (std::vector<std::string>{"posts", "profiles", "albums"}));
-        const XmlNode& posts = root.children[0];
+        XmlNode const& posts = root.children[0];
         EXPECT_TRUE(posts.list);
-        std::vector<std::string> got;
-        for (const XmlNode& p : posts.children) got.push_back(child(p, "post_id")->text);
-        std::vector<std::string> expected;
-        for (const Post& p : c.expected) expected.push_back(p.id);
-        EXPECT_EQ(got, expected) << c.start << ".." << c.end << " limit " << c.limit;
+        std::vector<std::vector<std::string>> got;
+        for (XmlNode const& p : posts.children)
+            got.push_back({child(p, "post_id")->text, child(p, "created_time")->text});
+        EXPECT_EQ(got, c.expected) << c.start << ".." << c.end << " limit " << c.limit;
 
         // Photo posts show their photos with the poster as owner; status posts show none.
-        for (const XmlNode& p : posts.children) {
-            const XmlNode* media = child(*child(p, "attachment"), "media");
+        for (XmlNode const& p : posts.children) {
+            XmlNode const* media = child(*child(p, "attachment"), "media");
             if (child(p, "type")->text == "46") {
                 EXPECT_EQ(media, nullptr);
             } else if (child(p, "type")->text == "247") {
@@ -90,10 +78,11 @@ TEST(SqliteStoreTest, StreamGetAnswersTheViewersStreamNewestFirstWithinBounds) {
 TEST(SqliteStoreTest, MethodsRejectMalformedArguments) {
     GeneratedStore data(smallOptions());
     SqliteStore& s = data.store();
-    const std::string other = data.sql("SELECT thread_id FROM thread WHERE owner <> ? LIMIT 1", {DemoAccount::uid})[0][0];
+    const std::string other =
+        data.sql("SELECT thread_id FROM thread WHERE owner <> ? LIMIT 1", {DemoAccount::uid})[0][0];
     const std::string invalid = "Invalid parameter";
     struct Case {
-        const char* name;
+        char const* name;
         std::function<Status(XmlNode&)> call;
     };
     const std::vector<Case> cases = {
@@ -101,7 +90,8 @@ TEST(SqliteStoreTest, MethodsRejectMalformedArguments) {
         {"negative start", [&](XmlNode& r) { return s.streamGet(DemoAccount::uid, "", "-1", "", "", r); }},
         {"inbox start", [&](XmlNode& r) { return s.getInbox(DemoAccount::uid, "x", "", r); }},
         {"thread id text", [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, "abc", "", "", r); }},
-        {"thread of another owner", [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, other, "", "", r); }},
+        {"thread of another owner",
+         [&](XmlNode& r) { return s.getThreadMessages(DemoAccount::uid, other, "", "", r); }},
         {"status flag", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "hi", "yes", "", r); }},
         {"empty status", [&](XmlNode& r) { return s.setStatus(DemoAccount::uid, "", "1", "", r); }},
         {"getInfo uid", [&](XmlNode& r) { return s.usersGetInfo(DemoAccount::uid, kMe + ",x", "name", r); }},
@@ -109,7 +99,7 @@ TEST(SqliteStoreTest, MethodsRejectMalformedArguments) {
         {"friends of another", [&](XmlNode& r) { return s.friendsGet(DemoAccount::uid, "12345", r); }},
     };
     const std::string before = data.dump();
-    for (const Case& c : cases) {
+    for (Case const& c : cases) {
         XmlNode root("response");
         expectError(c.call(root), 100, invalid, c.name);
     }
@@ -133,38 +123,24 @@ TEST(SqliteStoreTest, ClearingTheStatusEmptiesItWithoutAPost) {
     EXPECT_EQ(data.sqlInt("SELECT count(*) FROM stream"), posts);
 }
 
-// An upload without an album makes the application's default album once and then reuses it (the
-// host's insert test reads an upload back).
-TEST(SqliteStoreTest, UploadWithoutAnAlbumUsesOneDefaultAlbum) {
+TEST(SqliteStoreTest, UploadRefusalsChangeNothingAndAnUploadWithoutAlbumUsesOneDefaultAlbum) {
     GeneratedStore data(smallOptions());
-    const std::string aid = data.sql("SELECT aid FROM album WHERE owner = ? LIMIT 1", {DemoAccount::uid})[0][0];
-    XmlNode first("photos_upload_response"), second("photos_upload_response");
-    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, first));
-    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, second));
-    const std::string defaultAid = child(first, "aid")->text;
-    EXPECT_EQ(child(second, "aid")->text, defaultAid);
-    EXPECT_NE(defaultAid, aid);
-    EXPECT_EQ(data.fql("select type, size, cover_pid from album where aid = '" + defaultAid + "'"),
-              (std::vector<Row>{{{"type", "app"}, {"size", "2"}, {"cover_pid", child(first, "pid")->text}}}));
-}
-
-TEST(SqliteStoreTest, UploadRefusalsAnswerTheirCodesAndChangeNothing) {
-    GeneratedStore data(smallOptions());
-    const std::string own = data.sql("SELECT aid FROM album WHERE owner = ? AND type = 'normal' LIMIT 1",
-                                     {DemoAccount::uid})[0][0];
-    const std::string full = data.sql("SELECT aid FROM album WHERE owner = ? AND aid <> '" + own + "' LIMIT 1",
-                                      {DemoAccount::uid})[0][0];
-    const std::string friends = data.sql("SELECT aid FROM album WHERE owner IN (SELECT uid2 FROM friend WHERE "
-                                         "uid1 = ?) LIMIT 1",
-                                         {DemoAccount::uid})[0][0];
-    data.execute("UPDATE album SET size = 60 WHERE aid = '" + full + "'");
+    const std::string own =
+        data.sql("SELECT aid FROM album WHERE owner = ? AND type = 'normal' LIMIT 1", {DemoAccount::uid})[0][0];
+    const std::string full =
+        data.sql("SELECT aid FROM album WHERE owner = ? AND aid <> '" + own + "' LIMIT 1", {DemoAccount::uid})[0][0];
+    const std::string friends = data.sql(
+        "SELECT aid FROM album WHERE owner IN (SELECT uid2 FROM friend WHERE "
+        "uid1 = ?) LIMIT 1",
+        {DemoAccount::uid})[0][0];
+    data.sql("UPDATE album SET size = 60 WHERE aid = '" + full + "'");
     struct Case {
-        const char* name;
+        char const* name;
         std::string aid;
         std::string image;
         bool haveImage;
         int code;
-        const char* message;
+        char const* message;
     };
     const Case cases[] = {
         {"no image part", own, "", false, 324, "Missing or invalid image file"},
@@ -174,7 +150,7 @@ TEST(SqliteStoreTest, UploadRefusalsAnswerTheirCodesAndChangeNothing) {
         {"album with 60 photos", full, "img", true, 321, "Album is full"},
     };
     const std::string before = data.dump();
-    for (const Case& c : cases) {
+    for (Case const& c : cases) {
         XmlNode root("photos_upload_response");
         expectError(data.store().uploadPhoto(DemoAccount::uid, c.aid, "x", c.image, c.haveImage, root), c.code,
                     c.message, c.name);
@@ -182,12 +158,17 @@ TEST(SqliteStoreTest, UploadRefusalsAnswerTheirCodesAndChangeNothing) {
     }
     EXPECT_EQ(data.dump(), before);
 
-    // The default album holds 1000.
-    XmlNode made("photos_upload_response");
-    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, made));
-    data.execute("UPDATE album SET size = 999 WHERE aid = '" + child(made, "aid")->text + "'");
-    XmlNode last("photos_upload_response"), over("photos_upload_response");
-    EXPECT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, last));
+    // An upload without an album makes the application's default album once and then reuses it
+    // (the host's insert test reads an upload back); that album holds 1000.
+    XmlNode first("photos_upload_response"), second("photos_upload_response"), over("photos_upload_response");
+    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, first));
+    std::string const defaultAid = child(first, "aid")->text;
+    EXPECT_NE(defaultAid, own);
+    EXPECT_EQ(data.fql("select type, size, cover_pid from album where aid = '" + defaultAid + "'"),
+              (std::vector<Row>{{{"type", "app"}, {"size", "1"}, {"cover_pid", child(first, "pid")->text}}}));
+    data.sql("UPDATE album SET size = 999 WHERE aid = '" + defaultAid + "'");
+    ASSERT_FALSE(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, second));
+    EXPECT_EQ(child(second, "aid")->text, defaultAid);
     expectError(data.store().uploadPhoto(DemoAccount::uid, "", "", "img", true, over), 321, "Album is full");
 }
 

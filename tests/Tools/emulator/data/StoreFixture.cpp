@@ -10,30 +10,21 @@
 
 namespace emu::test {
 
-namespace {
-
-void flattenInto(const XmlNode& node, const std::string& prefix, Row& row) {
-    const std::string name = prefix.empty() ? node.name : prefix + "." + node.name;
-    if (node.nil) {
-        row[name] = "<nil>";
-        return;
-    }
-    if (node.children.empty()) {
-        row[name] = node.text;
-        return;
-    }
-    for (const XmlNode& c : node.children) flattenInto(c, name, row);
-}
-
-}  // namespace
-
 GeneratorOptions testOptions() {
-    return GeneratorOptions{.seed = 7, .users = 3000, .demoFriends = 420, .friendsPerUser = 4, .albumsPerUser = 2,
-                            .photosPerAlbum = 4, .tagsPerPhoto = 2, .postsPerUser = 3, .threadsPerUser = 25,
-                            .messagesPerThread = 6, .friendRequests = 7};
+    return GeneratorOptions{.seed = 7,
+                            .users = 3000,
+                            .demoFriends = 420,
+                            .friendsPerUser = 4,
+                            .albumsPerUser = 2,
+                            .photosPerAlbum = 4,
+                            .tagsPerPhoto = 2,
+                            .postsPerUser = 3,
+                            .threadsPerUser = 25,
+                            .messagesPerThread = 6,
+                            .friendRequests = 7};
 }
 
-GeneratedStore::GeneratedStore(const GeneratorOptions& options) {
+GeneratedStore::GeneratedStore(GeneratorOptions const& options) {
     static std::atomic<int> counter{0};
     path_ = (std::filesystem::temp_directory_path() /
              ("emu-data-" + std::to_string(getpid()) + "-" + std::to_string(counter++) + ".db"))
@@ -56,8 +47,8 @@ GeneratedStore::~GeneratedStore() {
     std::filesystem::remove(path_);
 }
 
-std::vector<std::vector<std::string>> GeneratedStore::sql(const std::string& text,
-                                                          const std::vector<std::int64_t>& ints) {
+std::vector<std::vector<std::string>> GeneratedStore::sql(std::string const& text,
+                                                          std::vector<std::int64_t> const& ints) {
     std::vector<std::vector<std::string>> rows;
     sqlite3_stmt* stmt = nullptr;
     if (sqlite3_prepare_v2(raw_, text.c_str(), -1, &stmt, nullptr) != SQLITE_OK) {
@@ -69,8 +60,8 @@ std::vector<std::vector<std::string>> GeneratedStore::sql(const std::string& tex
     while ((rc = sqlite3_step(stmt)) == SQLITE_ROW) {
         std::vector<std::string> row;
         for (int c = 0; c < sqlite3_column_count(stmt); ++c) {
-            const unsigned char* t = sqlite3_column_text(stmt, c);
-            row.emplace_back(t ? reinterpret_cast<const char*>(t) : "");
+            unsigned char const* t = sqlite3_column_text(stmt, c);
+            row.emplace_back(t ? reinterpret_cast<char const*>(t) : "");
         }
         rows.push_back(std::move(row));
     }
@@ -79,27 +70,20 @@ std::vector<std::vector<std::string>> GeneratedStore::sql(const std::string& tex
     return rows;
 }
 
-std::int64_t GeneratedStore::sqlInt(const std::string& text, const std::vector<std::int64_t>& ints) {
+std::int64_t GeneratedStore::sqlInt(std::string const& text, std::vector<std::int64_t> const& ints) {
     auto rows = sql(text, ints);
     if (rows.empty() || rows[0].empty()) return -1;
     return std::stoll(rows[0][0]);
 }
 
-void GeneratedStore::execute(const std::string& text) {
-    char* message = nullptr;
-    if (sqlite3_exec(raw_, text.c_str(), nullptr, nullptr, &message) != SQLITE_OK)
-        ADD_FAILURE() << "exec: " << (message ? message : "") << " in " << text;
-    sqlite3_free(message);
-}
-
 std::string GeneratedStore::dump() {
     std::string out;
-    for (const auto& table : sql("SELECT name FROM sqlite_schema WHERE type = 'table' AND name NOT LIKE 'sqlite_%' "
+    for (auto const& table : sql("SELECT name FROM sqlite_schema WHERE type = 'table' AND name NOT LIKE 'sqlite_%' "
                                  "ORDER BY name")) {
         std::size_t digest = 0;
         std::size_t count = 0;
-        for (const auto& row : sql("SELECT * FROM \"" + table[0] + "\" ORDER BY 1, 2")) {
-            for (const auto& v : row) digest = digest * 1000003u ^ std::hash<std::string>{}(v);
+        for (auto const& row : sql("SELECT * FROM \"" + table[0] + "\" ORDER BY 1, 2")) {
+            for (auto const& v : row) digest = digest * 1000003u ^ std::hash<std::string>{}(v);
             ++count;
         }
         out += table[0] + ":" + std::to_string(count) + ":" + std::to_string(digest) + "\n";
@@ -107,33 +91,14 @@ std::string GeneratedStore::dump() {
     return out;
 }
 
-std::vector<Row> GeneratedStore::fql(const std::string& query, std::int64_t viewer) {
-    XmlNode root("fql_query_response");
-    if (Status s = store_->fqlQuery(viewer, query, root)) {
-        ADD_FAILURE() << "fql " << s->code << " " << s->message << " for " << query;
-        return {};
-    }
-    return rowsOf(root);
-}
-
-std::vector<Row> rowsOf(const XmlNode& root) {
-    std::vector<Row> rows;
-    for (const XmlNode& r : root.children) {
-        Row row;
-        for (const XmlNode& c : r.children) flattenInto(c, "", row);
-        rows.push_back(std::move(row));
-    }
-    return rows;
-}
-
-std::vector<std::string> childNames(const XmlNode& row) {
+std::vector<std::string> childNames(XmlNode const& row) {
     std::vector<std::string> names;
-    for (const XmlNode& c : row.children) names.push_back(c.name);
+    for (XmlNode const& c : row.children) names.push_back(c.name);
     return names;
 }
 
-const XmlNode* child(const XmlNode& node, const std::string& name) {
-    for (const XmlNode& c : node.children)
+XmlNode const* child(XmlNode const& node, std::string const& name) {
+    for (XmlNode const& c : node.children)
         if (c.name == name) return &c;
     return nullptr;
 }

@@ -12,10 +12,7 @@ using ConcurrencyTest = EmulatorFixture;
 TEST_F(ConcurrencyTest, ParallelClientsAreEachAnsweredAndCountedOnce) {
     constexpr int kThreads = 6;
     constexpr int kCalls = 40;
-    FaultRule everyFifth;
-    everyFifth.errorCode = 2;
-    everyFifth.every = 5;
-    emulator->faults().set("fql.query", everyFifth);
+    emulator->faults().set("fql.query", FaultRule{.every = 5, .errorCode = 2});
 
     // Each thread has its own session (the call_id counter of a session belongs to one client).
     std::vector<Session> sessions;
@@ -30,8 +27,12 @@ TEST_F(ConcurrencyTest, ParallelClientsAreEachAnsweredAndCountedOnce) {
             TestClient http, https;
             useHttps(https);
             for (int i = 0; i < kCalls; ++i) {
-                Fields f{{"method", "fql.query"}, {"v", "1.0"}, {"api_key", DemoAccount::apiKey},
-                         {"session_key", sessions[t].key}, {"call_id", std::to_string(i + 1)}, {"query", kFql}};
+                Fields f{{"method", "fql.query"},
+                         {"v", "1.0"},
+                         {"api_key", DemoAccount::apiKey},
+                         {"session_key", sessions[t].key},
+                         {"call_id", std::to_string(i + 1)},
+                         {"query", kFql}};
                 const Reply r = http.postForm(emulator->httpUrl(), sign(f, sessions[t].secret));
                 const int code = r.code == CURLE_OK ? r.errorCode() : -1;
                 (code == 0 ? ok : code == 2 ? injected : other)++;

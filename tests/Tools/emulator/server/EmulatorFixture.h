@@ -15,19 +15,19 @@
 
 namespace emu::test {
 
-inline constexpr const char* kFql = "SELECT name FROM user WHERE uid = me()";
+inline constexpr char const* kFql = "SELECT name FROM user WHERE uid = me()";
 
 // The text of element `name` in `body`, or empty.
-inline std::string elementText(const std::string& body, const std::string& name) {
+inline std::string elementText(std::string const& body, std::string const& name) {
     std::smatch m;
     if (std::regex_search(body, m, std::regex("<" + name + ">([^<]*)</" + name + ">"))) return m[1];
     return {};
 }
 
 // Whether `body` is a whole, well-formed XML document.
-inline bool wellFormed(const std::string& body) {
+inline bool wellFormed(std::string const& body) {
     XML_Parser p = XML_ParserCreate(nullptr);
-    const bool ok = XML_Parse(p, body.data(), static_cast<int>(body.size()), 1) == XML_STATUS_OK;
+    bool const ok = XML_Parse(p, body.data(), static_cast<int>(body.size()), 1) == XML_STATUS_OK;
     XML_ParserFree(p);
     return ok;
 }
@@ -58,22 +58,19 @@ public:
     void SetUp() override { start(options()); }
     void TearDown() override { emulator.reset(); }
 
-    // An application call: method, v, api_key and the fields, signed with the application secret.
-    Fields appCall(const std::string& method, Fields fields = {}) {
+    // An application call: method, v, api_key and the fields, signed with `secret`.
+    Fields appCall(std::string const& method, Fields fields = {}, std::string const& secret = DemoAccount::appSecret) {
         fields["method"] = method;
         fields["v"] = "1.0";
         fields["api_key"] = DemoAccount::apiKey;
-        return sign(std::move(fields), DemoAccount::appSecret);
+        return sign(std::move(fields), secret);
     }
     // A session call of `s` with the next call_id, signed with the session secret.
-    Fields sessionCall(const std::string& method, Fields fields = {}, const Session* s = nullptr) {
+    Fields sessionCall(std::string const& method, Fields fields = {}, Session const* s = nullptr) {
         if (s == nullptr) s = &session;
-        fields["method"] = method;
-        fields["v"] = "1.0";
-        fields["api_key"] = DemoAccount::apiKey;
         fields["session_key"] = s->key;
         if (fields.count("call_id") == 0) fields["call_id"] = std::to_string(++callId_);
-        return sign(std::move(fields), s->secret);
+        return appCall(method, std::move(fields), s->secret);
     }
     Fields fqlCall() { return sessionCall("facebook.fql.query", {{"query", kFql}}); }
 
@@ -82,9 +79,9 @@ public:
         c.trust(emulator->caFile());
         c.connectTo("api.facebook.com:443:127.0.0.1:" + std::to_string(emulator->httpsPort()));
     }
-    static constexpr const char* kHttpsUrl = "https://api.facebook.com/restserver.php";
+    static constexpr char const* kHttpsUrl = "https://api.facebook.com/restserver.php";
 
-    Fields loginFields(const std::string& password = DemoAccount::password) {
+    Fields loginFields(std::string const& password = DemoAccount::password) {
         return appCall("facebook.auth.login", {{"email", DemoAccount::email}, {"password", password}});
     }
 

@@ -14,7 +14,7 @@ std::size_t collect(char* data, std::size_t size, std::size_t count, void* out) 
     return size * count;
 }
 
-std::string md5Hex(const std::string& text) {
+std::string md5Hex(std::string const& text) {
     unsigned char digest[EVP_MAX_MD_SIZE];
     unsigned int length = 0;
     EVP_Digest(text.data(), text.size(), digest, &length, EVP_md5(), nullptr);
@@ -41,9 +41,9 @@ TestClient::TestClient() : curl_(curl_easy_init()) {
 
 TestClient::~TestClient() { curl_easy_cleanup(curl_); }
 
-std::string TestClient::encode(const Fields& fields) {
+std::string TestClient::encode(Fields const& fields) {
     std::string out;
-    for (const auto& [key, value] : fields) {
+    for (auto const& [key, value] : fields) {
         char* k = curl_easy_escape(curl_, key.data(), static_cast<int>(key.size()));
         char* v = curl_easy_escape(curl_, value.data(), static_cast<int>(value.size()));
         if (!out.empty()) out += '&';
@@ -56,7 +56,7 @@ std::string TestClient::encode(const Fields& fields) {
     return out;
 }
 
-Reply TestClient::perform(const std::string& url) {
+Reply TestClient::perform(std::string const& url) {
     Reply reply;
     curl_slist* connectTo = nullptr;
     if (!connectTo_.empty()) connectTo = curl_slist_append(nullptr, connectTo_.c_str());
@@ -70,7 +70,6 @@ Reply TestClient::perform(const std::string& url) {
     reply.code = curl_easy_perform(curl_);
     curl_easy_getinfo(curl_, CURLINFO_RESPONSE_CODE, &reply.status);
     curl_easy_getinfo(curl_, CURLINFO_NUM_CONNECTS, &reply.newConnections);
-    curl_easy_getinfo(curl_, CURLINFO_LOCAL_PORT, &reply.localPort);
     char* type = nullptr;
     if (curl_easy_getinfo(curl_, CURLINFO_CONTENT_TYPE, &type) == CURLE_OK && type != nullptr) reply.contentType = type;
     curl_easy_setopt(curl_, CURLOPT_CONNECT_TO, nullptr);
@@ -78,11 +77,11 @@ Reply TestClient::perform(const std::string& url) {
     return reply;
 }
 
-Reply TestClient::postForm(const std::string& url, const Fields& fields) { return postRaw(url, "", encode(fields)); }
+Reply TestClient::postForm(std::string const& url, Fields const& fields) { return postRaw(url, "", encode(fields)); }
 
-Reply TestClient::postRaw(const std::string& url, const std::string& contentType, const std::string& body) {
-    curl_slist* headers = contentType.empty() ? nullptr : curl_slist_append(nullptr, ("Content-Type: " + contentType).c_str());
-    curl_easy_setopt(curl_, CURLOPT_MIMEPOST, nullptr);
+Reply TestClient::postRaw(std::string const& url, std::string const& contentType, std::string const& body) {
+    curl_slist* headers =
+        contentType.empty() ? nullptr : curl_slist_append(nullptr, ("Content-Type: " + contentType).c_str());
     curl_easy_setopt(curl_, CURLOPT_HTTPHEADER, headers);
     curl_easy_setopt(curl_, CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(body.size()));
     curl_easy_setopt(curl_, CURLOPT_COPYPOSTFIELDS, body.data());
@@ -92,35 +91,29 @@ Reply TestClient::postRaw(const std::string& url, const std::string& contentType
     return reply;
 }
 
-Reply TestClient::postMultipart(const std::string& url, const Fields& fields, const std::string* file) {
-    curl_mime* mime = curl_mime_init(curl_);
-    for (const auto& [key, value] : fields) {
-        curl_mimepart* part = curl_mime_addpart(mime);
-        curl_mime_name(part, key.c_str());
-        curl_mime_data(part, value.data(), value.size());
-    }
-    if (file != nullptr) {
-        curl_mimepart* part = curl_mime_addpart(mime);
-        curl_mime_name(part, "upload");
-        curl_mime_filename(part, "picture.jpg");
-        curl_mime_type(part, "image/jpeg");
-        curl_mime_data(part, file->data(), file->size());
-    }
-    curl_easy_setopt(curl_, CURLOPT_MIMEPOST, mime);
-    Reply reply = perform(url);
-    curl_easy_setopt(curl_, CURLOPT_MIMEPOST, nullptr);
-    curl_mime_free(mime);
-    return reply;
+Reply TestClient::postMultipart(std::string const& url, Fields const& fields, std::vector<FilePart> const& files) {
+    return postRaw(url, std::string("multipart/form-data; boundary=") + kBoundary, multipart(fields, files));
 }
 
-Reply TestClient::get(const std::string& url, const Fields& fields) {
+Reply TestClient::get(std::string const& url, Fields const& fields) {
     curl_easy_setopt(curl_, CURLOPT_HTTPGET, 1L);
     return perform(url + "?" + encode(fields));
 }
 
-Fields sign(Fields fields, const std::string& secret) {
+std::string multipart(Fields const& fields, std::vector<FilePart> const& files) {
+    const std::string delimiter = std::string("--") + kBoundary;
+    std::string body;
+    for (auto const& [key, value] : fields)
+        body += delimiter + "\r\nContent-Disposition: form-data; name=\"" + key + "\"\r\n\r\n" + value + "\r\n";
+    for (FilePart const& p : files)
+        body += delimiter + "\r\nContent-Disposition: form-data; " + p.disposition +
+                "\r\nContent-Type: application/octet-stream\r\n\r\n" + p.content + "\r\n";
+    return body + delimiter + "--\r\n";
+}
+
+Fields sign(Fields fields, std::string const& secret) {
     std::string text;
-    for (const auto& [key, value] : fields)
+    for (auto const& [key, value] : fields)
         if (key != "sig") text += key + "=" + value;
     fields["sig"] = md5Hex(text + secret);
     return fields;

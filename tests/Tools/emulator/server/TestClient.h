@@ -6,10 +6,17 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
 namespace emu::test {
 
 using Fields = std::map<std::string, std::string>;
+
+// A file part of a multipart body: its Content-Disposition parameters and its content.
+struct FilePart {
+    std::string disposition;
+    std::string content;
+};
 
 struct Reply {
     CURLcode code = CURLE_OK;
@@ -17,7 +24,6 @@ struct Reply {
     std::string body;
     std::string contentType;
     long newConnections = 0;  // connections the transfer had to open (0 = reused)
-    long localPort = 0;
 
     // The "error_code" of an error document; 0 when the body is not one.
     int errorCode() const;
@@ -28,31 +34,36 @@ class TestClient {
 public:
     TestClient();
     ~TestClient();
-    TestClient(const TestClient&) = delete;
-    TestClient& operator=(const TestClient&) = delete;
+    TestClient(TestClient const&) = delete;
+    TestClient& operator=(TestClient const&) = delete;
 
-    void trust(const std::string& caFile) { caFile_ = caFile; }
+    void trust(std::string const& caFile) { caFile_ = caFile; }
     // A libcurl connect-to rule, "host:port:connect-host:connect-port".
-    void connectTo(const std::string& rule) { connectTo_ = rule; }
+    void connectTo(std::string const& rule) { connectTo_ = rule; }
 
-    Reply postForm(const std::string& url, const Fields& fields);
+    Reply postForm(std::string const& url, Fields const& fields);
     // `body` as it is, under `contentType` (none given: a url-encoded form).
-    Reply postRaw(const std::string& url, const std::string& contentType, const std::string& body);
-    Reply postMultipart(const std::string& url, const Fields& fields, const std::string* file);
-    Reply get(const std::string& url, const Fields& fields);
+    Reply postRaw(std::string const& url, std::string const& contentType, std::string const& body);
+    // A multipart body built by hand, as the era's clients built it (see multipart()).
+    Reply postMultipart(std::string const& url, Fields const& fields, std::vector<FilePart> const& files);
+    Reply get(std::string const& url, Fields const& fields);
 
     // "a=1&b=2", each side url-encoded.
-    std::string encode(const Fields& fields);
+    std::string encode(Fields const& fields);
 
 private:
-    Reply perform(const std::string& url);
+    Reply perform(std::string const& url);
 
     CURL* curl_;
     std::string caFile_;
     std::string connectTo_;
 };
 
+inline constexpr char const* kBoundary = "AaB03x-era";
+// `fields`, then `files` as application/octet-stream, as a multipart/form-data body with kBoundary.
+std::string multipart(Fields const& fields, std::vector<FilePart> const& files);
+
 // `fields` plus "sig": MD5 of the sorted key=value pairs and `secret`.
-Fields sign(Fields fields, const std::string& secret);
+Fields sign(Fields fields, std::string const& secret);
 
 }  // namespace emu::test
