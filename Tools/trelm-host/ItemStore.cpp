@@ -6,8 +6,8 @@
 
 #include <ctime>
 
-#include <nlohmann/json.hpp>
 
+#include "JsonText.h"
 #include "PrivateFile.h"
 #include "SqliteStatement.h"
 #include "SqliteTransaction.h"
@@ -18,8 +18,6 @@ namespace trelm {
 namespace host {
 
 namespace {
-
-using json = nlohmann::ordered_json;
 
 char const kMemory[] = ":memory:";
 
@@ -38,37 +36,6 @@ char const kSchema[] =
 
 // Every error of the store's statements says which store it is about.
 char const kPrefix[] = "item store: ";
-
-json valueToJson(Variant const& value) {
-    switch (value.type()) {
-        case Variant::Empty: return nullptr;
-        case Variant::Bool: {
-            bool b = false;
-            value.as(b).ignore();  // the type was just checked
-            return b;
-        }
-        case Variant::Int32:
-        case Variant::Int64: return value.asInt64();
-        case Variant::UInt32: return value.asUInt32();
-        case Variant::IntList: {
-            Vector<int> list;
-            value.as(list).ignore();  // the type was just checked
-            json array = json::array();
-            for (int n : list) array.push_back(n);
-            return array;
-        }
-        case Variant::StringList: {
-            Vector<String> list;
-            value.as(list).ignore();  // the type was just checked
-            json array = json::array();
-            for (String const& s : list) array.push_back(s.str());
-            return array;
-        }
-        case Variant::String:
-        case Variant::Guid: break;
-    }
-    return value.asString().str();
-}
 
 std::string boundariesText(std::vector<std::int64_t> const& seconds) {
     std::string text;
@@ -97,10 +64,7 @@ ItemStore::ItemStore(String name, String componentId) : Component(std::move(name
 ItemStore::~ItemStore() { closeLocked(); }
 
 std::string ItemStore::encode(Record const& fields) {
-    json object = json::object();
-    for (auto const& [key, value] : fields) object[key.str()] = valueToJson(value);
-    // Texts from plug-ins are byte strings; replacing invalid UTF-8 keeps the column valid JSON.
-    return object.dump(-1, ' ', false, json::error_handler_t::replace);
+    return jsonText(toJson(fields));
 }
 
 uError ItemStore::open(String const& path) {
@@ -251,12 +215,12 @@ uError ItemStore::commitWindow(Scope const& scope, Pass const& pass, std::vector
         bool const wasDeleted = select.columnInt(1) != 0;
         bool const seenBefore = select.columnInt(2) == pass.id;
         if (!firstSeenKeys.empty()) {
-            json const old = json::parse(stored, nullptr, false);
-            json now = json::parse(fields, nullptr, false);
+            Json const old = Json::parse(stored, nullptr, false);
+            Json now = Json::parse(fields, nullptr, false);
             for (std::string const& key : firstSeenKeys) {
                 if (old.is_object() && old.contains(key) && now.is_object()) now[key] = old[key];
             }
-            fields = now.dump(-1, ' ', false, json::error_handler_t::replace);
+            fields = jsonText(now);
         }
         bool const same = fields == stored && !wasDeleted;
         update.reset().text(1, scope.account).integer(2, scope.type).text(3, row.serviceId);

@@ -1,40 +1,18 @@
 #include "PeerPrinter.h"
 
 #include <algorithm>
-#include <ctime>
 #include <utility>
 
-#include <nlohmann/json.hpp>
+#include "JsonText.h"
 
 namespace trelm {
 namespace host {
-
-namespace {
-
-using json = nlohmann::ordered_json;
-
-// Texts from the service are byte strings; replacing invalid UTF-8 keeps every line valid JSON.
-void writeLine(std::ostream& out, json const& object) {
-    out << object.dump(-1, ' ', false, json::error_handler_t::replace) << '\n';
-}
-
-std::string utc(std::int64_t seconds) {
-    if (seconds == 0) return "-";
-    std::time_t const time = static_cast<std::time_t>(seconds);
-    std::tm parts{};
-    if (gmtime_r(&time, &parts) == nullptr) return std::to_string(seconds);
-    char text[32];
-    std::strftime(text, sizeof text, "%Y-%m-%d %H:%M:%S", &parts);
-    return text;
-}
-
-}  // namespace
 
 PeerPrinter::PeerPrinter(Printer::Format format, std::ostream& out) : format_(format), out_(out) {}
 
 void PeerPrinter::connection(String const& name, String const& userId) {
     if (format_ == Printer::Format::JsonLines) {
-        writeLine(out_, {{"type", "connection"}, {"name", name.str()}, {"user", userId.str()}});
+        writeJsonLine(out_, {{"type", "connection"}, {"name", name.str()}, {"user", userId.str()}});
         return;
     }
     out_ << "connected " << name << " as " << (userId.empty() ? "?" : userId.str()) << '\n';
@@ -42,7 +20,7 @@ void PeerPrinter::connection(String const& name, String const& userId) {
 
 void PeerPrinter::peer(unsigned index, NetworkMetadata::tRELMNetworkPeer const& peer) {
     if (format_ == Printer::Format::JsonLines) {
-        writeLine(out_, {{"type", "peer"},
+        writeJsonLine(out_, {{"type", "peer"},
                          {"index", index},
                          {"uid", peer.serviceId.str()},
                          {"first_name", peer.firstName.str()},
@@ -58,7 +36,7 @@ void PeerPrinter::peer(unsigned index, NetworkMetadata::tRELMNetworkPeer const& 
 
 void PeerPrinter::peersListed(std::size_t count) {
     if (format_ == Printer::Format::JsonLines) {
-        writeLine(out_, {{"type", "peers"}, {"count", count}});
+        writeJsonLine(out_, {{"type", "peers"}, {"count", count}});
         return;
     }
     finish();
@@ -67,18 +45,18 @@ void PeerPrinter::peersListed(std::size_t count) {
 
 void PeerPrinter::status(String const& uid, NetworkMetadata::tRELMNetworkEvent const& event) {
     if (format_ == Printer::Format::JsonLines) {
-        writeLine(out_, {{"type", "peer_status"},
+        writeJsonLine(out_, {{"type", "peer_status"},
                          {"uid", uid.str()},
                          {"status", event.statusText.str()},
                          {"time", event.statusTime}});
         return;
     }
-    gather({"UID", "TIME (UTC)", "STATUS"}, {uid.str(), utc(event.statusTime), event.statusText.str()});
+    gather({"UID", "TIME (UTC)", "STATUS"}, {uid.str(), event.statusTime == 0 ? "-" : utcText(event.statusTime), event.statusText.str()});
 }
 
 void PeerPrinter::statusSet(String const& name, String const& text) {
     if (format_ == Printer::Format::JsonLines) {
-        writeLine(out_, {{"type", "status_set"}, {"name", name.str()}, {"text", text.str()}});
+        writeJsonLine(out_, {{"type", "status_set"}, {"name", name.str()}, {"text", text.str()}});
         return;
     }
     out_ << "status    set through " << name << ": " << text << '\n';

@@ -4,7 +4,7 @@
 #include <cstddef>
 #include <cstdio>
 
-#include <nlohmann/json.hpp>
+#include "JsonText.h"
 
 namespace trelm {
 namespace host {
@@ -27,13 +27,7 @@ void writeTable(std::ostream& out, std::vector<std::vector<std::string>> const& 
 
 namespace {
 
-using json = nlohmann::ordered_json;
-
-json toJson(Vector<String> const& list) {
-    json array = json::array();
-    for (String const& s : list) array.push_back(s.str());
-    return array;
-}
+using json = Json;
 
 std::string joined(Vector<String> const& list, char const* separator, char const* none) {
     if (list.empty()) return none;
@@ -43,46 +37,6 @@ std::string joined(Vector<String> const& list, char const* separator, char const
         text += s.str();
     }
     return text;
-}
-
-// Texts from plug-ins are byte strings; replacing invalid UTF-8 keeps every line valid JSON.
-void writeLine(std::ostream& out, json const& object) {
-    out << object.dump(-1, ' ', false, json::error_handler_t::replace) << '\n';
-}
-
-json valueToJson(Variant const& value) {
-    switch (value.type()) {
-        case Variant::Empty: return nullptr;
-        case Variant::Bool: {
-            bool b = false;
-            (void)value.as(b);
-            return b;
-        }
-        case Variant::Int32:
-        case Variant::Int64: return value.asInt64();
-        case Variant::UInt32: return value.asUInt32();
-        case Variant::IntList: {
-            Vector<int> list;
-            (void)value.as(list);
-            json array = json::array();
-            for (int n : list) array.push_back(n);
-            return array;
-        }
-        case Variant::StringList: {
-            Vector<String> list;
-            (void)value.as(list);
-            return toJson(list);
-        }
-        case Variant::String:
-        case Variant::Guid: break;
-    }
-    return value.asString().str();
-}
-
-json fieldsToJson(Map<String, Variant> const& fields) {
-    json object = json::object();
-    for (auto const& [key, value] : fields) object[key.str()] = valueToJson(value);
-    return object;
 }
 
 // One "key  value" line per field, the values in one column.
@@ -136,7 +90,7 @@ char const* Printer::stateName(Component::State state) {
 
 void Printer::plugin(PluginLoader::Plugin const& plugin) {
     if (format_ == Format::JsonLines) {
-        writeLine(out_, {{"type", "plugin"}, {"path", plugin.path}, {"components", toJson(plugin.ids)}});
+        writeJsonLine(out_, {{"type", "plugin"}, {"path", plugin.path}, {"components", toJson(plugin.ids)}});
         return;
     }
     out_ << "plug-in   " << plugin.path << '\n';
@@ -145,7 +99,7 @@ void Printer::plugin(PluginLoader::Plugin const& plugin) {
 
 void Printer::endpoint(bool emulator, Vector<String> const& connectTo, String const& caFile) {
     if (format_ == Format::JsonLines) {
-        writeLine(out_, {{"type", "endpoint"},
+        writeJsonLine(out_, {{"type", "endpoint"},
                          {"emulator", emulator},
                          {"connect_to", toJson(connectTo)},
                          {"ca_file", caFile.str()}});
@@ -163,7 +117,7 @@ void Printer::component(ComponentHost::Instance const& instance) {
     }
     json error = nullptr;
     if (instance.error.failed()) error = instance.error.toText();
-    writeLine(out_, {{"type", "component"},
+    writeJsonLine(out_, {{"type", "component"},
                      {"name", instance.name.str()},
                      {"id", instance.id.str()},
                      {"state", stateOf(instance)},
@@ -173,7 +127,7 @@ void Printer::component(ComponentHost::Instance const& instance) {
 
 void Printer::state(String const& tag, char const* action, Vector<String> const& keys) {
     if (format_ == Format::JsonLines) {
-        writeLine(out_, {{"type", "state"}, {"tag", tag.str()}, {"action", action}, {"keys", toJson(keys)}});
+        writeJsonLine(out_, {{"type", "state"}, {"tag", tag.str()}, {"action", action}, {"keys", toJson(keys)}});
         return;
     }
     out_ << action << "  " << tag << "  " << joined(keys, ", ", "-") << '\n';
@@ -182,7 +136,7 @@ void Printer::state(String const& tag, char const* action, Vector<String> const&
 void Printer::login(String const& tag, unsigned code, String const& userId, bool stored) {
     char const* session = stored ? "stored" : "new";
     if (format_ == Format::JsonLines) {
-        writeLine(out_, {{"type", "login"},
+        writeJsonLine(out_, {{"type", "login"},
                          {"tag", tag.str()},
                          {"code", hex(code)},
                          {"user", userId.str()},
@@ -199,7 +153,7 @@ void Printer::login(String const& tag, unsigned code, String const& userId, bool
 
 void Printer::step(int number, std::string const& action) {
     if (format_ == Format::JsonLines) {
-        writeLine(out_, {{"type", "step"}, {"step", number}, {"action", action}});
+        writeJsonLine(out_, {{"type", "step"}, {"step", number}, {"action", action}});
         return;
     }
     out_ << "step " << number << "    " << action << '\n';
@@ -207,7 +161,7 @@ void Printer::step(int number, std::string const& action) {
 
 void Printer::record(unsigned index, Map<String, Variant> const& fields) {
     if (format_ == Format::JsonLines) {
-        writeLine(out_, {{"type", "record"}, {"index", index}, {"fields", fieldsToJson(fields)}});
+        writeJsonLine(out_, {{"type", "record"}, {"index", index}, {"fields", toJson(fields)}});
         return;
     }
     out_ << '#' << index << '\n';
@@ -218,7 +172,7 @@ void Printer::listed(int objectType, std::size_t rows, std::optional<unsigned> t
     if (format_ == Format::JsonLines) {
         json count = nullptr;
         if (total) count = *total;
-        writeLine(out_, {{"type", "listed"}, {"object_type", objectType}, {"rows", rows}, {"total", count}});
+        writeJsonLine(out_, {{"type", "listed"}, {"object_type", objectType}, {"rows", rows}, {"total", count}});
         return;
     }
     out_ << "listed    " << rows << (rows == 1 ? " record" : " records");
@@ -230,7 +184,7 @@ void Printer::inserted(int objectType, std::optional<String> const& serviceId) {
     if (format_ == Format::JsonLines) {
         json id = nullptr;
         if (serviceId) id = serviceId->str();
-        writeLine(out_, {{"type", "inserted"}, {"object_type", objectType}, {"core_service_id", id}});
+        writeJsonLine(out_, {{"type", "inserted"}, {"object_type", objectType}, {"core_service_id", id}});
         return;
     }
     out_ << "inserted  object type " << objectType;
@@ -240,7 +194,7 @@ void Printer::inserted(int objectType, std::optional<String> const& serviceId) {
 
 void Printer::retrieved(String const& guid, Map<String, Variant> const& fields) {
     if (format_ == Format::JsonLines) {
-        writeLine(out_, {{"type", "retrieved"}, {"guid", guid.str()}, {"fields", fieldsToJson(fields)}});
+        writeJsonLine(out_, {{"type", "retrieved"}, {"guid", guid.str()}, {"fields", toJson(fields)}});
         return;
     }
     out_ << "retrieved " << guid << '\n';
@@ -249,7 +203,7 @@ void Printer::retrieved(String const& guid, Map<String, Variant> const& fields) 
 
 void Printer::check(std::string const& what, bool ok) {
     if (format_ == Format::JsonLines) {
-        writeLine(out_, {{"type", "check"}, {"what", what}, {"ok", ok}});
+        writeJsonLine(out_, {{"type", "check"}, {"what", what}, {"ok", ok}});
         return;
     }
     out_ << "check     " << what << ": " << (ok ? "yes" : "NO") << '\n';

@@ -1,39 +1,20 @@
 #include "SyncReport.h"
 
 #include <algorithm>
-#include <cstdio>
-#include <ctime>
 
-#include <nlohmann/json.hpp>
+#include "JsonText.h"
 
 namespace trelm {
 namespace host {
 
-namespace {
-
-using json = nlohmann::ordered_json;
-
-void writeLine(std::ostream& out, json const& object) {
-    out << object.dump(-1, ' ', false, json::error_handler_t::replace) << '\n';
-}
-
-std::string utc(std::int64_t seconds) {
-    std::time_t const t = static_cast<std::time_t>(seconds);
-    std::tm parts{};
-    gmtime_r(&t, &parts);
-    char text[32];
-    std::strftime(text, sizeof text, "%Y-%m-%d %H:%M:%S", &parts);
-    return text;
-}
-
-}  // namespace
+using json = Json;
 
 SyncReport::SyncReport(Printer::Format format, std::ostream& out, std::ostream& progress, bool terminal)
     : format_(format), out_(out), progress_(progress), showProgress_(terminal && format == Printer::Format::Table) {}
 
 void SyncReport::wiped(String const& tag, unsigned items) {
     if (format_ == Printer::Format::JsonLines) {
-        writeLine(out_, {{"type", "wiped"}, {"tag", tag.str()}, {"items", items}});
+        writeJsonLine(out_, {{"type", "wiped"}, {"tag", tag.str()}, {"items", items}});
     } else {
         out_ << "wiped     " << items << " items of " << tag << " (another person signed in)\n";
     }
@@ -46,7 +27,7 @@ void SyncReport::begin(std::string const& kind, int type, ItemStore::Pass const&
     if (format_ == Printer::Format::JsonLines) {
         json from = nullptr;
         if (!pass.resume.empty()) from = pass.resume;
-        writeLine(out_, {{"type", "sync"},
+        writeJsonLine(out_, {{"type", "sync"},
                          {"kind", kind},
                          {"object_type", type},
                          {"pass", pass.id},
@@ -86,7 +67,7 @@ void SyncReport::summary(KindSummary const& summary) {
     }
     json error = nullptr;
     if (!summary.error.empty()) error = summary.error;
-    writeLine(out_, {{"type", "synced"},
+    writeJsonLine(out_, {{"type", "synced"},
                      {"kind", summary.kind},
                      {"object_type", summary.type},
                      {"pass", summary.pass},
@@ -124,7 +105,7 @@ void SyncReport::finish() {
 void SyncReport::item(std::size_t index, ItemStore::Item const& item) {
     json fields = json::parse(item.fields, nullptr, false);
     if (format_ == Printer::Format::JsonLines) {
-        writeLine(out_, {{"type", "item"},
+        writeJsonLine(out_, {{"type", "item"},
                          {"index", index},
                          {"host_id", item.hostId.str()},
                          {"account", item.account.str()},
@@ -140,8 +121,8 @@ void SyncReport::item(std::size_t index, ItemStore::Item const& item) {
     std::vector<std::pair<std::string, std::string>> lines{
         {"service_id", item.serviceId.str()},
         {"account", item.account.str()},
-        {"first_seen", utc(item.firstSeen)},
-        {"last_seen", utc(item.lastSeen)},
+        {"first_seen", utcText(item.firstSeen)},
+        {"last_seen", utcText(item.lastSeen)},
     };
     if (fields.is_object()) {
         for (auto const& [key, value] : fields.items()) {
@@ -155,7 +136,7 @@ void SyncReport::item(std::size_t index, ItemStore::Item const& item) {
 
 void SyncReport::items(int type, std::size_t count) {
     if (format_ == Printer::Format::JsonLines) {
-        writeLine(out_, {{"type", "items"}, {"object_type", type}, {"count", count}});
+        writeJsonLine(out_, {{"type", "items"}, {"object_type", type}, {"count", count}});
     } else {
         out_ << "stored    " << count << (count == 1 ? " item" : " items") << '\n';
     }
