@@ -278,7 +278,15 @@ uError SourceClient::uploadPhoto(std::string const& path, String const& caption,
 }
 
 uError SourceClient::retrieve(GUID const& guid, Record& record) {
-    return source_->retrieve(guid, record, false);
+    std::vector<Record> found{record};
+    TRELM_RETURN_IF_ERROR(source_->retrieve(guid, found[0], false));
+    // A friend request was listed with its requester's name, and comes back with it.
+    Variant const* type = found[0].search("core_object_type");
+    if (type != nullptr && type->asInt32() == Metadata::Object::TYPE_FRIEND_REQUEST) {
+        TRELM_RETURN_IF_ERROR(retrying([&] { return addContactNames(found); }));
+    }
+    record = std::move(found[0]);
+    return TRELM_OK();
 }
 
 SourceClient::Record const* SourceClient::listed(std::size_t n) const {

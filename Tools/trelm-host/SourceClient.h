@@ -81,8 +81,9 @@ public:
     // the file (checkPhotoFile); kFailure when the source wrote back no id.
     uError uploadPhoto(std::string const& path, String const& caption, String const& albumId,
                        String& serviceId);
-    // BaseSource::retrieve of a record a still-open cursor produced; kNotFound from the source
-    // otherwise.
+    // BaseSource::retrieve of a record a still-open cursor produced (a friend request with its
+    // requester's name, as listed); kNotFound from the source otherwise. `record` is unchanged on
+    // failure.
     uError retrieve(GUID const& guid, Record& record);
 
     // For walks the caller drives itself (sync). Starts `query` under the session's pacing and

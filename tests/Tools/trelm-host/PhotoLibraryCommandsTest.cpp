@@ -1,5 +1,5 @@
 // trelm-host listing albums, media and photo tags with conditions, an ordering and a since time,
-// and fetching a listed record of each kind again by its GUID in one run, against a service
+// and fetching a listed record of every kind again by its GUID in one run, against a service
 // emulator the test starts itself.
 #include <algorithm>
 #include <string>
@@ -79,7 +79,8 @@ TEST_F(PhotoLibraryCommandsTest, RetrieveFetchesTheListedRecordAgainByItsGuid) {
     };
     std::vector<Case> cases{{"shell", {"shell"}, "query contacts --limit 3\nretrieve #1\n# the third, by its number\n"
                                                  "retrieve #3\nquit\nquery contacts --limit 1\n", 3, {0, 2}}};
-    for (std::string kind : {"contacts", "albums", "media", "photo-tags"}) {
+    for (std::string kind :
+         {"contacts", "status", "photos", "media", "messages", "albums", "friend-requests", "photo-tags"}) {
         cases.push_back({kind, {"retrieve", "#2", "--from", kind, "--limit", "2"}, "", 2, {1}});
     }
     for (Case const& c : cases) {

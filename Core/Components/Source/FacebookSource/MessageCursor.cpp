@@ -29,6 +29,11 @@ Vector<IQueryItems::Column> const& fixedOrdering() {
     return ordering;
 }
 
+Metadata::Key const& serviceIdKey() {
+    static Metadata::Key const key(kServiceIdKey, TRELM_TYPES::STRING);
+    return key;
+}
+
 bool isDecimal(String const& text) {
     if (text.empty()) return false;
     for (unsigned i = 0; i < text.size(); ++i) {
@@ -137,8 +142,7 @@ uError MessageCursor::addMessageToList(FacebookLibrary::MessageObj const& messag
     } catch (std::bad_alloc const&) {
         return TRELM_ERROR(kOutOfMemory);
     }
-    static Metadata::Key const sidKey(kServiceIdKey, TRELM_TYPES::STRING);
-    FacebookSource::MappingCache::SidMapKey const sid(sidKey, row.serviceId);
+    FacebookSource::MappingCache::SidMapKey const sid(serviceIdKey(), row.serviceId);
     TRELM_RETURN_IF_ERROR(cache_->getGuid(tag_, sid, true, row.guid));
     return messages_.insert(MessageOrder{message.timeSent, message.messageId}, std::move(row));
 }
@@ -168,6 +172,25 @@ uError MessageCursor::makeRecord(MessageOrder const& order, MessageRow const& ro
         TRELM_RETURN_IF_ERROR(made->insert(kContactNameKey, Variant(*name)));
     }
     record = std::move(made);
+    return TRELM_OK();
+}
+
+uError MessageCursor::handOut(MessageOrder const& order, MessageRow const& row, RecordPtr& record) {
+    RecordPtr stored;
+    TRELM_RETURN_IF_ERROR(makeRecord(order, row, stored));
+    RecordPtr copy;
+    try {
+        copy = makeSmart<Record>(*stored);
+    } catch (std::bad_alloc const&) {
+        return TRELM_ERROR(kOutOfMemory);
+    }
+    if (heldRecords_ >= kHeldRecords) {
+        TRELM_RETURN_IF_ERROR(cache_->clearItems(tag_));
+        heldRecords_ = 0;
+    }
+    TRELM_RETURN_IF_ERROR(cache_->setItem(tag_, serviceIdKey(), stored));
+    ++heldRecords_;
+    record = std::move(copy);
     return TRELM_OK();
 }
 
@@ -214,8 +237,7 @@ uError MessageCursor::getRow(RecordPtr& row) {
         row.reset();
         return TRELM_ERROR(kNoData);
     }
-    // The host gets a record of its own, so what it changes never reaches the cursor.
-    return makeRecord(it->first, it->second, row);
+    return handOut(it->first, it->second, row);
 }
 
 uError MessageCursor::getRows(unsigned count, Vector<RecordPtr>& rows) {
@@ -224,7 +246,7 @@ uError MessageCursor::getRows(unsigned count, Vector<RecordPtr>& rows) {
     if (it == messages_.end()) return TRELM_ERROR(kNoData);
     for (unsigned n = 0; n < count && it != messages_.end(); ++n, ++it) {
         RecordPtr record;
-        TRELM_RETURN_IF_ERROR(makeRecord(it->first, it->second, record));
+        TRELM_RETURN_IF_ERROR(handOut(it->first, it->second, record));
         TRELM_RETURN_IF_ERROR(rows.pushBack(std::move(record)));
     }
     return TRELM_OK();

@@ -44,6 +44,11 @@ namespace trelm {
 // backwards is not offered (seek with a negative offset is kNotSupported); jumpBeginning, jump
 // and jumpEnd go anywhere. getRow and getRows hand out copies and do not move.
 //
+// Retrieval: every record handed out is also stored in the mapping cache under the cursor's tag,
+// so that the source can give it back by its GUID. Like an FQL cursor's window, the cursor holds
+// the last records it handed out, up to kHeldRecords: when that many are held, they are released
+// before the next is stored. So a mailbox read whole never keeps a second copy of every message.
+//
 // A start that fails part-way keeps the records read so far.
 //
 // Ownership and thread safety: as CursorBase (one thread at a time per cursor).
@@ -66,6 +71,8 @@ public:
     // Page sizes of the two mailbox calls.
     static constexpr int kThreadPage = 20;
     static constexpr int kMessagePage = 50;
+    // The most records handed out that the cache holds for retrieval at once (a contact page).
+    static constexpr unsigned kHeldRecords = 150;
 
     // `flag` is kept by the base; the message cursor has no paged mode.
     MessageCursor(SmartPtr<FacebookLibrary> library, SmartPtr<FacebookSource::MappingCache> cache,
@@ -115,6 +122,9 @@ private:
     uError addUserNames();
     // The whole record of a row: prototype_, the row's values and its author's name if known.
     uError makeRecord(MessageOrder const& order, MessageRow const& row, RecordPtr& record) const;
+    // The record of a row for the host: made whole, stored in the cache for retrieval (see
+    // kHeldRecords), and a copy of it handed out, so what the host changes never reaches the cache.
+    uError handOut(MessageOrder const& order, MessageRow const& row, RecordPtr& record);
     // Names of `uids` with one statement; kNoData when a name could not be kept.
     uError getContactNames(Set<String> const& uids, Map<String, String>& names);
     // Makes prototype_ (the keys every message record carries with the same value).
@@ -129,6 +139,7 @@ private:
     Map<String, String> names_;  // author uid -> name, for the authors the service could name
 
     MessageOrder currentOrder_;
+    unsigned heldRecords_ = 0;  // records stored in the cache since it was last released
 };
 
 }  // namespace trelm

@@ -13,6 +13,7 @@
 #include "EmulatorHost.h"
 #include "ErrorAssertions.h"
 #include "IQueryItems.h"
+#include "MessageCursor.h"
 #include "trelm/GUID.h"
 
 namespace trelm::test {
@@ -184,7 +185,7 @@ TEST_F(InboxCursorsTest, MessagesComeOnceNewestFirstAndATimeBoundStopsReadingAtT
     EXPECT_NE(expectedMessages(middle, false).size(), expectedMessages(middle, true).size());
 }
 
-TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndMoveForwardOnly) {
+TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectMoveForwardOnlyAndTheLastHandedOutComeBackByGuid) {
     Cursor cursor = EmulatorHost::open(*source, 10, kMessageOrder);
     host->emulator().log().clear();
     std::vector<std::string> const all = expectedMessages(0, false);
@@ -218,6 +219,31 @@ TEST_F(InboxCursorsTest, MessageRecordsCarryTheSubjectAndMoveForwardOnly) {
     EXPECT_EQ(text(*rows[2], "core_event_serviceid"), idOf(12));
     EXPECT_EQ(at("core_event_serviceid"), idOf(10));
     EXPECT_TRUE(host->emulator().log().entries().empty()) << "row operations never call the service";
+
+    // Retrieval gives back the records handed out, as they were handed out whatever the host did
+    // to its copy, a window at a time: once kHeldRecords are held they are released.
+    unsigned const held = MessageCursor::kHeldRecords;
+    cursor.reset();  // it holds records of its own
+    Cursor fresh = EmulatorHost::open(*source, 10, kMessageOrder);
+    rows = {};
+    ASSERT_OK(fresh->getRows(held + 10, rows));
+    ASSERT_EQ(rows.size(), held + 10);
+    SmartPtr<Record> const expected = makeSmart<Record>(*rows[held + 9]);
+    ASSERT_OK(rows[held + 9]->insert("core_event_text", Variant("changed by the host")));
+    for (unsigned i : {0u, held - 1, held, held + 9}) {
+        SCOPED_TRACE(i);
+        Record out;
+        uError const err = source->retrieve(rows[i]->search("core_object_id")->asGUID(), out, false);
+        if (i < held) {
+            EXPECT_CODE(err, kNotFound);
+            continue;
+        }
+        ASSERT_OK(err);
+        EXPECT_EQ(text(out, "core_event_serviceid"), idOf(i));
+        if (i == held + 9) {
+            EXPECT_EQ(out, *expected);
+        }
+    }
 }
 
 TEST_F(InboxCursorsTest, FriendRequestsComeOnceAcrossPagesWithKeysetStatements) {
