@@ -107,6 +107,7 @@ uError ItemCommands::runQuery(SourceClient& client, Printer& printer) {
     }
     if (!order_.empty()) TRELM_RETURN_IF_ERROR(query.orderBy(order_));
     query.since = since_;
+    TRELM_RETURN_IF_ERROR(query.checkSince());
     query.skip = skip_;
     if (!all_) query.limit = limit_;
 

@@ -196,7 +196,22 @@ uError ItemQuery::orderBy(std::string const& text) {
     return TRELM_OK();
 }
 
+uError ItemQuery::checkSince() const {
+    if (since) {
+        std::string const given = "--since " + std::to_string(*since);
+        if (*since < 0) return TRELM_ERROR_MSG(kInvalid, given + ": a time is in seconds since 1970 and cannot be negative");
+        int const type = kind_->type;
+        if (type != Metadata::Object::TYPE_ALBUM && type != Metadata::Object::TYPE_MEDIA &&
+            type != Metadata::Object::TYPE_PHOTO_TAG) {
+            return TRELM_ERROR_MSG(kInvalid, given + ": only albums, media and photo tags are listed from a time; list " +
+                                                 kind_->name + " without it");
+        }
+    }
+    return TRELM_OK();
+}
+
 uError ItemQuery::fill(IQueryItems::StartQueryMessage& msg) const {
+    TRELM_RETURN_IF_ERROR(checkSince());
     Constraint type;
     type.key = Metadata::Key("core_object_type", TRELM_TYPES::INT32);
     type.function = Constraint::Equal;

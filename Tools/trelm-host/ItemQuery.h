@@ -68,11 +68,13 @@ public:
     // background query, the only kind that may carry a position.
     std::optional<std::int64_t> since;
     bool interactive() const noexcept { return !since; }
+    // kInvalid, saying why, for a negative `since` or one given to a kind that cannot use it.
+    uError checkSince() const;
     // At most this many rows; unset: every row.
     std::optional<unsigned> limit;
 
     // Sets the columns, constraints and position of `msg` for this query (the cursor and the
-    // interactive flag are left alone).
+    // interactive flag are left alone); what checkSince refuses, it refuses.
     uError fill(IQueryItems::StartQueryMessage& msg) const;
 
     // Walks `cursor` from its beginning: passes over `skip` rows, then copies rows into `rows`

@@ -88,6 +88,37 @@ TEST(ConditionTest, BecomesAConstraintOfTheKeysTypeOrIsRefusedWithTheReason) {
     }
 }
 
+// --since becomes the query's position for the kinds whose cursors list what changed since a time;
+// for the others, and for a time before 1970, it is refused with the reason.
+TEST(SinceTest, IsThePositionOfAlbumMediaAndPhotoTagQueriesOnly) {
+    struct Case {
+        char const* kind;
+        std::int64_t since;
+        char const* refused;  // why, or null when it is taken
+    } const cases[] = {
+        {"media", 0, nullptr},
+        {"albums", 1700000000, nullptr},
+        {"photo-tags", 5, nullptr},
+        {"media", -5, "a time is in seconds since 1970 and cannot be negative"},
+        {"contacts", 5, "list contacts without it"},
+        {"messages", 5, "list messages without it"},
+    };
+    for (Case const& c : cases) {
+        SCOPED_TRACE(std::string(c.kind) + " " + std::to_string(c.since));
+        ItemQuery query(*ItemQuery::findKind(c.kind));
+        query.since = c.since;
+        trelm::IQueryItems::StartQueryMessage msg;
+        uError const e = query.fill(msg);
+        if (c.refused != nullptr) {
+            EXPECT_CODE(e, trelm::kInvalid);
+            EXPECT_NE(e.toText().find(c.refused), std::string::npos) << e;
+            continue;
+        }
+        ASSERT_OK(e);
+        EXPECT_EQ(msg.position, c.since);
+    }
+}
+
 // A cursor over `rows` records {"n": i} that moves only by seek(1), like the stream cursor, and
 // can be told to fail reading one row.
 class StepCursor : public trelm::IQueryItems::ICursor {
