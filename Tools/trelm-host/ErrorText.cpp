@@ -3,6 +3,7 @@
 #include <cstdio>
 
 #include "trelm/String.h"
+#include "TerminalText.h"
 
 namespace trelm {
 namespace host {
@@ -48,7 +49,7 @@ std::string describeError(uError const& error, bool verbose) {
     for (uError const* level = &error; level != nullptr; level = level->cause(), ++depth) {
         if (depth > 0) out += "\n  caused by: ";
         std::string const message = level->message().str();
-        if (!message.empty()) out += message + ": ";
+        if (!message.empty()) out += terminalText(message) + ": ";
         out += codeMeaning(level->code());
         // The remedy belongs to the innermost level that has one: that is where the cause is.
         char const* remedy = codeRemedy(level->code());

@@ -9,9 +9,21 @@
 #include <CLI/CLI.hpp>
 
 #include "ItemCommands.h"
+#include "TerminalText.h"
 
 namespace trelm {
 namespace host {
+
+namespace {
+
+// A word of a line that is not a command, as it can be printed: its first 40 bytes.
+std::string shown(std::string const& word) {
+    constexpr std::size_t kMost = 40;
+    if (word.size() <= kMost) return terminalText(word);
+    return terminalText(std::string_view(word).substr(0, kMost)) + "...";
+}
+
+}  // namespace
 
 HostShell::HostShell(std::istream& in, std::ostream& out, std::ostream& err, bool verbose)
     : in_(in), out_(out), err_(err), verbose_(verbose) {}
@@ -33,7 +45,7 @@ int HostShell::run(SourceClient& client, Printer& printer) {
         std::string word = line.substr(first, line.find_first_of(" \t\r", first) - first);
         auto known = app.get_subcommands([&](CLI::App* command) { return command->check_name(word); });
         if (known.empty()) {
-            err_ << "trelm-host: unknown command \"" << word << "\" (query, insert, retrieve, quit)\n";
+            err_ << "trelm-host: unknown command \"" << shown(word) << "\" (query, insert, retrieve, quit)\n";
             ++failures;
             continue;
         }

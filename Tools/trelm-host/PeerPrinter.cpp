@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "JsonText.h"
+#include "TerminalText.h"
 
 namespace trelm {
 namespace host {
@@ -59,7 +60,7 @@ void PeerPrinter::statusSet(String const& name, String const& text) {
         writeJsonLine(out_, {{"type", "status_set"}, {"name", name.str()}, {"text", text.str()}});
         return;
     }
-    out_ << "status    set through " << name << ": " << text << '\n';
+    out_ << "status    set through " << name << ": " << terminalText(text.view()) << '\n';
 }
 
 void PeerPrinter::gather(std::vector<std::string> header, std::vector<std::string> row) {

@@ -5,17 +5,21 @@
 #include <cstdio>
 
 #include "JsonText.h"
+#include "TerminalText.h"
 
 namespace trelm {
 namespace host {
 
 void writeTable(std::ostream& out, std::vector<std::vector<std::string>> const& rows) {
+    std::vector<std::vector<std::string>> cells;
     std::vector<std::size_t> width;
     for (auto const& row : rows) {
-        width.resize(std::max(width.size(), row.size()), 0);
-        for (std::size_t c = 0; c < row.size(); ++c) width[c] = std::max(width[c], row[c].size());
+        std::vector<std::string>& shown = cells.emplace_back();
+        for (std::string const& cell : row) shown.push_back(terminalText(cell));
+        width.resize(std::max(width.size(), shown.size()), 0);
+        for (std::size_t c = 0; c < shown.size(); ++c) width[c] = std::max(width[c], shown[c].size());
     }
-    for (auto const& row : rows) {
+    for (auto const& row : cells) {
         std::string line;
         for (std::size_t c = 0; c < row.size(); ++c) {
             line += row[c];
@@ -47,7 +51,8 @@ void writeFields(std::ostream& out, Map<String, Variant> const& fields) {
         width = std::max<std::size_t>(width, key.size());
     }
     for (auto const& [key, value] : fields) {
-        out << "  " << key << std::string(width - key.size() + 2, ' ') << value.toString() << '\n';
+        out << "  " << terminalText(key.view()) << std::string(width - key.size() + 2, ' ')
+            << terminalText(value.toString().view()) << '\n';
     }
 }
 

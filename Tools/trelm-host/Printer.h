@@ -18,7 +18,7 @@ namespace trelm {
 namespace host {
 
 // Writes `rows` as a table: each column as wide as its widest cell, two spaces between columns,
-// rows of fewer cells allowed.
+// rows of fewer cells allowed; cells as terminalText makes them.
 void writeTable(std::ostream& out, std::vector<std::vector<std::string>> const& rows);
 
 // Writes what the host did to standard output, either for a person (aligned tables) or for

@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include "ErrorText.h"
+#include "TerminalText.h"
 
 namespace {
 
@@ -54,3 +55,23 @@ TEST(ErrorTextTest, ChainsShowEachLevelWithItsTextAndTheRemedyOnlyWhereTheCauseI
 }
 
 }  // namespace
+
+// What the service, a plug-in or a user typed reaches a terminal without its control characters:
+// an escape sequence in a status or an error text could otherwise recolour or clear the screen,
+// and a line feed fake a line of output. Well-formed UTF-8 stays readable.
+TEST(TerminalTextTest, ControlCharactersAndBrokenUtf8AreWrittenAsEscapes) {
+    struct Case {
+        std::string text, shown;
+    };
+    std::vector<Case> const cases = {
+        {"Anna Moreau", "Anna Moreau"},
+        {"Zo\xc3\xab \xe2\x82\xac \xf0\x9f\x98\x80", "Zo\xc3\xab \xe2\x82\xac \xf0\x9f\x98\x80"},
+        {"\x1b[2Jcleared", "\\x1b[2Jcleared"},
+        {"one\ntwo\r\tthree\x7f", "one\\ntwo\\r\\tthree\\x7f"},
+        {"c1 \xc2\x9b" "31m", "c1 \\xc2\\x9b31m"},  // U+009B, the one-byte escape sequence start
+        {"lone \x9b and cut \xe2\x82", "lone \\x9b and cut \\xe2\\x82"},
+        {"overlong \xc0\xaf, surrogate \xed\xa0\x80", "overlong \\xc0\\xaf, surrogate \\xed\\xa0\\x80"},
+        {std::string("nul\0end", 7), "nul\\x00end"},
+    };
+    for (Case const& c : cases) EXPECT_EQ(trelm::host::terminalText(c.text), c.shown) << c.text;
+}
