@@ -5,7 +5,15 @@
 namespace trelm {
 
 uError sqliteError(sqlite3* db, char const* what) {
-    return TRELM_ERROR_MSG(kFailure, String(what) + ": " + (db != nullptr ? sqlite3_errmsg(db) : "out of memory"));
+    if (db == nullptr) return TRELM_ERROR_MSG(kFailure, String(what) + ": out of memory");
+    String text = String(what) + ": " + sqlite3_errmsg(db);
+    int const code = sqlite3_errcode(db) & 0xff;
+    if (code == SQLITE_CORRUPT || code == SQLITE_NOTADB) {
+        char const* file = sqlite3_db_filename(db, "main");
+        text += String("; ") + (file != nullptr && *file != '\0' ? file : "the database") +
+                " is damaged: move it away or delete it to start afresh";
+    }
+    return TRELM_ERROR_MSG(kFailure, text);
 }
 
 uError sqliteExec(sqlite3* db, char const* sql) {

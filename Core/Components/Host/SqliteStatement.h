@@ -13,7 +13,8 @@ struct sqlite3_stmt;
 
 namespace trelm {
 
-// kFailure with "`what`: SQLite's message for `db`" ("out of memory" when there is no handle).
+// kFailure with "`what`: SQLite's message for `db`" ("out of memory" when there is no handle);
+// when SQLite found the file damaged, the text names the file and says to move it away.
 TRELM_API uError sqliteError(sqlite3* db, char const* what);
 // Runs `sql` (one or more statements without results); kFailure naming the statement otherwise.
 TRELM_API uError sqliteExec(sqlite3* db, char const* sql);

@@ -127,6 +127,27 @@ TEST_F(ItemStoreTest, WipeMessageRemovesTheNamedSourcesItemsAndTheFileIsPrivate)
     EXPECT_EQ(st.st_mode & 0777, 0600u);
 }
 
+// A file that SQLite finds damaged once open is named, with what to do about it.
+TEST_F(ItemStoreTest, DamagedFileIsNamedWithWhatToDo) {
+    ItemStore::Pass pass;
+    ASSERT_OK(store_.openPass(contacts_, pass));
+    std::map<std::string, int> rows;
+    for (int i = 0; i < 500; ++i) rows["contact " + std::to_string(i)] = i;
+    ItemStore::Counts counts;
+    commit(pass, rows, contacts_, counts);
+    store_.close();
+    {
+        std::fstream file(path(), std::ios::in | std::ios::out | std::ios::binary);
+        file.seekp(8192);
+        file << std::string(16384, '\x5a');  // every page after the first two
+    }
+    ASSERT_OK(store_.open(String(path())));
+    std::vector<ItemStore::Item> list;
+    trelm::uError const e = store_.list(String(), 2, true, list);
+    EXPECT_CODE(e, trelm::kFailure);
+    EXPECT_NE(e.toText().find(path() + " is damaged: move it away or delete it"), std::string::npos) << e;
+}
+
 // The store is opened by the first operation that needs it: a host command that never syncs
 // neither makes items.db nor fails on a damaged one, and list or wipe make nothing.
 TEST(ItemStoreOpeningTest, OnlyOperationsThatNeedTheFileMakeOrOpenIt) {
