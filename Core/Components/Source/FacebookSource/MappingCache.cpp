@@ -3,6 +3,7 @@
 #include <bit>
 #include <cstdint>
 #include <cstring>
+#include <iterator>
 #include <new>
 #include <set>
 #include <string_view>
@@ -105,12 +106,24 @@ uError FacebookSource::MappingCache::getGuid(String const& tag, SidMapKey const&
             return TRELM_ERROR(kOutOfMemory);
         }
     }
-    // One search serves both the lookup and, for a new key, the insertion just before `at`.
-    auto const at = bucket->second.lower_bound(key.sid);
-    bool const known = at != bucket->second.end() && !TextLess()(key.sid, at->first);
+    SidBucket& sids = bucket->second;
+    auto tagList = tagSids_.find(tag);
+    // Where the key is or would go: the first entry not below it, which serves both the lookup
+    // and the insertion of a new key. A cursor registers its ids mostly in ascending order, so
+    // the place right after the tag's last id is tried first, and searched for only otherwise.
+    auto at = sids.end();
+    bool placed = false;
+    if (tagList != tagSids_.end() && !tagList->second.refs.empty()) {
+        SidRef const& last = tagList->second.refs.back();
+        if (last.bucket == &sids && TextLess()(last.at->first, key.sid)) {
+            at = std::next(last.at);
+            placed = at == sids.end() || !TextLess()(at->first, key.sid);
+        }
+    }
+    if (!placed) at = sids.lower_bound(key.sid);
+    bool const known = at != sids.end() && !TextLess()(key.sid, at->first);
     if (!known && !create) return TRELM_ERROR(kNotFound);
 
-    auto tagList = tagSids_.find(tag);
     bool const newTag = tagList == tagSids_.end();
     try {
         if (newTag) tagList = tagSids_.emplace(tag, SidList()).first;
@@ -122,13 +135,13 @@ uError FacebookSource::MappingCache::getGuid(String const& tag, SidMapKey const&
             if (!entry.holders.contains(&list)) {
                 entry.holders.add(&list);
                 ++entry.value.refCount;
-                list.refs.push_back(SidRef{&bucket->second, at, {}});
+                list.refs.push_back(SidRef{&sids, at, {}});
             }
             guid = entry.value.guid;
         } else {
-            auto const added = bucket->second.insert(at, std::move(entryNode));
+            auto const added = sids.insert(at, std::move(entryNode));
             added->second.holders.add(&list);
-            list.refs.push_back(SidRef{&bucket->second, added, {}});
+            list.refs.push_back(SidRef{&sids, added, {}});
             guid = added->second.value.guid;
         }
     } catch (std::bad_alloc const&) {
