@@ -243,29 +243,31 @@ uError FacebookSource::MappingCache::clearItems(String const& tag) {
 
 namespace {
 
-// Checks one kind of entry (service ids or records) against the tags' lists. `entries` calls
-// its argument with (entry address, refCount, holders) for every entry in the cache.
-template <class Lists, class EntryOf, class ForEachEntry>
-uError checkHolding(char const* kind, Lists const& lists, EntryOf entryOf, ForEachEntry forEachEntry) {
-    std::map<void const*, unsigned> listed;  // entry -> number of tags listing it
+// One entry of the cache (a service id's or a record's) as the check sees it.
+template <class Holders>
+struct Held {
+    void const* entry;
+    unsigned refCount;
+    Holders const* holders;
+};
+
+// Checks one kind of entry against the tags' lists. `entryOf` gives the entry a tag's reference
+// points to.
+template <class Lists, class Holders, class EntryOf>
+uError checkHolding(char const* kind, Lists const& lists, std::vector<Held<Holders>> const& held, EntryOf entryOf) {
     std::set<void const*> liveLists;
     for (auto const& [tag, list] : lists) liveLists.insert(&list);
-    std::map<void const*, unsigned> entries;  // every entry of the cache
-    uError walk = TRELM_OK();
-    forEachEntry([&](void const* entry, unsigned refCount, auto const& holders) {
-        entries.emplace(entry, refCount);
-        if (walk.failed()) return;
-        if (refCount == 0 || refCount != holders.count()) {
-            walk = TRELM_ERROR_MSG(kInvalid, String(kind) + " entry with a wrong reference count");
-            return;
+    std::map<void const*, unsigned> entries;  // every entry of the cache -> its refCount
+    for (Held<Holders> const& h : held) {
+        entries.emplace(h.entry, h.refCount);
+        if (h.refCount == 0 || h.refCount != h.holders->count()) {
+            return TRELM_ERROR_MSG(kInvalid, String(kind) + " entry with a wrong reference count");
         }
-        holders.forEach([&](void const* holder) {
-            if (walk.ok() && liveLists.count(holder) == 0) {
-                walk = TRELM_ERROR_MSG(kInvalid, String(kind) + " entry held by a tag that is gone");
-            }
-        });
-    });
-    TRELM_RETURN_IF_ERROR(walk);
+        bool gone = false;
+        h.holders->forEach([&](void const* holder) { gone = gone || liveLists.count(holder) == 0; });
+        if (gone) return TRELM_ERROR_MSG(kInvalid, String(kind) + " entry held by a tag that is gone");
+    }
+    std::map<void const*, unsigned> listed;  // entry -> number of tags listing it
     for (auto const& [tag, list] : lists) {
         if (list.refs.empty()) return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " holds an empty " + kind + " list");
         for (auto const& ref : list.refs) {
@@ -292,27 +294,25 @@ uError checkHolding(char const* kind, Lists const& lists, EntryOf entryOf, ForEa
 
 uError FacebookSource::MappingCache::checkInvariants(Snapshot* snapshot) {
     TRELM_CACHE_LOCK(lock);
-    unsigned sidEntries = 0;
-    TRELM_RETURN_IF_ERROR(checkHolding(
-        "service id", tagSids_, [](SidRef const& ref) -> void const* { return &ref.at->second; },
-        [&](auto&& visit) {
-            for (auto const& [name, bucket] : sidMap_) {
-                for (auto const& [sid, entry] : bucket) {
-                    ++sidEntries;
-                    visit(&entry, entry.value.refCount, entry.holders);
-                }
-            }
-        }));
-    TRELM_RETURN_IF_ERROR(checkHolding(
-        "record", tagObjs_, [](ObjRef const& ref) -> void const* { return &ref.at->second; },
-        [&](auto&& visit) {
-            for (auto const& [guid, entry] : objMap_) visit(&entry, entry.value.refCount, entry.holders);
-        }));
-    if (snapshot != nullptr) {
-        snapshot->sidEntries = sidEntries;
-        snapshot->objEntries = static_cast<unsigned>(objMap_.size());
-        snapshot->sidTags = static_cast<unsigned>(tagSids_.size());
-        snapshot->objTags = static_cast<unsigned>(tagObjs_.size());
+    try {
+        std::vector<Held<Holders<SidList>>> sids;
+        for (auto const& [name, bucket] : sidMap_) {
+            for (auto const& [sid, entry] : bucket) sids.push_back({&entry, entry.value.refCount, &entry.holders});
+        }
+        TRELM_RETURN_IF_ERROR(checkHolding("service id", tagSids_, sids,
+                                           [](SidRef const& ref) -> void const* { return &ref.at->second; }));
+        std::vector<Held<Holders<ObjList>>> objs;
+        for (auto const& [guid, entry] : objMap_) objs.push_back({&entry, entry.value.refCount, &entry.holders});
+        TRELM_RETURN_IF_ERROR(
+            checkHolding("record", tagObjs_, objs, [](ObjRef const& ref) -> void const* { return &ref.at->second; }));
+        if (snapshot != nullptr) {
+            snapshot->sidEntries = static_cast<unsigned>(sids.size());
+            snapshot->objEntries = static_cast<unsigned>(objs.size());
+            snapshot->sidTags = static_cast<unsigned>(tagSids_.size());
+            snapshot->objTags = static_cast<unsigned>(tagObjs_.size());
+        }
+    } catch (std::bad_alloc const&) {
+        return TRELM_ERROR(kOutOfMemory);
     }
     return TRELM_OK();
 }
