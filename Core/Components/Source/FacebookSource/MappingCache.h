@@ -47,8 +47,9 @@ namespace trelm {
 // called from any thread and reads and changes the cache's maps only under the one mutex. What
 // an operation allocates (a new key's entry, its GUID) is made before it takes the mutex, and
 // what it releases (entries, records) is freed after it lets go, so that the time under the
-// mutex is searching and linking only. (A tag's first entry, a tag list growing, and an entry
-// gaining a second holder allocate under the mutex; each is rare against the entries.)
+// mutex is searching and linking only. (The first id of a key name or of a tag, a tag's list
+// growing, and an entry gaining a second holder allocate under the mutex; each is rare against
+// the entries.)
 class FacebookSource::MappingCache {
 public:
     // A service id together with the record key it belongs to (which kind of id it is).
