@@ -1,89 +1,136 @@
 #include "trelm/FStreamParseObj.h"
 
+#include <new>
+#include <utility>
+
 namespace trelm {
 
 namespace {
 
-char const kRoot[] = "stream_get_response";
-char const kPostsPath[] = ".stream_get_response.posts";
-char const kPostPath[] = ".stream_get_response.posts.stream_post";
-char const kMediaPath[] = ".stream_get_response.posts.stream_post.attachment.media";
-char const kMediumPath[] = ".stream_get_response.posts.stream_post.attachment.media.stream_media";
-char const kPhotoPath[] = ".stream_get_response.posts.stream_post.attachment.media.stream_media.photo";
+constexpr std::string_view kRoot = "stream_get_response";
 // Type of a status update post.
-char const kStatusType[] = "46";
-
-// Moves src[key] to dst[as] when present (src is cleared before it is used again).
-uError copyField(Map<String, String>& src, char const* key, Map<String, String>& dst, char const* as) {
-    String* value = src.search(String(key));
-    if (value == nullptr) return TRELM_OK();
-    return dst.insert(String(as), std::move(*value));
-}
-
-// The leaves of a post and of a medium that a row can take; the others are not kept.
-bool isKeptPostField(String const& name) {
-    return name == "type" || name == "post_id" || name == "source_id" || name == "created_time" || name == "message";
-}
-bool isKeptMediumField(String const& name) { return name == "type" || name == "src" || name == "alt"; }
-bool isKeptPhotoField(String const& name) { return name == "pid" || name == "aid" || name == "owner"; }
+constexpr std::string_view kStatusType = "46";
 
 }  // namespace
 
-FStreamParseObj::FStreamParseObj() = default;
+FStreamParseObj::FStreamParseObj() { useViews(); }
 
 FStreamParseObj::~FStreamParseObj() = default;
 
 uError FStreamParseObj::parse(String const& xml, Vector<Map<String, String>>& rows, unsigned& count) {
     rows_ = &rows;
     count_ = 0;
+    places_.clear();
+    field_ = nullptr;
     leafOpen_ = false;
     uError e = runParser(xml);
     rows_ = nullptr;
-    post_.clear();
-    medium_.clear();
-    photoMedium_.clear();
+    post_ = PostFields();
+    medium_ = MediumFields();
+    photoMedium_ = MediumFields();
     count = count_;
     return e;
 }
 
-uError FStreamParseObj::start(String const& name, Vector<String> const& attributes) {
-    if (depth() == 1 && name != kRoot) {
-        return TRELM_ERROR_MSG(kFailure, "unexpected root element <" + name + ">, expected <" + kRoot + ">");
+FStreamParseObj::Field* FStreamParseObj::fieldFor(Place parent, std::string_view name) {
+    switch (parent) {
+        case Place::Post:
+            if (name == "type") return &post_.type;
+            if (name == "post_id") return &post_.postId;
+            if (name == "source_id") return &post_.sourceId;
+            if (name == "created_time") return &post_.createdTime;
+            if (name == "message") return &post_.message;
+            return nullptr;
+        case Place::Medium:
+            if (name == "type") return &medium_.type;
+            if (name == "src") return &medium_.src;
+            if (name == "alt") return &medium_.alt;
+            return nullptr;
+        case Place::Photo:
+            if (name == "pid") return &medium_.pid;
+            if (name == "aid") return &medium_.aid;
+            if (name == "owner") return &medium_.owner;
+            return nullptr;
+        default:
+            return nullptr;
     }
-    if (path() == kPostPath) {
-        post_.clear();
-        photoMedium_.clear();
+}
+
+uError FStreamParseObj::startView(std::string_view name, char const* const* attributes) {
+    // depth() counts this element; places_ holds its ancestors.
+    Place place = Place::Other;
+    if (depth() == 1) {
+        if (name != kRoot) {
+            return TRELM_ERROR_MSG(kFailure,
+                                   "unexpected root element <" + String(name) + ">, expected <" + String(kRoot) + ">");
+        }
+        place = Place::Root;
+    } else {
+        switch (places_.back()) {
+            case Place::Root:
+                if (name == "posts") place = Place::Posts;
+                break;
+            case Place::Posts:
+                if (name == "stream_post") place = Place::Post;
+                break;
+            case Place::Post:
+                if (name == "attachment") place = Place::Attachment;
+                break;
+            case Place::Attachment:
+                if (name == "media") place = Place::Media;
+                break;
+            case Place::Media:
+                if (name == "stream_media") place = Place::Medium;
+                break;
+            case Place::Medium:
+                if (name == "photo") place = Place::Photo;
+                break;
+            default:
+                break;
+        }
+    }
+    if (place == Place::Post) {
+        post_ = PostFields();
+        photoMedium_ = MediumFields();
         mediaCount_ = 0;
         havePhoto_ = false;
-    } else if (path() == kMediumPath) {
+    } else if (place == Place::Medium) {
         ++mediaCount_;
-        medium_.clear();
+        medium_ = MediumFields();
     }
-    text_ = String();
+    field_ = depth() == 1 ? nullptr : fieldFor(places_.back(), name);
+    try {
+        places_.push_back(place);
+    } catch (std::bad_alloc const&) {
+        return TRELM_ERROR(kOutOfMemory);
+    }
+    // Only a leaf that a row can take needs its text.
+    text_.clear();
+    setTextWanted(field_ != nullptr);
     leafOpen_ = true;
-    nil_ = XMLParser::isNil(attributes);
+    nil_ = attributes[0] != nullptr && XMLParser::isNil(attributes);
     return TRELM_OK();
 }
 
-uError FStreamParseObj::end(String const& name) {
+uError FStreamParseObj::endView(std::string_view /*name*/) {
     bool const leaf = leafOpen_ && !nil_;
     leafOpen_ = false;
-    // path() is the parent's path here.
-    String const& parent = path();
-    if (parent == kPostPath) {
-        if (leaf && isKeptPostField(name)) return post_.insert(name, std::move(text_));
-    } else if (parent == kMediumPath) {
-        if (leaf && isKeptMediumField(name)) return medium_.insert(name, std::move(text_));
-    } else if (parent == kPhotoPath) {
-        if (leaf && isKeptPhotoField(name)) return medium_.insert("photo." + name, std::move(text_));
-    } else if (parent == kMediaPath && name == "stream_media") {
-        String const* type = medium_.search(String("type"));
-        if (!havePhoto_ && type != nullptr && *type == "photo") {
-            // medium_ is cleared when the next medium starts.
+    Field* const field = field_;
+    field_ = nullptr;
+    Place const place = places_.back();
+    places_.pop_back();
+    if (leaf && field != nullptr) {
+        // A repeated leaf replaces the earlier one.
+        field->text = String(std::move(text_));
+        field->present = true;
+        text_.clear();
+    } else if (place == Place::Medium) {
+        if (!havePhoto_ && medium_.type.present && medium_.type.text.view() == "photo") {
+            // medium_ is emptied when the next medium starts.
             photoMedium_ = std::move(medium_);
             havePhoto_ = true;
         }
-    } else if (parent == kPostsPath && name == "stream_post") {
+    } else if (place == Place::Post) {
         return finishPost();
     }
     return TRELM_OK();
@@ -91,36 +138,44 @@ uError FStreamParseObj::end(String const& name) {
 
 uError FStreamParseObj::finishPost() {
     ++count_;
+    // The texts are moved into the row (the fields are emptied when the next post starts).
     Map<String, String> row;
-    uError e;
+    auto take = [&row](char const* key, Field& field) -> uError {
+        if (!field.present) return TRELM_OK();
+        return row.insert(String(key), std::move(field.text));
+    };
     if (havePhoto_) {
-        e = row.insert(String("is_photo"), String("1"));
-        if (e.ok()) e = copyField(photoMedium_, "photo.pid", row, "pid");
-        if (e.ok()) e = copyField(photoMedium_, "photo.aid", row, "aid");
-        if (e.ok()) e = copyField(photoMedium_, "photo.owner", row, "owner");
-        if (e.ok()) e = copyField(photoMedium_, "src", row, "src");
-        if (e.ok()) e = copyField(photoMedium_, "alt", row, "alt");
-        if (e.ok()) e = copyField(post_, "created_time", row, "created_time");
+        TRELM_RETURN_IF_ERROR(take("aid", photoMedium_.aid));
+        TRELM_RETURN_IF_ERROR(take("alt", photoMedium_.alt));
+        TRELM_RETURN_IF_ERROR(take("created_time", post_.createdTime));
+        TRELM_RETURN_IF_ERROR(row.insert(String("is_photo"), String("1")));
+        TRELM_RETURN_IF_ERROR(take("owner", photoMedium_.owner));
+        TRELM_RETURN_IF_ERROR(take("pid", photoMedium_.pid));
+        TRELM_RETURN_IF_ERROR(take("src", photoMedium_.src));
     } else {
-        String const* type = post_.search(String("type"));
-        bool const status = mediaCount_ == 0 || (type != nullptr && *type == kStatusType);
+        bool const status = mediaCount_ == 0 || (post_.type.present && post_.type.text.view() == kStatusType);
         if (status) {
-            e = row.insert(String("is_status"), String("1"));
-            if (e.ok()) e = copyField(post_, "post_id", row, "post_id");
-            if (e.ok()) e = copyField(post_, "source_id", row, "source_id");
-            if (e.ok()) e = copyField(post_, "created_time", row, "created_time");
-            if (e.ok()) e = copyField(post_, "message", row, "message");
+            TRELM_RETURN_IF_ERROR(take("created_time", post_.createdTime));
+            TRELM_RETURN_IF_ERROR(row.insert(String("is_status"), String("1")));
+            TRELM_RETURN_IF_ERROR(take("message", post_.message));
+            TRELM_RETURN_IF_ERROR(take("post_id", post_.postId));
+            TRELM_RETURN_IF_ERROR(take("source_id", post_.sourceId));
         } else {
-            e = copyField(post_, "post_id", row, "post_id");
-            if (e.ok()) e = copyField(post_, "created_time", row, "created_time");
+            TRELM_RETURN_IF_ERROR(take("created_time", post_.createdTime));
+            TRELM_RETURN_IF_ERROR(take("post_id", post_.postId));
         }
     }
-    if (e.failed()) return e;
     return rows_->pushBack(std::move(row));
 }
 
-uError FStreamParseObj::chars(String const& text) {
-    if (leafOpen_) text_ += text;
+uError FStreamParseObj::charsView(std::string_view text) {
+    if (leafOpen_ && field_ != nullptr) {
+        try {
+            text_.append(text);
+        } catch (std::bad_alloc const&) {
+            return TRELM_ERROR(kOutOfMemory);
+        }
+    }
     return TRELM_OK();
 }
 

@@ -1,11 +1,16 @@
 #include "trelm/ListHashParseObj.h"
 
+#include <new>
+#include <utility>
+
 namespace trelm {
 
 ListHashParseObj::ListHashParseObj(String root) : ListHashParseObj(std::move(root), String(), 0) {}
 
 ListHashParseObj::ListHashParseObj(String root, String rowElement, unsigned skip)
-    : root_(std::move(root)), rowElement_(std::move(rowElement)), skip_(skip) {}
+    : root_(std::move(root)), rowElement_(std::move(rowElement)), skip_(skip) {
+    useViews();
+}
 
 ListHashParseObj::~ListHashParseObj() = default;
 
@@ -20,6 +25,7 @@ uError ListHashParseObj::parseRows(String const& xml, Vector<Map<String, String>
     inRow_ = false;
     nilDepth_ = 0;
     leafOpen_ = false;
+    fieldPath_.clear();
     row_.clear();
     uError e = runParser(xml);
     rows_ = nullptr;
@@ -28,35 +34,42 @@ uError ListHashParseObj::parseRows(String const& xml, Vector<Map<String, String>
     return e;
 }
 
-uError ListHashParseObj::start(String const& name, Vector<String> const& attributes) {
+uError ListHashParseObj::startView(std::string_view name, char const* const* attributes) {
     unsigned const d = depth();
     if (d == 1) {
-        if (name != root_) {
-            return TRELM_ERROR_MSG(kFailure, "unexpected root element <" + name + ">, expected <" + root_ + ">");
+        if (name != root_.view()) {
+            return TRELM_ERROR_MSG(kFailure,
+                                   "unexpected root element <" + String(name) + ">, expected <" + root_ + ">");
         }
         return TRELM_OK();
     }
     if (d == 2) {
-        inRow_ = rowElement_.empty() || name == rowElement_;
+        inRow_ = rowElement_.empty() || name == rowElement_.view();
         if (inRow_) {
             row_.clear();
-            rowPathSize_ = path().size();
+            fieldPath_.clear();
         }
         leafOpen_ = false;
         return TRELM_OK();
     }
     if (!inRow_ || nilDepth_ != 0) return TRELM_OK();
-    if (XMLParser::isNil(attributes)) {
+    if (attributes[0] != nullptr && XMLParser::isNil(attributes)) {
         nilDepth_ = d;
         leafOpen_ = false;
         return TRELM_OK();
     }
-    text_.assign("", 0);
+    try {
+        fieldPath_.append(name);
+        fieldPath_ += '.';
+    } catch (std::bad_alloc const&) {
+        return TRELM_ERROR(kOutOfMemory);
+    }
+    text_.clear();
     leafOpen_ = true;
     return TRELM_OK();
 }
 
-uError ListHashParseObj::end(String const& name) {
+uError ListHashParseObj::endView(std::string_view name) {
     unsigned const d = depth() + 1;  // depth of the element that closed
     bool const leaf = leafOpen_;
     leafOpen_ = false;
@@ -71,15 +84,27 @@ uError ListHashParseObj::end(String const& name) {
         if (d == nilDepth_) nilDepth_ = 0;
         return TRELM_OK();
     }
-    if (!leaf) return TRELM_OK();
-    // path() is the parent's path; the field is named relative to the record element. The
-    // first of a repeated name is kept; text_ is started afresh by the next leaf.
-    if (path().size() <= rowPathSize_) return row_.insertIfAbsent(name, std::move(text_));
-    return row_.insertIfAbsent(path().substr(rowPathSize_ + 1) + "." + name, std::move(text_));
+    // fieldPath_ ends with this element's name and "."; the first of a repeated name is kept, and
+    // text_ is started afresh by the next leaf.
+    std::size_t const parentSize = fieldPath_.size() - name.size() - 1;
+    uError e = TRELM_OK();
+    if (leaf) {
+        e = row_.insertIfAbsent(String(std::string_view(fieldPath_.data(), fieldPath_.size() - 1)),
+                                String(std::move(text_)));
+        text_.clear();
+    }
+    fieldPath_.resize(parentSize);
+    return e;
 }
 
-uError ListHashParseObj::chars(String const& text) {
-    if (leafOpen_) text_ += text;
+uError ListHashParseObj::charsView(std::string_view text) {
+    if (leafOpen_) {
+        try {
+            text_.append(text);
+        } catch (std::bad_alloc const&) {
+            return TRELM_ERROR(kOutOfMemory);
+        }
+    }
     return TRELM_OK();
 }
 

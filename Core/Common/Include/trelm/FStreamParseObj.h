@@ -1,5 +1,9 @@
 #pragma once
 
+#include <string>
+#include <string_view>
+#include <vector>
+
 #include "trelm/Export.h"
 #include "trelm/Map.h"
 #include "trelm/String.h"
@@ -34,25 +38,47 @@ public:
     uError parse(String const& xml, Vector<Map<String, String>>& rows, unsigned& count);
 
 protected:
-    uError start(String const& name, Vector<String> const& attributes) override;
-    uError end(String const& name) override;
-    uError chars(String const& text) override;
+    uError startView(std::string_view name, char const* const* attributes) override;
+    uError endView(std::string_view name) override;
+    uError charsView(std::string_view text) override;
 
 private:
+    // Where an open element is, by the names of the elements around it. Other: anywhere else,
+    // where nothing is read.
+    enum class Place : unsigned char { Root, Posts, Post, Attachment, Media, Medium, Photo, Other };
+
+    // One text a row can take; `present` when its element was read (the text may be empty).
+    struct Field {
+        String text;
+        bool present = false;
+    };
+    // The leaves of a post that a row can take.
+    struct PostFields {
+        Field type, postId, sourceId, createdTime, message;
+    };
+    // The leaves of a medium that a row can take, with those of its photo element.
+    struct MediumFields {
+        Field type, src, alt, pid, aid, owner;
+    };
+
     uError finishPost();
+    // The field that the text of a leaf `name` under an element at `parent` goes to, or null.
+    Field* fieldFor(Place parent, std::string_view name);
 
     // State of one parse; rows_ is valid during parse() only.
     Vector<Map<String, String>>* rows_ = nullptr;
     unsigned count_ = 0;
-    // The post being read: its own leaf fields, its number of media, and the leaf fields of its
-    // first photo medium ("src", "alt", "type", and "photo.pid" etc. for the photo element).
-    Map<String, String> post_;
+    std::vector<Place> places_;  // of the open elements, outermost first
+    // The post being read, its number of media, the medium being read and the post's first photo
+    // medium.
+    PostFields post_;
     unsigned mediaCount_ = 0;
-    Map<String, String> medium_;
-    Map<String, String> photoMedium_;
+    MediumFields medium_;
+    MediumFields photoMedium_;
     bool havePhoto_ = false;
-    // The leaf being read.
-    String text_;
+    // The leaf being read: where its text goes (null: nowhere), and its text so far.
+    Field* field_ = nullptr;
+    std::string text_;
     bool leafOpen_ = false;
     bool nil_ = false;
 };

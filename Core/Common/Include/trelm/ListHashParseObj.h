@@ -1,5 +1,8 @@
 #pragma once
 
+#include <string>
+#include <string_view>
+
 #include "trelm/Export.h"
 #include "trelm/Map.h"
 #include "trelm/String.h"
@@ -39,9 +42,9 @@ protected:
     // included), also on failure (the records read so far).
     uError parseRows(String const& xml, Vector<Map<String, String>>& rows, unsigned& count);
 
-    uError start(String const& name, Vector<String> const& attributes) override;
-    uError end(String const& name) override;
-    uError chars(String const& text) override;
+    uError startView(std::string_view name, char const* const* attributes) override;
+    uError endView(std::string_view name) override;
+    uError charsView(std::string_view text) override;
 
 private:
     // Constant after construction.
@@ -52,11 +55,13 @@ private:
     // State of one parse; rows_ is valid during parseRows() only.
     Vector<Map<String, String>>* rows_ = nullptr;
     unsigned count_ = 0;
-    bool inRow_ = false;        // inside a record element
-    unsigned rowPathSize_ = 0;  // size of path() of the current record element
-    unsigned nilDepth_ = 0;     // depth of an open nil element (0: none)
+    bool inRow_ = false;     // inside a record element
+    unsigned nilDepth_ = 0;  // depth of an open nil element (0: none)
+    // The names of the open elements inside the record element, each followed by ".": a leaf's
+    // field name is this without its last ".".
+    std::string fieldPath_;
     Map<String, String> row_;
-    String text_;
+    std::string text_;
     bool leafOpen_ = false;
 };
 

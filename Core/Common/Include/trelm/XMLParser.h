@@ -1,5 +1,7 @@
 #pragma once
 
+#include <string_view>
+
 #include "trelm/Export.h"
 #include "trelm/String.h"
 #include "trelm/Vector.h"
@@ -10,8 +12,9 @@ namespace trelm {
 // A streaming (SAX) XML reader over expat. Subclasses override the three callbacks; runParser
 // feeds a whole document through them in document order.
 //
-// The parser keeps the path of the current element: "." followed by the names of the open
-// elements joined by "." (".photos_upload_response.pid"; "" outside the root). On an element
+// Unless the subclass reads views (useViews() below), the parser keeps the path of the current
+// element: "." followed by the names of the open elements joined by "."
+// (".photos_upload_response.pid"; "" outside the root). On an element
 // start the element is pushed BEFORE start() is called; on an element end it is popped BEFORE
 // end() is called, so end("code") of <error_response><code> sees the path ".error_response".
 // Names arrive exactly as written (no namespace processing: "xsi:nil" stays "xsi:nil").
@@ -40,8 +43,25 @@ public:
     // True when `attributes` (name, value, name, value, ...) mark the element as nil: an
     // attribute "nil" under any prefix ("xsi:nil") with the value "true" or "1".
     static bool isNil(Vector<String> const& attributes);
+    // The same over expat's array of attributes (name, value, ..., null), as startView() gets it.
+    static bool isNil(char const* const* attributes);
 
 protected:
+    // Whether chars() (or charsView()) is to be called, from now until changed; each run starts
+    // with true. A subclass that needs no text inside the element just opened says false in
+    // start(), and expat then skips the text instead of delivering it. Outside a run: no effect.
+    void setTextWanted(bool wanted);
+
+    // For a subclass that reads names and texts in place, to be called in its constructor: runs
+    // then call startView(), endView() and charsView() instead of start(), end() and chars(), and
+    // keep no element path (path() stays ""; depth() is kept). This saves a copy of every name
+    // and text. The views point into expat's buffers and are valid during the call only;
+    // `attributes` is expat's array: name, value, name, value, ..., then null.
+    void useViews() noexcept { views_ = true; }
+    virtual uError startView(std::string_view name, char const* const* attributes);
+    virtual uError endView(std::string_view name);
+    virtual uError charsView(std::string_view text);
+
     // An element opened; `attributes` holds name, value, name, value, ... in document order.
     virtual uError start(String const& name, Vector<String> const& attributes);
     // An element closed.
@@ -53,9 +73,13 @@ private:
     struct Run;
     friend struct Run;
 
+    // Constant after construction.
+    bool views_ = false;
+
     // Valid during a run only.
     String path_;
     unsigned depth_ = 0;
+    Run* run_ = nullptr;
 };
 
 }  // namespace trelm

@@ -1,6 +1,12 @@
 #include "MappingCache.h"
 
+#include <bit>
+#include <cstdint>
+#include <cstring>
+#include <iterator>
 #include <new>
+#include <set>
+#include <string_view>
 #include <utility>
 
 #include "trelm/Mutex.h"
@@ -17,7 +23,40 @@ typename Container::node_type makeNode(Args&&... args) {
     return scratch.extract(scratch.begin());
 }
 
+// The bytes [at, at + 8) as a number whose order is the bytes' lexicographic order.
+std::uint64_t bigEndianWord(unsigned char const* at) noexcept {
+    std::uint64_t word;
+    std::memcpy(&word, at, sizeof word);
+    if constexpr (std::endian::native == std::endian::little) word = __builtin_bswap64(word);
+    return word;
+}
+
 }  // namespace
+
+bool FacebookSource::MappingCache::TextLess::operator()(String const& a, String const& b) const noexcept {
+    std::string_view const x = a.view();
+    std::string_view const y = b.view();
+    std::size_t const common = x.size() < y.size() ? x.size() : y.size();
+    std::size_t i = 0;
+    for (; i + 8 <= common; i += 8) {
+        std::uint64_t const wordA = bigEndianWord(reinterpret_cast<unsigned char const*>(x.data()) + i);
+        std::uint64_t const wordB = bigEndianWord(reinterpret_cast<unsigned char const*>(y.data()) + i);
+        if (wordA != wordB) return wordA < wordB;
+    }
+    for (; i < common; ++i) {
+        auto const byteA = static_cast<unsigned char>(x[i]);
+        auto const byteB = static_cast<unsigned char>(y[i]);
+        if (byteA != byteB) return byteA < byteB;
+    }
+    return x.size() < y.size();
+}
+
+bool FacebookSource::MappingCache::GuidLess::operator()(GUID const& a, GUID const& b) const noexcept {
+    std::uint64_t const aHigh = bigEndianWord(a.bytes().data());
+    std::uint64_t const bHigh = bigEndianWord(b.bytes().data());
+    if (aHigh != bHigh) return aHigh < bHigh;
+    return bigEndianWord(a.bytes().data() + 8) < bigEndianWord(b.bytes().data() + 8);
+}
 
 FacebookSource::MappingCache::MappingCache() = default;
 
@@ -46,45 +85,70 @@ uError FacebookSource::MappingCache::getTag(String& tag) {
 }
 
 uError FacebookSource::MappingCache::getGuid(String const& tag, SidMapKey const& key, bool create, GUID& guid) {
-    // What a new key needs, made before locking; unused parts are freed after unlocking.
-    SidSet::node_type memberNode;
-    SidMap::node_type entryNode;
-    try {
-        memberNode = makeNode<SidSet>(key);
-        if (create) entryNode = makeNode<SidMap>(key, SidMapValue{GUID::generate(), 1});
-    } catch (std::bad_alloc const&) {
-        return TRELM_ERROR(kOutOfMemory);
-    }
-
-    TRELM_CACHE_LOCK(lock);
-    // One search serves both the lookup and, for a new key, the insertion just before `at`.
-    auto const at = sidMap_.lower_bound(key);
-    bool const known = at != sidMap_.end() && !(key < at->first);
-    if (!known && !create) return TRELM_ERROR(kNotFound);
-
-    // A key that sidMap_ lacks is in no tag's set, so for a new key the insertion always adds it;
-    // for a known one the insertion tells whether the tag held it.
-    auto tagSet = tagSids_.find(tag);
-    if (tagSet == tagSids_.end()) {
-        // The first key of a tag: the tag's own entry is made here, once per tag.
+    // A new key's entry, made before locking; unused, it is freed after unlocking.
+    SidBucket::node_type entryNode;
+    if (create) {
         try {
-            tagSet = tagSids_.emplace(tag, SidSet()).first;
+            entryNode = makeNode<SidBucket>(key.sid, SidEntry{SidMapValue{GUID::generate(), 1}, {}});
         } catch (std::bad_alloc const&) {
             return TRELM_ERROR(kOutOfMemory);
         }
     }
-    // A cursor registers its ids mostly in ascending order, so the end is tried first; a node
-    // that is not taken stays in memberNode and is freed after unlocking.
-    tagSet->second.insert(tagSet->second.end(), std::move(memberNode));
-    bool const added = memberNode.empty();
 
-    if (known) {
-        if (added) ++at->second.refCount;
-        guid = at->second.guid;
-        return TRELM_OK();
+    TRELM_CACHE_LOCK(lock);
+    auto bucket = sidMap_.find(key.key.name());
+    if (bucket == sidMap_.end()) {
+        if (!create) return TRELM_ERROR(kNotFound);
+        // The first id of a key name: its map is made here, once per name.
+        try {
+            bucket = sidMap_.emplace(key.key.name(), SidBucket()).first;
+        } catch (std::bad_alloc const&) {
+            return TRELM_ERROR(kOutOfMemory);
+        }
     }
-    guid = entryNode.mapped().guid;
-    sidMap_.insert(at, std::move(entryNode));
+    SidBucket& sids = bucket->second;
+    auto tagList = tagSids_.find(tag);
+    // Where the key is or would go: the first entry not below it, which serves both the lookup
+    // and the insertion of a new key. A cursor registers its ids mostly in ascending order, so
+    // the place right after the tag's last id is tried first, and searched for only otherwise.
+    auto at = sids.end();
+    bool placed = false;
+    if (tagList != tagSids_.end() && !tagList->second.refs.empty()) {
+        SidRef const& last = tagList->second.refs.back();
+        if (last.bucket == &sids && TextLess()(last.at->first, key.sid)) {
+            at = std::next(last.at);
+            placed = at == sids.end() || !TextLess()(at->first, key.sid);
+        }
+    }
+    if (!placed) at = sids.lower_bound(key.sid);
+    bool const known = at != sids.end() && !TextLess()(key.sid, at->first);
+    if (!known && !create) return TRELM_ERROR(kNotFound);
+
+    bool const newTag = tagList == tagSids_.end();
+    try {
+        if (newTag) tagList = tagSids_.emplace(tag, SidList()).first;
+        SidList& list = tagList->second;
+        // Room for the reference first, so that nothing below can fail half-way.
+        if (list.refs.size() == list.refs.capacity()) list.refs.reserve(list.refs.size() * 2 + 16);
+        if (known) {
+            SidEntry& entry = at->second;
+            if (!entry.holders.contains(&list)) {
+                entry.holders.add(&list);
+                ++entry.value.refCount;
+                list.refs.push_back(SidRef{&sids, at, {}});
+            }
+            guid = entry.value.guid;
+        } else {
+            auto const added = sids.insert(at, std::move(entryNode));
+            added->second.holders.add(&list);
+            list.refs.push_back(SidRef{&sids, added, {}});
+            guid = added->second.value.guid;
+        }
+    } catch (std::bad_alloc const&) {
+        // Only the allocations before any change can fail; a tag made here holds nothing yet.
+        if (newTag && tagList != tagSids_.end() && tagList->second.refs.empty()) tagSids_.erase(tagList);
+        return TRELM_ERROR(kOutOfMemory);
+    }
     return TRELM_OK();
 }
 
@@ -97,40 +161,42 @@ uError FacebookSource::MappingCache::setItem(String const& tag, Metadata::Key co
     Variant const* idValue = item->search(objectIdKey);
     if (idValue == nullptr) return TRELM_ERROR_MSG(kInvalid, "record without core_object_id");
     GUID guid;
-    uError err = idValue->as(guid);
-    if (err.failed()) return err;
+    TRELM_RETURN_IF_ERROR(idValue->as(guid));
 
-    GuidSet::node_type memberNode;
+    // The new entry, made before locking. When the GUID is stored already, the stored record is
+    // swapped into it instead, and so released with it after unlocking.
     ObjMap::node_type entryNode;
-    SmartPtr<Map<String, Variant>> replaced;  // a record this one replaces, released after unlocking
     try {
-        memberNode = makeNode<GuidSet>(guid);
-        entryNode = makeNode<ObjMap>(guid, ObjMapValue{item, 1});
+        entryNode = makeNode<ObjMap>(guid, ObjEntry{ObjMapValue{item, 1}, {}});
     } catch (std::bad_alloc const&) {
         return TRELM_ERROR(kOutOfMemory);
     }
 
     TRELM_CACHE_LOCK(lock);
-    auto tagSet = tagObjs_.find(tag);
-    if (tagSet == tagObjs_.end()) {
-        try {
-            tagSet = tagObjs_.emplace(tag, GuidSet()).first;
-        } catch (std::bad_alloc const&) {
-            return TRELM_ERROR(kOutOfMemory);
+    auto tagList = tagObjs_.find(tag);
+    bool const newTag = tagList == tagObjs_.end();
+    try {
+        if (newTag) tagList = tagObjs_.emplace(tag, ObjList()).first;
+        ObjList& list = tagList->second;
+        if (list.refs.size() == list.refs.capacity()) list.refs.reserve(list.refs.size() * 2 + 16);
+        auto const at = objMap_.lower_bound(guid);
+        if (at != objMap_.end() && !GuidLess()(guid, at->first)) {
+            ObjEntry& entry = at->second;
+            if (!entry.holders.contains(&list)) {
+                entry.holders.add(&list);
+                ++entry.value.refCount;
+                list.refs.push_back(ObjRef{at, {}});
+            }
+            std::swap(entry.value.item, entryNode.mapped().value.item);
+        } else {
+            auto const added = objMap_.insert(at, std::move(entryNode));
+            added->second.holders.add(&list);
+            list.refs.push_back(ObjRef{added, {}});
         }
+    } catch (std::bad_alloc const&) {
+        if (newTag && tagList != tagObjs_.end() && tagList->second.refs.empty()) tagObjs_.erase(tagList);
+        return TRELM_ERROR(kOutOfMemory);
     }
-    auto inserted = tagSet->second.insert(std::move(memberNode));
-    bool const added = inserted.inserted;
-    if (!added) memberNode = std::move(inserted.node);  // freed after unlocking
-
-    auto const at = objMap_.lower_bound(guid);
-    if (at != objMap_.end() && !(guid < at->first)) {
-        replaced = std::move(at->second.item);
-        at->second.item = item;
-        if (added) ++at->second.refCount;
-        return TRELM_OK();
-    }
-    objMap_.insert(at, std::move(entryNode));
     return TRELM_OK();
 }
 
@@ -138,89 +204,115 @@ uError FacebookSource::MappingCache::getItem(GUID const& guid, SmartPtr<Map<Stri
     TRELM_CACHE_LOCK(lock);
     auto const found = objMap_.find(guid);
     if (found == objMap_.end()) return TRELM_ERROR(kNotFound);
-    item = found->second.item;
+    item = found->second.value.item;
     return TRELM_OK();
 }
 
 uError FacebookSource::MappingCache::clearMapping(String const& tag) {
-    // Unlinked under the lock, freed after it. The tag's set is in sidMap_'s order, so each
-    // released entry goes at the end of `released` without a search.
+    // The tag's list, with the entries it was the last to hold, taken out under the lock and
+    // freed after it.
     TagSids::node_type tagNode;
-    SidMap released;
     TRELM_CACHE_LOCK(lock);
-    auto const tagSet = tagSids_.find(tag);
-    if (tagSet == tagSids_.end()) return TRELM_OK();
-    for (SidMapKey const& key : tagSet->second) {
-        auto const value = sidMap_.find(key);
-        if (value == sidMap_.end()) continue;
-        if (value->second.refCount <= 1) {
-            released.insert(released.end(), sidMap_.extract(value));
-        } else {
-            --value->second.refCount;
-        }
+    auto const tagList = tagSids_.find(tag);
+    if (tagList == tagSids_.end()) return TRELM_OK();
+    SidList const* const holder = &tagList->second;
+    for (SidRef& ref : tagList->second.refs) {
+        SidEntry& entry = ref.at->second;
+        entry.holders.remove(holder);
+        if (--entry.value.refCount == 0) ref.released = ref.bucket->extract(ref.at);
     }
-    tagNode = tagSids_.extract(tagSet);
+    tagNode = tagSids_.extract(tagList);
     return TRELM_OK();
 }
 
 uError FacebookSource::MappingCache::clearItems(String const& tag) {
-    // Unlinked under the lock, freed after it (with the records nobody else holds). The tag's
-    // set is in objMap_'s order, so each released entry goes at the end without a search.
+    // As clearMapping; the records nobody else holds go with their entries.
     TagObjs::node_type tagNode;
-    ObjMap released;
     TRELM_CACHE_LOCK(lock);
-    auto const tagSet = tagObjs_.find(tag);
-    if (tagSet == tagObjs_.end()) return TRELM_OK();
-    for (GUID const& guid : tagSet->second) {
-        auto const value = objMap_.find(guid);
-        if (value == objMap_.end()) continue;
-        if (value->second.refCount <= 1) {
-            released.insert(released.end(), objMap_.extract(value));
-        } else {
-            --value->second.refCount;
-        }
+    auto const tagList = tagObjs_.find(tag);
+    if (tagList == tagObjs_.end()) return TRELM_OK();
+    ObjList const* const holder = &tagList->second;
+    for (ObjRef& ref : tagList->second.refs) {
+        ObjEntry& entry = ref.at->second;
+        entry.holders.remove(holder);
+        if (--entry.value.refCount == 0) ref.released = objMap_.extract(ref.at);
     }
-    tagNode = tagObjs_.extract(tagSet);
+    tagNode = tagObjs_.extract(tagList);
     return TRELM_OK();
 }
 
+namespace {
+
+// One entry of the cache (a service id's or a record's) as the check sees it.
+template <class Holders>
+struct Held {
+    void const* entry;
+    unsigned refCount;
+    Holders const* holders;
+};
+
+// Checks one kind of entry against the tags' lists. `entryOf` gives the entry a tag's reference
+// points to.
+template <class Lists, class Holders, class EntryOf>
+uError checkHolding(char const* kind, Lists const& lists, std::vector<Held<Holders>> const& held, EntryOf entryOf) {
+    std::set<void const*> liveLists;
+    for (auto const& [tag, list] : lists) liveLists.insert(&list);
+    std::map<void const*, unsigned> entries;  // every entry of the cache -> its refCount
+    for (Held<Holders> const& h : held) {
+        entries.emplace(h.entry, h.refCount);
+        if (h.refCount == 0 || h.refCount != h.holders->count()) {
+            return TRELM_ERROR_MSG(kInvalid, String(kind) + " entry with a wrong reference count");
+        }
+        bool gone = false;
+        h.holders->forEach([&](void const* holder) { gone = gone || liveLists.count(holder) == 0; });
+        if (gone) return TRELM_ERROR_MSG(kInvalid, String(kind) + " entry held by a tag that is gone");
+    }
+    std::map<void const*, unsigned> listed;  // entry -> number of tags listing it
+    for (auto const& [tag, list] : lists) {
+        if (list.refs.empty()) return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " holds an empty " + kind + " list");
+        for (auto const& ref : list.refs) {
+            void const* entry = entryOf(ref);
+            if (entries.count(entry) == 0) {
+                return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " lists a " + kind + " entry not in the cache");
+            }
+            if (!ref.at->second.holders.contains(&list)) {
+                return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " lists a " + kind + " entry that it does not hold");
+            }
+            ++listed[entry];
+        }
+    }
+    for (auto const& [entry, refCount] : entries) {
+        auto const n = listed.find(entry);
+        if (n == listed.end() || n->second != refCount) {
+            return TRELM_ERROR_MSG(kInvalid, String(kind) + " entry listed by a wrong number of tags");
+        }
+    }
+    return TRELM_OK();
+}
+
+}  // namespace
+
 uError FacebookSource::MappingCache::checkInvariants(Snapshot* snapshot) {
     TRELM_CACHE_LOCK(lock);
-    Map<SidMapKey, unsigned> sidHolders;
-    for (auto const& [tag, keys] : tagSids_) {
-        if (keys.empty()) return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " holds an empty key set");
-        for (SidMapKey const& key : keys) {
-            if (sidMap_.count(key) == 0) return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " holds an unmapped key");
-            unsigned* n = sidHolders.search(key);
-            TRELM_RETURN_IF_ERROR(sidHolders.insert(key, n ? *n + 1 : 1u));
+    try {
+        std::vector<Held<Holders<SidList>>> sids;
+        for (auto const& [name, bucket] : sidMap_) {
+            for (auto const& [sid, entry] : bucket) sids.push_back({&entry, entry.value.refCount, &entry.holders});
         }
-    }
-    for (auto const& [key, value] : sidMap_) {
-        unsigned const* n = sidHolders.search(key);
-        if (n == nullptr || value.refCount != *n) {
-            return TRELM_ERROR_MSG(kInvalid, "service id " + key.sid + " has a wrong reference count");
+        TRELM_RETURN_IF_ERROR(checkHolding("service id", tagSids_, sids,
+                                           [](SidRef const& ref) -> void const* { return &ref.at->second; }));
+        std::vector<Held<Holders<ObjList>>> objs;
+        for (auto const& [guid, entry] : objMap_) objs.push_back({&entry, entry.value.refCount, &entry.holders});
+        TRELM_RETURN_IF_ERROR(
+            checkHolding("record", tagObjs_, objs, [](ObjRef const& ref) -> void const* { return &ref.at->second; }));
+        if (snapshot != nullptr) {
+            snapshot->sidEntries = static_cast<unsigned>(sids.size());
+            snapshot->objEntries = static_cast<unsigned>(objs.size());
+            snapshot->sidTags = static_cast<unsigned>(tagSids_.size());
+            snapshot->objTags = static_cast<unsigned>(tagObjs_.size());
         }
-    }
-    Map<GUID, unsigned> objHolders;
-    for (auto const& [tag, guids] : tagObjs_) {
-        if (guids.empty()) return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " holds an empty record set");
-        for (GUID const& guid : guids) {
-            if (objMap_.count(guid) == 0) return TRELM_ERROR_MSG(kInvalid, "tag " + tag + " holds a missing record");
-            unsigned* n = objHolders.search(guid);
-            TRELM_RETURN_IF_ERROR(objHolders.insert(guid, n ? *n + 1 : 1u));
-        }
-    }
-    for (auto const& [guid, value] : objMap_) {
-        unsigned const* n = objHolders.search(guid);
-        if (n == nullptr || value.refCount != *n) {
-            return TRELM_ERROR_MSG(kInvalid, "record " + guid.toString() + " has a wrong reference count");
-        }
-    }
-    if (snapshot != nullptr) {
-        snapshot->sidEntries = static_cast<unsigned>(sidMap_.size());
-        snapshot->objEntries = static_cast<unsigned>(objMap_.size());
-        snapshot->sidTags = static_cast<unsigned>(tagSids_.size());
-        snapshot->objTags = static_cast<unsigned>(tagObjs_.size());
+    } catch (std::bad_alloc const&) {
+        return TRELM_ERROR(kOutOfMemory);
     }
     return TRELM_OK();
 }

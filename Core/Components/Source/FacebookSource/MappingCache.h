@@ -1,7 +1,7 @@
 #pragma once
 
 #include <map>
-#include <set>
+#include <vector>
 
 #include "trelm/Mutex.h"
 
@@ -34,20 +34,22 @@ namespace trelm {
 //   cache.clearItems(tag);
 //
 // Invariants, holding whenever the mutex is free (checkInvariants verifies them):
-//   - every sidMap_ entry's refCount equals the number of tagSids_ sets holding its key, and is >= 1;
-//   - every objMap_ entry's refCount equals the number of tagObjs_ sets holding its GUID, and is >= 1;
-//   - every key in a tagSids_ set is in sidMap_, every GUID in a tagObjs_ set is in objMap_;
-//   - no tag has an empty set.
-// sidMap_ and objMap_ are independent: a GUID may be mapped without a stored record and a record
-// stored without a mapping.
+//   - every service-id entry's refCount equals the number of tags holding it (the tags listed
+//     in its holders, each of which lists the entry once), and is >= 1; likewise for records;
+//   - every entry a tag lists is in the cache;
+//   - no tag holds an empty list.
+// Service-id entries and records are independent: a GUID may be mapped without a stored record
+// and a record stored without a mapping.
 //
 // Ownership: shared by SmartPtr between the source and its cursors. Stored records are shared with
 // their producer, never copied.
 // Thread safety: setup() must run once before anything else; after that every operation may be
 // called from any thread and reads and changes the cache's maps only under the one mutex. What
-// an operation allocates (a new key's map and set entries, its GUID) is made before it takes the
-// mutex, and what it releases (entries, records) is freed after it lets go, so that the time
-// under the mutex is searching and linking only.
+// an operation allocates (a new key's entry, its GUID) is made before it takes the mutex, and
+// what it releases (entries, records) is freed after it lets go, so that the time under the
+// mutex is searching and linking only. (The first id of a key name or of a tag, a tag's list
+// growing, and an entry gaining a second holder allocate under the mutex; each is rare against
+// the entries.)
 class FacebookSource::MappingCache {
 public:
     // A service id together with the record key it belongs to (which kind of id it is).
@@ -76,12 +78,12 @@ public:
 
     struct SidMapValue {
         GUID guid;
-        unsigned refCount = 0;  // tags whose key set holds this key
+        unsigned refCount;  // tags holding this key
     };
 
     struct ObjMapValue {
         SmartPtr<Map<String, Variant>> item;  // shared with its producer
-        unsigned refCount = 0;                // tags whose GUID set holds this GUID
+        unsigned refCount;                    // tags holding this record
     };
 
     // Sizes, for tests and benchmarks.
@@ -128,18 +130,113 @@ public:
     uError checkInvariants(Snapshot* snapshot = nullptr);
 
 private:
-    // The standard containers themselves, for their node handles: an entry is made in a node
-    // outside the mutex and linked in under it, and unlinked under it and freed outside.
-    using SidMap = std::map<SidMapKey, SidMapValue>;
-    using ObjMap = std::map<GUID, ObjMapValue>;
-    using SidSet = std::set<SidMapKey>;
-    using GuidSet = std::set<GUID>;
-    using TagSids = std::map<String, SidSet>;
-    using TagObjs = std::map<String, GuidSet>;
+    // The tags holding one entry: nearly always exactly one, kept inline; further ones in a
+    // vector that stays unallocated until a second tag holds the entry. A tag is named by the
+    // address of its list (stable while the tag holds anything).
+    template <class List>
+    class Holders {
+    public:
+        Holders() noexcept : first_(nullptr) {}
+
+        bool contains(List const* tag) const noexcept {
+            if (first_ == tag) return true;
+            for (List const* other : more_) {
+                if (other == tag) return true;
+            }
+            return false;
+        }
+        // REQUIRES: !contains(tag). Throws std::bad_alloc (nothing changed) when the vector
+        // cannot grow.
+        void add(List const* tag) {
+            if (first_ == nullptr) {
+                first_ = tag;
+            } else {
+                more_.push_back(tag);
+            }
+        }
+        // REQUIRES: contains(tag). Never allocates.
+        void remove(List const* tag) noexcept {
+            if (first_ == tag) {
+                if (more_.empty()) {
+                    first_ = nullptr;
+                    return;
+                }
+                first_ = more_.back();
+                more_.pop_back();
+                return;
+            }
+            for (auto& other : more_) {
+                if (other == tag) {
+                    other = more_.back();
+                    more_.pop_back();
+                    return;
+                }
+            }
+        }
+        unsigned count() const noexcept { return (first_ != nullptr ? 1u : 0u) + static_cast<unsigned>(more_.size()); }
+        template <class F>
+        void forEach(F&& f) const {
+            if (first_ != nullptr) f(first_);
+            for (List const* other : more_) f(other);
+        }
+
+    private:
+        List const* first_;
+        std::vector<List const*> more_;
+    };
+
+    // The orders of String's and GUID's operator<, compared eight bytes at a time inline instead
+    // of through memcmp: the searches under the mutex are mostly these comparisons.
+    struct TextLess {
+        bool operator()(String const& a, String const& b) const noexcept;
+    };
+    struct GuidLess {
+        bool operator()(GUID const& a, GUID const& b) const noexcept;
+    };
+
+    struct SidList;
+    struct ObjList;
+    struct SidEntry {
+        SidMapValue value;
+        Holders<SidList> holders;
+    };
+    struct ObjEntry {
+        ObjMapValue value;
+        Holders<ObjList> holders;
+    };
+
+    // Service ids are kept by key name, then by sid: one small map of names, and per name a map
+    // whose entries hold their sid once, without the key name. The standard containers
+    // themselves, for their node handles: an entry is made in a node outside the mutex and linked
+    // in under it, and unlinked under it and freed outside.
+    using SidBucket = std::map<String, SidEntry, TextLess>;
+    using SidBuckets = std::map<String, SidBucket, TextLess>;
+    using ObjMap = std::map<GUID, ObjEntry, GuidLess>;
+
+    // What a tag holds, in the order it took it. An entry released by clearing the tag is
+    // unlinked into its reference's `released`, so that the list, taken out of the cache, frees
+    // it after the mutex is let go.
+    struct SidRef {
+        SidBucket* bucket;
+        SidBucket::iterator at;
+        SidBucket::node_type released;
+    };
+    struct ObjRef {
+        ObjMap::iterator at;
+        ObjMap::node_type released;
+    };
+    struct SidList {
+        std::vector<SidRef> refs;
+    };
+    struct ObjList {
+        std::vector<ObjRef> refs;
+    };
+    using TagSids = std::map<String, SidList, TextLess>;
+    using TagObjs = std::map<String, ObjList, TextLess>;
 
     // Made by setup (made() is constant afterwards); guards the five members below.
     Mutex mutex_;
-    SidMap sidMap_ TRELM_GUARDED_BY(mutex_);
+    SidBuckets sidMap_ TRELM_GUARDED_BY(mutex_);
     ObjMap objMap_ TRELM_GUARDED_BY(mutex_);
     TagSids tagSids_ TRELM_GUARDED_BY(mutex_);
     TagObjs tagObjs_ TRELM_GUARDED_BY(mutex_);
