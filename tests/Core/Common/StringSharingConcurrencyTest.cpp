@@ -1,0 +1,56 @@
+// Copies of one long String share its text between threads: taking, reading, changing and
+// releasing copies in several threads at once must neither race nor free the text early (run under
+// TSan).
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "trelm/String.h"
+
+namespace trelm {
+namespace {
+
+std::string const kText = "core_object_origin_importcomponent";
+
+TEST(StringSharingConcurrencyTest, CopiesTakenChangedAndReleasedInSeveralThreads) {
+    constexpr int kThreads = 4;
+    constexpr int kRounds = 2000;
+    struct Case {
+        char const* name;
+        bool originalGoesFirst;  // the original is released while the threads still hold copies
+    } const cases[] = {{"original outlives the copies", false}, {"original released first", true}};
+    for (Case const& c : cases) {
+        auto original = std::make_unique<String>(kText);
+        // Each thread owns a copy handed to it; half of them copy that one, the others a String
+        // every thread reads.
+        std::vector<String> handed(kThreads, *original);
+        String const sharedRead = *original;
+        std::vector<int> wrong(kThreads, 0);
+        std::vector<std::thread> threads;
+        for (int t = 0; t < kThreads; ++t) {
+            threads.emplace_back([&, t] {
+                String mine = std::move(handed[t]);
+                for (int i = 0; i < kRounds; ++i) {
+                    String copy = t % 2 == 0 ? mine : sharedRead;
+                    if (copy.str() != kText) ++wrong[t];
+                    copy += 'x';  // a private copy: the shared text stays
+                    copy.erase(0, 5);
+                    if (copy.view() != kText.substr(5) + "x") ++wrong[t];
+                }
+                if (mine.str() != kText) ++wrong[t];
+            });
+        }
+        if (c.originalGoesFirst) original.reset();
+        for (std::thread& thread : threads) thread.join();
+        for (int t = 0; t < kThreads; ++t) EXPECT_EQ(wrong[t], 0) << c.name << ", thread " << t;
+        if (original) {
+            EXPECT_EQ(original->str(), kText) << c.name;
+        }
+    }
+}
+
+}  // namespace
+}  // namespace trelm
