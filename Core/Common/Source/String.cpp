@@ -24,21 +24,24 @@ uError parseDecimal(std::string const& text, T& out) {
 }  // namespace
 
 String::String(std::string&& text) {
-    if (text.size() <= kInlineSize)
+    if (text.size() <= kInlineSize) {
         inline_.assign(text);
-    else
+    } else {
         block_ = new Block(std::move(text));
+    }
 }
 
-void String::replace(std::string&& text) {
+String& String::replaceWith(std::string&& text) {
     Block* made = text.size() <= kInlineSize ? nullptr : new Block(std::move(text));
     Block* old = block_;
     block_ = made;
-    if (made != nullptr)
+    if (made != nullptr) {
         inline_.clear();
-    else
+    } else {
         inline_.assign(text);
+    }
     release(old);
+    return *this;
 }
 
 String String::concat(std::string_view a, std::string_view b) {
@@ -55,52 +58,23 @@ String String::concat(std::string_view a, std::string_view b) {
     return r;
 }
 
-String& String::append(std::string_view piece) {
-    if (piece.empty()) return *this;
-    if (ownsBlockAlone()) {
-        block_->text.append(piece);
-        return *this;
-    }
+String& String::appendShared(std::string_view piece) {
+    // The old text stays as it is (another String may hold it, `piece` may lie in it) until the
+    // new one is made.
     std::string const& current = text();
-    std::size_t const total = current.size() + piece.size();
-    if (block_ == nullptr && total <= kInlineSize) {
-        inline_.append(piece);
-        return *this;
-    }
-    // A shared block stays as it is; `piece` may lie in it, so it is read before letting go.
     std::string joined;
-    joined.reserve(total);
+    joined.reserve(current.size() + piece.size());
     joined.append(current).append(piece);
-    replace(std::move(joined));
-    return *this;
+    return replaceWith(std::move(joined));
 }
 
-String& String::assign(char const* text, unsigned length) {
-    if (ownsBlockAlone()) {
-        block_->text.assign(text, length);
-    } else if (block_ == nullptr && length <= kInlineSize) {
-        inline_.assign(text, length);
-    } else {
-        replace(std::string(text, length));
-    }
-    return *this;
-}
-
-String& String::erase(unsigned pos, unsigned n) {
+String& String::eraseShared(unsigned pos, unsigned n) {
     std::string const& current = text();
-    if (pos >= current.size()) return *this;
     std::size_t const count = n == npos ? current.size() - pos : std::min<std::size_t>(n, current.size() - pos);
-    if (block_ == nullptr) {
-        inline_.erase(pos, count);
-    } else if (ownsBlockAlone()) {
-        block_->text.erase(pos, count);
-    } else {
-        std::string rest;
-        rest.reserve(current.size() - count);
-        rest.append(current, 0, pos).append(current, pos + count, std::string::npos);
-        replace(std::move(rest));
-    }
-    return *this;
+    std::string rest;
+    rest.reserve(current.size() - count);
+    rest.append(current, 0, pos).append(current, pos + count, std::string::npos);
+    return replaceWith(std::move(rest));
 }
 
 unsigned String::find(char c, unsigned pos) const noexcept {

@@ -190,6 +190,40 @@ TEST(StringTest, MovedFromStringIsEmptyAndUsable) {
     }
 }
 
+// Texts of one length whose first difference is at each position (the next byte then differs the
+// other way, so that a later byte cannot decide), and prefixes of every length: the order must be
+// that of the first differing unsigned byte.
+TEST(StringTest, OrderAgreesWithUnsignedBytesAtEveryPosition) {
+    std::string const base = "core_object_origin_importcomponent_0123";  // 39 bytes
+    struct Pair {
+        char low;
+        char high;
+    } const pairs[] = {{'a', 'b'}, {'\x7f', '\x80'}, {'\0', '\xff'}, {'A', 'a'}};
+    for (std::size_t at = 0; at < base.size(); ++at) {
+        for (Pair const& pair : pairs) {
+            std::string low = base;
+            std::string high = base;
+            low[at] = pair.low;
+            high[at] = pair.high;
+            if (at + 1 < base.size()) {
+                low[at + 1] = '\xff';
+                high[at + 1] = '\0';
+            }
+            String const lowString(low);
+            String const highString(high);
+            EXPECT_TRUE(lowString < highString) << "byte " << at;
+            EXPECT_FALSE(highString < lowString) << "byte " << at;
+            EXPECT_FALSE(lowString == highString) << "byte " << at;
+        }
+    }
+    for (std::size_t length = 0; length < base.size(); ++length) {
+        String const prefix(base.substr(0, length));
+        EXPECT_TRUE(prefix < String(base)) << length;
+        EXPECT_FALSE(String(base) < prefix) << length;
+        EXPECT_FALSE(prefix == String(base)) << length;
+    }
+}
+
 TEST(StringTest, EqualTextsCompareAndHashAlikeWhereverTheyAreKept) {
     for (std::string const& text : kSharingTexts) {
         String const a(text);
