@@ -41,8 +41,8 @@ public:
     static constexpr unsigned kInlineSize = 15;
 
     String() noexcept = default;
-    String(char const* text)
-        : String(text ? std::string_view(text) : std::string_view()) {}  // NOLINT: implicit by design
+    // NOLINTNEXTLINE(google-explicit-constructor): implicit by design
+    String(char const* text) : String(text ? std::string_view(text) : std::string_view()) {}
     String(char const* text, unsigned length) : String(std::string_view(text, length)) {}
     String(std::string const& text) : String(std::string_view(text)) {}  // NOLINT
     // Takes over the buffer of a long text: its block is the only new allocation.
