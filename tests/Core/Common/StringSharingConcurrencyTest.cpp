@@ -3,6 +3,7 @@
 // TSan).
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <memory>
 #include <string>
 #include <thread>
@@ -20,21 +21,22 @@ TEST(StringSharingConcurrencyTest, CopiesTakenChangedAndReleasedInSeveralThreads
     constexpr int kRounds = 2000;
     struct Case {
         char const* name;
-        bool originalGoesFirst;  // the original is released while the threads still hold copies
-    } const cases[] = {{"original outlives the copies", false}, {"original released first", true}};
+        // The original stays while the threads run, and half of them copy it; otherwise it is
+        // released first and the thread that lets go last frees the text.
+        bool originalKept;
+    } const cases[] = {{"copies of a String every thread reads", true}, {"the last copy released in a thread", false}};
     for (Case const& c : cases) {
         auto original = std::make_unique<String>(kText);
-        // Each thread owns a copy handed to it; half of them copy that one, the others a String
-        // every thread reads.
         std::vector<String> handed(kThreads, *original);
-        String const sharedRead = *original;
+        std::atomic<bool> go{false};
         std::vector<int> wrong(kThreads, 0);
         std::vector<std::thread> threads;
         for (int t = 0; t < kThreads; ++t) {
             threads.emplace_back([&, t] {
                 String mine = std::move(handed[t]);
+                while (!go.load()) std::this_thread::yield();
                 for (int i = 0; i < kRounds; ++i) {
-                    String copy = t % 2 == 0 ? mine : sharedRead;
+                    String copy = c.originalKept && t % 2 == 1 ? *original : mine;
                     if (copy.str() != kText) ++wrong[t];
                     copy += 'x';  // a private copy: the shared text stays
                     copy.erase(0, 5);
@@ -43,7 +45,8 @@ TEST(StringSharingConcurrencyTest, CopiesTakenChangedAndReleasedInSeveralThreads
                 if (mine.str() != kText) ++wrong[t];
             });
         }
-        if (c.originalGoesFirst) original.reset();
+        if (!c.originalKept) original.reset();
+        go = true;
         for (std::thread& thread : threads) thread.join();
         for (int t = 0; t < kThreads; ++t) EXPECT_EQ(wrong[t], 0) << c.name << ", thread " << t;
         if (original) {
