@@ -1,5 +1,6 @@
 #include "trelm/String.h"
 
+#include <algorithm>
 #include <charconv>
 #include <ostream>
 
@@ -22,24 +23,74 @@ uError parseDecimal(std::string const& text, T& out) {
 
 }  // namespace
 
-String& String::erase(unsigned pos, unsigned n) {
-    if (pos < s_.size()) s_.erase(pos, n == npos ? std::string::npos : n);
+String::String(std::string&& text) {
+    if (text.size() <= kInlineSize) {
+        inline_.assign(text);
+    } else {
+        block_ = new Block(std::move(text));
+    }
+}
+
+String& String::replaceWith(std::string&& text) {
+    Block* made = text.size() <= kInlineSize ? nullptr : new Block(std::move(text));
+    Block* old = block_;
+    block_ = made;
+    if (made != nullptr) {
+        inline_.clear();
+    } else {
+        inline_.assign(text);
+    }
+    release(old);
     return *this;
 }
 
+String String::concat(std::string_view a, std::string_view b) {
+    String r;
+    std::size_t const total = a.size() + b.size();
+    if (total <= kInlineSize) {
+        r.inline_.append(a).append(b);
+    } else {
+        std::string joined;
+        joined.reserve(total);
+        joined.append(a).append(b);
+        r.block_ = new Block(std::move(joined));
+    }
+    return r;
+}
+
+String& String::appendShared(std::string_view piece) {
+    // The old text stays as it is (another String may hold it, `piece` may lie in it) until the
+    // new one is made.
+    std::string const& current = text();
+    std::string joined;
+    joined.reserve(current.size() + piece.size());
+    joined.append(current).append(piece);
+    return replaceWith(std::move(joined));
+}
+
+String& String::eraseShared(unsigned pos, unsigned n) {
+    std::string const& current = text();
+    std::size_t const count = n == npos ? current.size() - pos : std::min<std::size_t>(n, current.size() - pos);
+    std::string rest;
+    rest.reserve(current.size() - count);
+    rest.append(current, 0, pos).append(current, pos + count, std::string::npos);
+    return replaceWith(std::move(rest));
+}
+
 unsigned String::find(char c, unsigned pos) const noexcept {
-    auto at = s_.find(c, pos);
-    return at == std::string::npos ? npos : static_cast<unsigned>(at);
+    auto at = view().find(c, pos);
+    return at == std::string_view::npos ? npos : static_cast<unsigned>(at);
 }
 
 unsigned String::find(String const& text, unsigned pos) const noexcept {
-    auto at = s_.find(text.s_, pos);
-    return at == std::string::npos ? npos : static_cast<unsigned>(at);
+    auto at = view().find(text.view(), pos);
+    return at == std::string_view::npos ? npos : static_cast<unsigned>(at);
 }
 
 String String::substr(unsigned pos, unsigned n) const {
-    if (pos >= s_.size()) return String();
-    return String(s_.substr(pos, n == npos ? std::string::npos : n));
+    std::string_view const all = view();
+    if (pos >= all.size()) return String();
+    return String(all.substr(pos, n == npos ? std::string_view::npos : n));
 }
 
 String String::from(int value) { return String(std::to_string(value)); }
@@ -49,10 +100,10 @@ String String::from(unsigned value) { return String(std::to_string(value)); }
 String String::from(unsigned long value) { return String(std::to_string(value)); }
 String String::from(unsigned long long value) { return String(std::to_string(value)); }
 
-uError String::to(int& out) const { return parseDecimal(s_, out); }
-uError String::to(unsigned& out) const { return parseDecimal(s_, out); }
-uError String::to(long long& out) const { return parseDecimal(s_, out); }
+uError String::to(int& out) const { return parseDecimal(text(), out); }
+uError String::to(unsigned& out) const { return parseDecimal(text(), out); }
+uError String::to(long long& out) const { return parseDecimal(text(), out); }
 
-std::ostream& operator<<(std::ostream& os, String const& s) { return os << s.str(); }
+std::ostream& operator<<(std::ostream& os, String const& s) { return os << s.view(); }
 
 }  // namespace trelm

@@ -5,6 +5,9 @@
 #include "ErrorAssertions.h"
 
 #include <climits>
+#include <functional>
+#include <string>
+#include <vector>
 
 namespace trelm {
 namespace {
@@ -84,6 +87,158 @@ TEST(StringTest, WholeTextMustBeADecimalInRange) {
     for (Case const& c : cases) {
         expectParse(c.text, c.intOk, c.intValue, -777);
         expectParse(c.text, c.unsignedOk, c.unsignedValue, 777u);
+    }
+}
+
+// Texts on both sides of what a String keeps in itself (15 bytes) and beyond.
+std::vector<std::string> const kSharingTexts = {"", "short", std::string(15, 'a'), std::string(16, 'b'),
+                                                "core_object_origin_importcomponent"};
+
+// Every change of a String, each with what it does to a std::string holding the same text. Run on a
+// String held alone (changed in place) and on one whose block a copy shares (changed on its own copy).
+struct Change {
+    char const* name;
+    std::function<void(String&)> onString;
+    std::function<void(std::string&)> onModel;
+};
+
+std::vector<Change> const kChanges = {
+    {"append long", [](String& s) { s += String("-and-a-piece-longer-than-fifteen"); },
+     [](std::string& m) { m += "-and-a-piece-longer-than-fifteen"; }},
+    {"append char", [](String& s) { s += 'x'; }, [](std::string& m) { m += 'x'; }},
+    {"append text", [](String& s) { s += "tail"; }, [](std::string& m) { m += "tail"; }},
+    {"append itself", [](String& s) { s += s; }, [](std::string& m) { m += m; }},
+    {"erase middle", [](String& s) { s.erase(2, 5); },
+     [](std::string& m) { m.erase(std::min<std::size_t>(2, m.size()), 5); }},
+    {"erase to end", [](String& s) { s.erase(1); },
+     [](std::string& m) { m.erase(std::min<std::size_t>(1, m.size())); }},
+    {"erase all", [](String& s) { s.erase(0); }, [](std::string& m) { m.clear(); }},
+    {"assign long", [](String& s) { s.assign("assigned text of some length", 28); },
+     [](std::string& m) { m.assign("assigned text of some length"); }},
+    {"assign short", [](String& s) { s.assign("abc", 3); }, [](std::string& m) { m.assign("abc"); }},
+    {"assign a part of itself", [](String& s) { s.assign(s.cStr() + s.size() / 2, s.size() - s.size() / 2); },
+     [](std::string& m) { m = m.substr(m.size() / 2); }},
+    {"copy-assign", [](String& s) { s = String("a replacement that is rather long"); },
+     [](std::string& m) { m = "a replacement that is rather long"; }},
+    {"copy-assign itself",
+     [](String& s) {
+         String const& same = s;
+         s = same;
+     },
+     [](std::string&) {}},
+    {"move-assign itself",
+     [](String& s) {
+         String& same = s;
+         s = std::move(same);
+     },
+     [](std::string&) {}},
+};
+
+void expectText(String const& s, std::string const& text, std::string const& where) {
+    EXPECT_EQ(s.str(), text) << where;
+    EXPECT_EQ(s.size(), text.size()) << where;
+    EXPECT_EQ(std::string(s.cStr()), text.substr(0, text.find('\0'))) << where;  // NUL-terminated
+    EXPECT_TRUE(s == String(text)) << where;
+    EXPECT_FALSE(s < String(text) || String(text) < s) << where;
+}
+
+TEST(StringTest, ChangingOneCopyLeavesTheOthersAlone) {
+    for (std::string const& text : kSharingTexts) {
+        for (Change const& change : kChanges) {
+            std::string model = text;
+            change.onModel(model);
+            std::string const where = change.name + std::string(" on \"") + text + "\"";
+
+            String alone(text);
+            change.onString(alone);
+            expectText(alone, model, where + ", held alone");
+
+            String changed(text);
+            String const before = changed;  // copied before the change
+            change.onString(changed);
+            String const after = changed;  // copied after it
+            expectText(changed, model, where + ", shared");
+            expectText(before, text, where + ", the copy made before");
+            expectText(after, model, where + ", the copy made after");
+
+            // The other way round: the original changes, the copy keeps the old text.
+            String original(text);
+            String const copy = original;
+            change.onString(original);
+            expectText(copy, text, where + ", copy of the changed original");
+        }
+    }
+}
+
+TEST(StringTest, MovedFromStringIsEmptyAndUsable) {
+    for (std::string const& text : kSharingTexts) {
+        String source(text);
+        String const sharer = source;
+        String moved(std::move(source));
+        expectText(moved, text, "moved to, from \"" + text + "\"");
+        expectText(source, "", "moved from");  // NOLINT(bugprone-use-after-move): on purpose
+        source += "again and long enough to need a block";
+        expectText(source, "again and long enough to need a block", "refilled");
+
+        String target("a target whose text is shared with keep");
+        String const keep = target;
+        target = std::move(moved);
+        expectText(target, text, "move-assigned");
+        expectText(moved, "", "move-assigned from");  // NOLINT(bugprone-use-after-move): on purpose
+        expectText(keep, "a target whose text is shared with keep", "the target's old text");
+        expectText(sharer, text, "the source's copy");
+    }
+}
+
+// Texts of one length whose first difference is at each position (the next byte then differs the
+// other way, so that a later byte cannot decide), and prefixes of every length: the order must be
+// that of the first differing unsigned byte.
+TEST(StringTest, OrderAgreesWithUnsignedBytesAtEveryPosition) {
+    std::string const base = "core_object_origin_importcomponent_0123";  // 39 bytes
+    struct Pair {
+        char low;
+        char high;
+    } const pairs[] = {{'a', 'b'}, {'\x7f', '\x80'}, {'\0', '\xff'}, {'A', 'a'}};
+    for (std::size_t at = 0; at < base.size(); ++at) {
+        for (Pair const& pair : pairs) {
+            std::string low = base;
+            std::string high = base;
+            low[at] = pair.low;
+            high[at] = pair.high;
+            if (at + 1 < base.size()) {
+                low[at + 1] = '\xff';
+                high[at + 1] = '\0';
+            }
+            String const lowString(low);
+            String const highString(high);
+            EXPECT_TRUE(lowString < highString) << "byte " << at;
+            EXPECT_FALSE(highString < lowString) << "byte " << at;
+            EXPECT_FALSE(lowString == highString) << "byte " << at;
+        }
+    }
+    for (std::size_t length = 0; length < base.size(); ++length) {
+        String const prefix(base.substr(0, length));
+        EXPECT_TRUE(prefix < String(base)) << length;
+        EXPECT_FALSE(String(base) < prefix) << length;
+        EXPECT_FALSE(prefix == String(base)) << length;
+    }
+}
+
+TEST(StringTest, EqualTextsCompareAndHashAlikeWhereverTheyAreKept) {
+    for (std::string const& text : kSharingTexts) {
+        String const a(text);
+        String const shared = a;
+        String const separate(text.data(), static_cast<unsigned>(text.size()));
+        for (String const* other : {&shared, &separate}) {
+            EXPECT_TRUE(a == *other) << text;
+            EXPECT_FALSE(a != *other) << text;
+            EXPECT_FALSE(a < *other || *other < a) << text;
+            EXPECT_EQ(std::hash<String>()(a), std::hash<String>()(*other)) << text;
+        }
+        EXPECT_EQ(std::hash<String>()(a), std::hash<std::string>()(text)) << text;
+        EXPECT_TRUE(a < a + "z") << text;
+        EXPECT_EQ(String(std::string(text)), a) << text;  // from a moved-in std::string
+        EXPECT_EQ(a.substr(1) + a.substr(0, 1), text.empty() ? "" : text.substr(1) + text.substr(0, 1)) << text;
     }
 }
 

@@ -15,21 +15,22 @@ constexpr char const* kTimeKey = "core_object_time";
 constexpr char const* kServiceIdKey = "core_event_serviceid";
 constexpr char const* kServiceName = "Facebook";
 
-// A stream row's field, the record key it goes to, and that key's type.
+// A stream row's field, the record key it goes to, and that key's type. The texts are made once:
+// the records' keys share them.
 struct EventField {
-    char const* rowField;
-    char const* recordKey;
+    String rowField;
+    String recordKey;
     TRELM_TYPES::TYPES type;
 };
 
-constexpr EventField kStatusFields[] = {
+EventField const kStatusFields[] = {
     {"source_id", "core_event_contactid", TRELM_TYPES::STRING},
     {"post_id", kServiceIdKey, TRELM_TYPES::STRING},
     {"created_time", kTimeKey, TRELM_TYPES::INT32},
     {"message", "core_event_text", TRELM_TYPES::STRING},
 };
 
-constexpr EventField kPhotoFields[] = {
+EventField const kPhotoFields[] = {
     {"owner", "core_event_contactid", TRELM_TYPES::STRING},
     {"pid", kServiceIdKey, TRELM_TYPES::STRING},
     {"created_time", kTimeKey, TRELM_TYPES::INT32},
@@ -68,8 +69,10 @@ uError convertEvent(Map<String, String> const& row, EventField const (&fields)[N
     }
     static String const timeKey(kTimeKey);
     if (Variant const* time = record->search(timeKey)) lastTime = time->asInt32();
-    TRELM_RETURN_IF_ERROR(record->insert("core_event_service", Variant(kServiceName)));
-    return record->insert("core_object_type", Variant(type));
+    static String const serviceKey("core_event_service");
+    static String const typeKey("core_object_type");
+    TRELM_RETURN_IF_ERROR(record->insert(serviceKey, Variant(kServiceName)));
+    return record->insert(typeKey, Variant(type));
 }
 
 }  // namespace

@@ -304,23 +304,27 @@ uError FacebookLibrary::addAuth(Map<String, String>& args, bool withSession) {
     MutexLock guard(mutex_);
     if (!guard.locked()) return TRELM_ERROR(kResource);
 
-    // The values are moved into the call: one copy each, made by the getters.
+    // The values are moved into the call: the getters' copies share the stored texts.
+    static String const apiKeyField("api_key");
+    static String const sessionKeyField("session_key");
+    static String const callIdField("call_id");
+    static String const sigField("sig");
     String appKey;
     TRELM_RETURN_IF_ERROR(info_->getAppKey(appKey));
-    TRELM_RETURN_IF_ERROR(args.insert("api_key", std::move(appKey)));
+    TRELM_RETURN_IF_ERROR(args.insert(apiKeyField, std::move(appKey)));
     if (withSession) {
         String sessionId;
         TRELM_RETURN_IF_ERROR(info_->getSessionId(sessionId));
         // An empty session id is no session: the request goes out as an application call.
         if (!sessionId.empty()) {
-            TRELM_RETURN_IF_ERROR(args.insert("session_key", std::move(sessionId)));
+            TRELM_RETURN_IF_ERROR(args.insert(sessionKeyField, std::move(sessionId)));
             ++callCounter_;
-            TRELM_RETURN_IF_ERROR(args.insert("call_id", String::from(callCounter_)));
+            TRELM_RETURN_IF_ERROR(args.insert(callIdField, String::from(callCounter_)));
         }
     }
     String sig;
     TRELM_RETURN_IF_ERROR(makeSignature(args, sig));
-    return args.insert("sig", std::move(sig));
+    return args.insert(sigField, std::move(sig));
 }
 
 uError FacebookLibrary::makeSignature(Map<String, String> const& args, String& sig) {

@@ -98,12 +98,18 @@ uError FriendRequestCursor::convertItem(Map<String, String> const& row, RecordPt
     static String const uidField("uid_from");
     String const* uid = row.search(uidField);
     if (uid == nullptr) return TRELM_ERROR_MSG(kInvalid, "friend request row without uid_from");
-    TRELM_RETURN_IF_ERROR(record->insert(kContactIdKey, Variant(*uid)));
-    TRELM_RETURN_IF_ERROR(record->insert(kServiceKey, Variant("Facebook")));
-    TRELM_RETURN_IF_ERROR(record->insert(kServiceIdKey, Variant("FriendRequest: " + *uid)));
-    TRELM_RETURN_IF_ERROR(record->insert("core_object_type", Variant(int(Metadata::Object::TYPE_FRIEND_REQUEST))));
+    // The key texts are made once: the records share them.
+    static String const contactIdKey(kContactIdKey);
+    static String const serviceKey(kServiceKey);
+    static String const serviceIdKey(kServiceIdKey);
+    static String const typeKey("core_object_type");
+    static String const timeKey("core_object_time");
+    TRELM_RETURN_IF_ERROR(record->insert(contactIdKey, Variant(*uid)));
+    TRELM_RETURN_IF_ERROR(record->insert(serviceKey, Variant("Facebook")));
+    TRELM_RETURN_IF_ERROR(record->insert(serviceIdKey, Variant("FriendRequest: " + *uid)));
+    TRELM_RETURN_IF_ERROR(record->insert(typeKey, Variant(int(Metadata::Object::TYPE_FRIEND_REQUEST))));
     // A request carries no time of its own: it is stamped when it is read.
-    TRELM_RETURN_IF_ERROR(record->insert("core_object_time", Variant(static_cast<int>(std::time(nullptr)))));
+    TRELM_RETURN_IF_ERROR(record->insert(timeKey, Variant(static_cast<int>(std::time(nullptr)))));
     return addBaseFields(record);
 }
 

@@ -162,14 +162,22 @@ uError MessageCursor::makeRecord(MessageOrder const& order, MessageRow const& ro
     } catch (std::bad_alloc const&) {
         return TRELM_ERROR(kOutOfMemory);
     }
-    TRELM_RETURN_IF_ERROR(made->insert(kContactIdKey, Variant(row.author)));
-    TRELM_RETURN_IF_ERROR(made->insert(kServiceIdKey, Variant(row.serviceId)));
-    TRELM_RETURN_IF_ERROR(made->insert("core_event_text", Variant(row.body)));
-    TRELM_RETURN_IF_ERROR(made->insert(kTimeKey, Variant(order.time)));
-    TRELM_RETURN_IF_ERROR(made->insert("core_event_subject", Variant(row.subject)));
-    TRELM_RETURN_IF_ERROR(made->insert("core_object_id", Variant(row.guid)));
+    // The key texts are made once: the records share them.
+    static String const contactIdKey(kContactIdKey);
+    static String const serviceIdKey(kServiceIdKey);
+    static String const textKey("core_event_text");
+    static String const timeKey(kTimeKey);
+    static String const subjectKey("core_event_subject");
+    static String const objectIdKey("core_object_id");
+    static String const contactNameKey(kContactNameKey);
+    TRELM_RETURN_IF_ERROR(made->insert(contactIdKey, Variant(row.author)));
+    TRELM_RETURN_IF_ERROR(made->insert(serviceIdKey, Variant(row.serviceId)));
+    TRELM_RETURN_IF_ERROR(made->insert(textKey, Variant(row.body)));
+    TRELM_RETURN_IF_ERROR(made->insert(timeKey, Variant(order.time)));
+    TRELM_RETURN_IF_ERROR(made->insert(subjectKey, Variant(row.subject)));
+    TRELM_RETURN_IF_ERROR(made->insert(objectIdKey, Variant(row.guid)));
     if (String const* name = names_.search(row.author)) {
-        TRELM_RETURN_IF_ERROR(made->insert(kContactNameKey, Variant(*name)));
+        TRELM_RETURN_IF_ERROR(made->insert(contactNameKey, Variant(*name)));
     }
     record = std::move(made);
     return TRELM_OK();

@@ -12,13 +12,14 @@ namespace {
 constexpr char const* kTimeKey = "core_object_time";
 constexpr char const* kServiceIdKey = "core_event_serviceid";
 
+// The texts are made once: the records' keys share them.
 struct PhotoField {
-    char const* rowField;
-    char const* recordKey;
+    String rowField;
+    String recordKey;
     TRELM_TYPES::TYPES type;
 };
 
-constexpr PhotoField kPhotoFields[] = {
+PhotoField const kPhotoFields[] = {
     {"owner", "core_event_contactid", TRELM_TYPES::STRING},
     {"pid", kServiceIdKey, TRELM_TYPES::STRING},
     {"created", kTimeKey, TRELM_TYPES::INT32},
@@ -125,8 +126,10 @@ uError PhotoEventCursor::convertItem(Map<String, String> const& row, RecordPtr& 
     for (PhotoField const& f : kPhotoFields) {
         TRELM_RETURN_IF_ERROR(FStreamCursor::copyEventField(row, f.rowField, f.recordKey, f.type, record));
     }
-    TRELM_RETURN_IF_ERROR(record->insert("core_event_service", Variant("Facebook")));
-    TRELM_RETURN_IF_ERROR(record->insert("core_object_type", Variant(FacebookSource::kPhotoEvent)));
+    static String const serviceKey("core_event_service");
+    static String const typeKey("core_object_type");
+    TRELM_RETURN_IF_ERROR(record->insert(serviceKey, Variant("Facebook")));
+    TRELM_RETURN_IF_ERROR(record->insert(typeKey, Variant(FacebookSource::kPhotoEvent)));
     return addBaseFields(record);
 }
 
