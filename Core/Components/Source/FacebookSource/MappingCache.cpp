@@ -33,24 +33,6 @@ std::uint64_t bigEndianWord(unsigned char const* at) noexcept {
 
 }  // namespace
 
-bool FacebookSource::MappingCache::TextLess::operator()(String const& a, String const& b) const noexcept {
-    std::string_view const x = a.view();
-    std::string_view const y = b.view();
-    std::size_t const common = x.size() < y.size() ? x.size() : y.size();
-    std::size_t i = 0;
-    for (; i + 8 <= common; i += 8) {
-        std::uint64_t const wordA = bigEndianWord(reinterpret_cast<unsigned char const*>(x.data()) + i);
-        std::uint64_t const wordB = bigEndianWord(reinterpret_cast<unsigned char const*>(y.data()) + i);
-        if (wordA != wordB) return wordA < wordB;
-    }
-    for (; i < common; ++i) {
-        auto const byteA = static_cast<unsigned char>(x[i]);
-        auto const byteB = static_cast<unsigned char>(y[i]);
-        if (byteA != byteB) return byteA < byteB;
-    }
-    return x.size() < y.size();
-}
-
 bool FacebookSource::MappingCache::GuidLess::operator()(GUID const& a, GUID const& b) const noexcept {
     std::uint64_t const aHigh = bigEndianWord(a.bytes().data());
     std::uint64_t const bHigh = bigEndianWord(b.bytes().data());
@@ -115,13 +97,13 @@ uError FacebookSource::MappingCache::getGuid(String const& tag, SidMapKey const&
     bool placed = false;
     if (tagList != tagSids_.end() && !tagList->second.refs.empty()) {
         SidRef const& last = tagList->second.refs.back();
-        if (last.bucket == &sids && TextLess()(last.at->first, key.sid)) {
+        if (last.bucket == &sids && last.at->first < key.sid) {
             at = std::next(last.at);
-            placed = at == sids.end() || !TextLess()(at->first, key.sid);
+            placed = at == sids.end() || !(at->first < key.sid);
         }
     }
     if (!placed) at = sids.lower_bound(key.sid);
-    bool const known = at != sids.end() && !TextLess()(key.sid, at->first);
+    bool const known = at != sids.end() && !(key.sid < at->first);
     if (!known && !create) return TRELM_ERROR(kNotFound);
 
     bool const newTag = tagList == tagSids_.end();

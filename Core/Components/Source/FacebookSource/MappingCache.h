@@ -185,11 +185,8 @@ private:
         std::vector<List const*> more_;
     };
 
-    // The orders of String's and GUID's operator<, compared eight bytes at a time inline instead
-    // of through memcmp: the searches under the mutex are mostly these comparisons.
-    struct TextLess {
-        bool operator()(String const& a, String const& b) const noexcept;
-    };
+    // GUID's operator<, compared eight bytes at a time inline instead of through memcmp: the
+    // searches under the mutex are mostly such comparisons (String's own operator< already is).
     struct GuidLess {
         bool operator()(GUID const& a, GUID const& b) const noexcept;
     };
@@ -209,8 +206,8 @@ private:
     // whose entries hold their sid once, without the key name. The standard containers
     // themselves, for their node handles: an entry is made in a node outside the mutex and linked
     // in under it, and unlinked under it and freed outside.
-    using SidBucket = std::map<String, SidEntry, TextLess>;
-    using SidBuckets = std::map<String, SidBucket, TextLess>;
+    using SidBucket = std::map<String, SidEntry>;
+    using SidBuckets = std::map<String, SidBucket>;
     using ObjMap = std::map<GUID, ObjEntry, GuidLess>;
 
     // What a tag holds, in the order it took it. An entry released by clearing the tag is
@@ -231,8 +228,8 @@ private:
     struct ObjList {
         std::vector<ObjRef> refs;
     };
-    using TagSids = std::map<String, SidList, TextLess>;
-    using TagObjs = std::map<String, ObjList, TextLess>;
+    using TagSids = std::map<String, SidList>;
+    using TagObjs = std::map<String, ObjList>;
 
     // Made by setup (made() is constant afterwards); guards the five members below.
     Mutex mutex_;
