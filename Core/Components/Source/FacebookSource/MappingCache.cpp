@@ -1,8 +1,5 @@
 #include "MappingCache.h"
 
-#include <bit>
-#include <cstdint>
-#include <cstring>
 #include <iterator>
 #include <new>
 #include <set>
@@ -23,22 +20,7 @@ typename Container::node_type makeNode(Args&&... args) {
     return scratch.extract(scratch.begin());
 }
 
-// The bytes [at, at + 8) as a number whose order is the bytes' lexicographic order.
-std::uint64_t bigEndianWord(unsigned char const* at) noexcept {
-    std::uint64_t word;
-    std::memcpy(&word, at, sizeof word);
-    if constexpr (std::endian::native == std::endian::little) word = __builtin_bswap64(word);
-    return word;
-}
-
 }  // namespace
-
-bool FacebookSource::MappingCache::GuidLess::operator()(GUID const& a, GUID const& b) const noexcept {
-    std::uint64_t const aHigh = bigEndianWord(a.bytes().data());
-    std::uint64_t const bHigh = bigEndianWord(b.bytes().data());
-    if (aHigh != bHigh) return aHigh < bHigh;
-    return bigEndianWord(a.bytes().data() + 8) < bigEndianWord(b.bytes().data() + 8);
-}
 
 FacebookSource::MappingCache::MappingCache() = default;
 
@@ -162,7 +144,7 @@ uError FacebookSource::MappingCache::setItem(String const& tag, Metadata::Key co
         ObjList& list = tagList->second;
         if (list.refs.size() == list.refs.capacity()) list.refs.reserve(list.refs.size() * 2 + 16);
         auto const at = objMap_.lower_bound(guid);
-        if (at != objMap_.end() && !GuidLess()(guid, at->first)) {
+        if (at != objMap_.end() && !(guid < at->first)) {
             ObjEntry& entry = at->second;
             if (!entry.holders.contains(&list)) {
                 entry.holders.add(&list);

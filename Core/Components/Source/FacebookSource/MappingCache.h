@@ -185,12 +185,6 @@ private:
         std::vector<List const*> more_;
     };
 
-    // GUID's operator<, compared eight bytes at a time inline instead of through memcmp: the
-    // searches under the mutex are mostly such comparisons (String's own operator< already is).
-    struct GuidLess {
-        bool operator()(GUID const& a, GUID const& b) const noexcept;
-    };
-
     struct SidList;
     struct ObjList;
     struct SidEntry {
@@ -208,7 +202,7 @@ private:
     // in under it, and unlinked under it and freed outside.
     using SidBucket = std::map<String, SidEntry>;
     using SidBuckets = std::map<String, SidBucket>;
-    using ObjMap = std::map<GUID, ObjEntry, GuidLess>;
+    using ObjMap = std::map<GUID, ObjEntry>;
 
     // What a tag holds, in the order it took it. An entry released by clearing the tag is
     // unlinked into its reference's `released`, so that the list, taken out of the cache, frees

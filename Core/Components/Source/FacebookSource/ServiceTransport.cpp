@@ -1,7 +1,5 @@
 #include "ServiceTransport.h"
 
-#include <cstddef>
-#include <cstring>
 #include <string_view>
 #include <utility>
 
@@ -45,38 +43,21 @@ uError ServiceTransport::makeBaseArgs(String const& method, Map<String, String>&
 }
 
 String ServiceTransport::signature(Map<String, String> const& args, String const& secret) {
-    // The pieces are run together in a buffer on the stack and go into the digest a buffer at a
-    // time: the same bytes as the whole text, without building it, in a few digest updates rather
-    // than three per field. The context is the call's own: a thread-local one in the plug-in
-    // would outlive the unloaded plug-in's code and OpenSSL's clean-up at exit.
+    // The pieces go into the digest one by one: the same bytes as the text run together, without
+    // building it. The context is the call's own: a thread-local one in the plug-in would outlive
+    // the unloaded plug-in's code and OpenSSL's clean-up at exit.
     MD5_CTX ctx;
+    auto add = [&ctx](String const& piece) {
+        MD5Update(&ctx, reinterpret_cast<unsigned char const*>(piece.cStr()), piece.size());
+    };
+    static unsigned char const equals = '=';
     MD5Init(&ctx);
-    unsigned char buffer[1024];
-    std::size_t used = 0;
-    auto flush = [&] {
-        if (used > 0) MD5Update(&ctx, buffer, static_cast<unsigned>(used));
-        used = 0;
-    };
-    auto add = [&](std::string_view piece) {
-        if (piece.empty()) return;
-        if (piece.size() > sizeof buffer - used) {
-            flush();
-            if (piece.size() >= sizeof buffer) {
-                MD5Update(&ctx, reinterpret_cast<unsigned char const*>(piece.data()),
-                          static_cast<unsigned>(piece.size()));
-                return;
-            }
-        }
-        std::memcpy(buffer + used, piece.data(), piece.size());
-        used += piece.size();
-    };
     for (auto const& [key, value] : args) {
-        add(key.view());
-        add("=");
-        add(value.view());
+        add(key);
+        MD5Update(&ctx, &equals, 1);
+        add(value);
     }
-    add(secret.view());
-    flush();
+    add(secret);
     return MD5FinalHex(&ctx);
 }
 
